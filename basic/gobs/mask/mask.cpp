@@ -1,0 +1,73 @@
+// SPDX-License-Identifier: MIT
+#include "basic/gobs/mask/mask.h"
+
+#include <algorithm>
+#include <cstring>
+
+#include "host/services/exception.h"
+
+namespace orin::gobs {
+namespace {
+
+uint64_t BufferPixels(const Mask& mask) {
+  return (uint64_t{mask.height} + 2 * uint64_t{mask.marginY}) * mask.stride;
+}
+
+}  // namespace
+
+Mask::Mask(uint32_t width_, uint32_t height_, const parallelio::ProcessWindow& window)
+    : width(width_),
+      height(height_),
+      marginX(window.marginX),
+      marginY(window.marginY),
+      x(window.x),
+      y(window.y),
+      stride(width_ + 2 * window.marginX) {
+  const uint64_t bytes = (BufferPixels(*this) + 7) / 8;
+  bits_ = std::make_unique<uint8_t[]>(bytes);
+  begin = bits_.get();
+  end = begin + bytes;
+  std::fill(begin, end, uint8_t{0xFF});
+}
+
+void Mask::SetValid(int64_t pixelX, int64_t pixelY, bool valid) {
+  const uint64_t index = LayoutOf(*this).Index(pixelX, pixelY);
+  const uint8_t bit = static_cast<uint8_t>(0x80u >> (index % 8));
+  uint8_t& byte = begin[index / 8];
+  byte = valid ? static_cast<uint8_t>(byte | bit) : static_cast<uint8_t>(byte & ~bit);
+}
+
+void Mask::RetrieveRaster(Raster* out) const {
+  if (out->dataType == eDT_BIT) {
+    const auto bytes = std::min<uint64_t>(static_cast<uint64_t>(end - begin), out->byteSize);
+    std::copy_n(begin, bytes, out->data);
+  } else if (out->dataType == eDT_8U) {
+    RetrieveBytes(out);
+  } else {
+    throw DataException("We can only rasterize into a eDT_BIT or eDT_8U Raster",
+                        "basic/gobs/mask/mask",
+                        "void orin::gobs::Mask::RetrieveRaster(orin::gobs::Raster*) const", 233);
+  }
+}
+
+void Mask::RetrieveBytes(Raster* out) const {
+  const uint64_t wanted =
+      (out->height + 2 * uint64_t{out->marginY}) * (out->width + 2 * uint64_t{out->marginX});
+  const uint64_t pixels =
+      std::min({wanted, uint64_t{out->byteSize}, static_cast<uint64_t>(end - begin) * 8});
+  const uint64_t groups = pixels / 8;
+  for (uint64_t group = 0; group < groups; ++group)
+    std::memcpy(out->data + group * 8, &kBitTable[begin[group] * 8u], 8);
+  for (uint64_t pixel = groups * 8; pixel < pixels; ++pixel)
+    out->data[pixel] = kBitTable[begin[groups] * 8u + pixel % 8];
+}
+
+std::unique_ptr<Raster> ByteRasterOf(const Mask& mask) {
+  const RasterInfo info(mask.width, mask.height, 1, eDT_8U);
+  auto bytes = std::make_unique<Raster>(
+      info, parallelio::ProcessWindow{mask.marginX, mask.marginY, mask.x, mask.y});
+  mask.RetrieveRaster(bytes.get());
+  return bytes;
+}
+
+}  // namespace orin::gobs

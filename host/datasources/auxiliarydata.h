@@ -1,0 +1,39 @@
+/// Metadata of a reader: one set for the file, one for each of the reader's channels.
+// SPDX-License-Identifier: MIT
+#pragma once
+
+#include <map>
+#include <string>
+#include <vector>
+
+namespace orin::datasources {
+
+/// The key of the no-data value: a decimal number in text.
+inline constexpr char kNoDataKey[] = "NO_DATA_VALUE";
+
+class AuxiliaryData {
+ public:
+  using Items = std::map<std::string, std::string>;
+
+  AuxiliaryData() = default;
+  AuxiliaryData(Items file, std::vector<Items> channels)
+      : file_(std::move(file)), channels_(std::move(channels)) {}
+
+  /// Empty when the file has no such item.
+  std::string GetFileMetadataValue(const std::string& key) const { return ValueOf(file_, key); }
+  /// \param channel  1-based within the reader's channels. Empty when it has no such item.
+  std::string GetChanMetadataValue(const std::string& key, unsigned channel) const {
+    return channel < 1 || channel > channels_.size() ? "" : ValueOf(channels_[channel - 1], key);
+  }
+
+ private:
+  static std::string ValueOf(const Items& items, const std::string& key) {
+    const auto found = items.find(key);
+    return found == items.end() ? "" : found->second;
+  }
+
+  Items file_;
+  std::vector<Items> channels_;
+};
+
+}  // namespace orin::datasources

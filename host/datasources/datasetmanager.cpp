@@ -1,0 +1,73 @@
+// SPDX-License-Identifier: MIT
+#include "host/datasources/datasetmanager.h"
+
+#include <cerrno>
+#include <cstring>
+#include <memory>
+
+#include <sys/stat.h>
+
+#include "host/datasources/formats.h"
+#include "host/datasources/genericlayer.h"
+#include "host/datasources/sourcedataset.h"
+#include "host/services/exception.h"
+#include "host/services/text.h"
+
+namespace orin::datasources {
+namespace {
+
+[[noreturn]] void Refuse(const std::string& text, const char* function) {
+  throw Exception(text, "host/datasources/datasetmanager", function, 0);
+}
+
+/// Why no driver took the file: it is not there, or it is nothing that a driver knows.
+std::string UnrecognisedText(const std::string& file) {
+  struct stat status;
+  if (stat(file.c_str(), &status) != 0)
+    return FormatString(_("%s: cannot be opened: %s."), file.c_str(), std::strerror(errno));
+  if (S_ISDIR(status.st_mode)) return FormatString(_("%s: is a directory, not a raster file."), file.c_str());
+  return FormatString(_("%s: is not a raster file of a known format."), file.c_str());
+}
+
+IDataset* OpenThrough(int formatCode, const std::string& file, AccessMode mode, const char* function) {
+  ZMBFormatType fileCode = kFormatUnknown;
+  IFormatDriver* driver = FormatRegistry::Instance().DriverOf(file, fileCode);
+  if (!driver) Refuse(UnrecognisedText(file), function);
+  if (formatCode == kFormatGeneric)
+    return new SourceDataset(OpenGeneric(*driver, file), file, mode, kFormatGeneric, fileCode);
+  if (formatCode != kFormatUnknown && formatCode != fileCode)
+    Refuse(FormatString(_("%s: is not a %s file."), file.c_str(), ZMBInfo[formatCode]->name.c_str()),
+           function);
+  return new SourceDataset(driver->Open(file, mode), file, mode, fileCode, fileCode);
+}
+
+int CodeOfName(const std::string& format) {
+  for (const ZMBInfo_s* record : ZMBInfo)
+    if (record && record->code != kFormatUnknown && record->name == format) return record->code;
+  Refuse(FormatString(_("There is no raster format named %s."), format.c_str()),
+         "orin::datasources::DatasetManager::OpenFormat(const std::string&, const std::string&, "
+         "orin::datasources::AccessMode)");
+}
+
+}  // namespace
+
+DatasetManager* DatasetManager::GetInstance() {
+  static DatasetManager manager;
+  return &manager;
+}
+
+IDataset* DatasetManager::Open(const std::string& file, AccessMode mode) {
+  return OpenThrough(kFormatUnknown, file, mode,
+                     "orin::datasources::DatasetManager::Open(const std::string&, "
+                     "orin::datasources::AccessMode)");
+}
+
+IDataset* DatasetManager::OpenFormat(const std::string& format, const std::string& file,
+                                     AccessMode mode) {
+  FormatRegistry::Instance();  // fills the table's fixed records
+  return OpenThrough(CodeOfName(format), file, mode,
+                     "orin::datasources::DatasetManager::OpenFormat(const std::string&, "
+                     "const std::string&, orin::datasources::AccessMode)");
+}
+
+}  // namespace orin::datasources

@@ -1,0 +1,72 @@
+// SPDX-License-Identifier: MIT
+#include "host/datasources/overviewaccessors.h"
+
+#include <algorithm>
+
+#include "host/services/exception.h"
+#include "host/services/text.h"
+
+namespace orin::datasources {
+namespace {
+
+std::vector<unsigned> LevelsOf(const ILevelStore* store, const std::vector<unsigned>& channels) {
+  std::vector<unsigned> levels;
+  if (store)
+    for (const LevelDescription& entry : store->List())
+      if (HoldsForAll(entry.presentChannels, channels)) levels.push_back(entry.level);
+  return levels;
+}
+
+}  // namespace
+
+BasicOverviewReaderAccessor::BasicOverviewReaderAccessor(IRasterDataset* dataset,
+                                                         const std::vector<unsigned>& channels)
+    : store_(dataset->GetSource()->Levels()), channels_(channels) {}
+
+std::vector<unsigned> BasicOverviewReaderAccessor::GetLevels() const { return LevelsOf(store_, channels_); }
+
+bool BasicOverviewReaderAccessor::IsLevelValid(unsigned level) const {
+  if (!store_) return false;
+  const std::vector<LevelDescription> levels = store_->List();
+  const auto found = std::find_if(levels.begin(), levels.end(),
+                                  [level](const LevelDescription& e) { return e.level == level; });
+  return found != levels.end() && HoldsForAll(found->validChannels, channels_);
+}
+
+BasicOverviewWriterAccessor::BasicOverviewWriterAccessor(IRasterDataset* dataset,
+                                                         const std::vector<unsigned>& channels)
+    : store_(dataset->GetSource()->Levels()), channels_(channels), file_(dataset->GetFileName()) {}
+
+ILevelStore& BasicOverviewWriterAccessor::Store() const {
+  if (!store_)
+    throw Exception(FormatString(_("%s: its format holds no levels."), file_.c_str()),
+                    "host/datasources/overviewaccessors",
+                    "orin::datasources::BasicOverviewWriterAccessor", 0);
+  return *store_;
+}
+
+void BasicOverviewWriterAccessor::CreateLevel(unsigned level) {
+  Store().Create(level, channels_, method_);
+}
+
+IRasterWriter* BasicOverviewWriterAccessor::CreateRasterWriter(unsigned level) {
+  return Store().OpenWriter(level, channels_).release();
+}
+
+std::vector<unsigned> BasicOverviewWriterAccessor::GetLevels() const { return LevelsOf(store_, channels_); }
+
+void BasicOverviewWriterAccessor::SetValid(unsigned channel, unsigned level, bool valid) {
+  if (channel < 1 || channel > channels_.size())
+    throw Exception(FormatString(_("%s: the accessor has no channel %u."), file_.c_str(), channel),
+                    "host/datasources/overviewaccessors",
+                    "orin::datasources::BasicOverviewWriterAccessor::SetValid(unsigned int, "
+                    "unsigned int, bool)",
+                    0);
+  Store().SetValid(level, {channels_[channel - 1]}, valid);
+}
+
+void BasicOverviewWriterAccessor::SetLevelValid(unsigned level, bool valid) {
+  Store().SetValid(level, channels_, valid);
+}
+
+}  // namespace orin::datasources

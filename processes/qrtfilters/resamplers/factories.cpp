@@ -1,0 +1,54 @@
+// SPDX-License-Identifier: MIT
+#include "processes/qrtfilters/resamplers/factories.h"
+
+#include <algorithm>
+#include <iostream>
+#include <string>
+
+#include "basic/core/typedispatch/dispatchtype.h"
+#include "host/services/environment.h"
+#include "host/services/exception.h"
+#include "host/services/text.h"
+
+namespace orin::resamplers {
+namespace {
+
+/// The processing target that the environment asks for, in upper case; empty when it asks for none.
+std::string RequestedTarget() {
+  std::string target = core::QRTGetEnvironmentVariable("ORIN_TARGET");
+  std::transform(target.begin(), target.end(), target.begin(),
+                 [](char c) { return c >= 'a' && c <= 'z' ? char(c - 'a' + 'A') : c; });
+  return target;
+}
+
+/// True when kernels run here. Deliberate: no other target exists, and asking for one gives no resampler.
+bool RunsOnCpu() {
+  const std::string target = RequestedTarget();
+  if (target == "GPU") std::cout << "Using the GPU!" << std::endl;
+  return target.empty() || target == "CPU";
+}
+
+[[noreturn]] IRasterResampler* RefuseMethod(const char* name) {
+  throw Exception(FormatString(_("The method %s is not part of this program."), name),
+                  "processes/qrtfilters/resamplers/factories", "CreateResampler", 0);
+}
+
+}  // namespace
+
+IRasterResampler* NearestNeighbourResamplerFactory::CreateResampler(const gobs::DataType&) {
+  return RunsOnCpu() ? RefuseMethod("NEAREST") : nullptr;
+}
+IRasterResampler* AverageResamplerFactory::CreateResampler(const gobs::DataType&) {
+  return RunsOnCpu() ? RefuseMethod("AVERAGE") : nullptr;
+}
+IRasterResampler* ModeResamplerFactory::CreateResampler(const gobs::DataType&) {
+  return RunsOnCpu() ? RefuseMethod("MODE") : nullptr;
+}
+IRasterResampler* BilinearResamplerFactory::CreateResampler(const gobs::DataType&) {
+  return RunsOnCpu() ? RefuseMethod("BILINEAR") : nullptr;
+}
+IRasterResampler* BicubicResamplerFactory::CreateResampler(const gobs::DataType&) {
+  return RunsOnCpu() ? RefuseMethod("BICUBIC") : nullptr;
+}
+
+}  // namespace orin::resamplers
