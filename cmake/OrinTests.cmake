@@ -1,0 +1,14 @@
+# SPDX-License-Identifier: MIT
+# Declares test programs.
+
+include(GoogleTest)
+find_package(GTest REQUIRED)
+
+# orin_test(<name> SOURCES ... LINKS ...): one GoogleTest program, its tests registered one by one.
+function(orin_test name)
+  cmake_parse_arguments(ARG "" "" "SOURCES;LINKS" ${ARGN})
+  add_executable(${name} ${ARG_SOURCES})
+  target_link_libraries(${name} PRIVATE orin_flags ${ARG_LINKS} GTest::gmock GTest::gtest_main)
+  target_include_directories(${name} PRIVATE ${PROJECT_SOURCE_DIR})
+  gtest_discover_tests(${name} DISCOVERY_TIMEOUT 60 PROPERTIES TIMEOUT 300)
+endfunction()
