@@ -36,7 +36,7 @@ foreach(library ${orin_libraries})
     string(PREPEND ORIN_PC_LIBRARIES "-l${library} ")
   endif()
 endforeach()
-file(RELATIVE_PATH ORIN_PC_PREFIX
+file(RELATIVE_PATH ORIN_PC_PREFIX   # ends with a slash
   /prefix/${CMAKE_INSTALL_LIBDIR}/pkgconfig /prefix)
 configure_file(${PROJECT_SOURCE_DIR}/packaging/orin-overviews.pc.in orin-overviews.pc @ONLY)
 install(FILES ${PROJECT_BINARY_DIR}/orin-overviews.pc
