@@ -55,7 +55,6 @@ struct Case {
   MaskKind mask;
   uint32_t srcChannels, dstChannels;
   Geometry src, dst;
-  int threads;
   Values values;
   reference::Settings settings;
 };
@@ -69,8 +68,7 @@ inline std::ostream& operator<<(std::ostream& out, const Case& c) {
   out.precision(17);
   return out << "seed " << c.seed << ": mapping " << int(c.plan.kind) << ", mask " << int(c.mask)
              << ", channels " << c.srcChannels << " -> " << c.dstChannels << ", source " << c.src
-             << ", destination " << c.dst << ", threads " << c.threads << ", values "
-             << int(c.values) << "\n  complex " << s.isComplex << ", no data " << s.noDataValue
+             << ", destination " << c.dst << ", values " << int(c.values) << "\n  complex " << s.isComplex << ", no data " << s.noDataValue
              << ", ratio " << (s.ratioGiven ? "given " : "not given ") << s.ratioX << ", "
              << s.ratioY << ", ground " << s.georeferenced << " origins " << s.srcOriginX << ", "
              << s.srcOriginY << " -> " << s.dstOriginX << ", " << s.dstOriginY << " pixels "
@@ -148,7 +146,6 @@ inline Case MakeCase(uint64_t seed, const MappingPlan& plan, MaskKind mask, uint
   if (random.OneIn(6)) c.src.height = 1;
   c.dst.marginX = static_cast<uint32_t>(random.Between(0, 3));
   c.dst.marginY = static_cast<uint32_t>(random.Between(0, 3));
-  c.threads = random.From(kThreadCounts);
   c.values = static_cast<Values>(random.Between(0, 3));
   c.settings.isComplex = isComplex;
   if (!random.OneIn(10)) c.settings.noDataValue = random.From(kNoDataValues);
