@@ -40,8 +40,8 @@ using Method = void (*)(const Block<T>&, const Bits*, const Block<T>&, const Set
 
 /// The destination's values, its margin 0.
 template <class T>
-std::vector<T> Apply(Method<T> method, Drawn<T> src, int64_t width, int64_t height, const Settings& s,
-                   const std::vector<uint8_t>& maskBytes = {}) {
+std::vector<T> Apply(Method<T> method, Drawn<T> src, int64_t width, int64_t height,
+                     const Settings& s, const std::vector<uint8_t>& maskBytes = {}) {
   src.block.values = src.values.data();
   const Block<T>& b = src.block;
   std::vector<T> out(static_cast<size_t>(width * height * b.components), T(99));
@@ -75,7 +75,7 @@ TEST(Conversion, RoundsSignedValuesAwayFromZeroAndClampsThem) {
   EXPECT_EQ(127, Convert<int8_t>(126.5));
   EXPECT_EQ(-128, Convert<int8_t>(-1000));
   EXPECT_EQ(INT32_MIN, Convert<int32_t>(-2147483648.4));
-  EXPECT_EQ(1, Convert<int16_t>(0.49999999999999994));   // a half is added in double
+  EXPECT_EQ(1, Convert<int16_t>(0.49999999999999994));  // a half is added in double
 }
 
 TEST(Conversion, RoundsUnsignedValuesUpAndClampsThem) {
@@ -116,7 +116,8 @@ const V<V<int16_t>> kRamp = {{0, 1, 2, 3}, {10, 11, 12, 13}, {20, 21, 22, 23}, {
 
 TEST(NearestTwin, TakesTheCornerByRatioAndTheCentreByGround) {
   EXPECT_EQ((V<int16_t>{0, 2, 20, 22}), Apply(Nearest<int16_t>, Draw(kRamp, 0), 2, 2, Settings{}));
-  EXPECT_EQ((V<int16_t>{11, 13, 31, 33}), Apply(Nearest<int16_t>, Draw(kRamp, 0), 2, 2, Ground(0, 2)));
+  EXPECT_EQ((V<int16_t>{11, 13, 31, 33}),
+            Apply(Nearest<int16_t>, Draw(kRamp, 0), 2, 2, Ground(0, 2)));
 }
 
 TEST(NearestTwin, SendsACoordinateOfMinusOneOrLessToTheLastPixel) {
@@ -125,7 +126,8 @@ TEST(NearestTwin, SendsACoordinateOfMinusOneOrLessToTheLastPixel) {
 }
 
 TEST(NearestTwin, KeepsTheLowThirtyTwoBitsOfACoordinate) {
-  EXPECT_EQ((V<int16_t>{22}), Apply(Nearest<int16_t>, Draw(kRamp, 0), 1, 1, Ground(4294967298.0, 1)));
+  EXPECT_EQ((V<int16_t>{22}),
+            Apply(Nearest<int16_t>, Draw(kRamp, 0), 1, 1, Ground(4294967298.0, 1)));
 }
 
 TEST(NearestTwin, FillsEveryComponentOfAnInvalidPixel) {
@@ -142,8 +144,8 @@ TEST(AverageTwin, NeedsTwoValidSamplesOfFour) {
   Settings s = Ratio(0.5);
   s.noDataValue = 9;
   const V<V<uint8_t>> four = {{1, 2}, {3, 4}};
-  EXPECT_EQ((V<uint8_t>{3}), Apply(Average<uint8_t>, Draw(four, 0), 1, 1, s));           // 2.5
-  EXPECT_EQ((V<uint8_t>{3}), Apply(Average<uint8_t>, Draw(four, 0), 1, 1, s, {0x50}));   // 2 and 4
+  EXPECT_EQ((V<uint8_t>{3}), Apply(Average<uint8_t>, Draw(four, 0), 1, 1, s));          // 2.5
+  EXPECT_EQ((V<uint8_t>{3}), Apply(Average<uint8_t>, Draw(four, 0), 1, 1, s, {0x50}));  // 2 and 4
   EXPECT_EQ((V<uint8_t>{9}), Apply(Average<uint8_t>, Draw(four, 0), 1, 1, s, {0x40}));
 }
 
@@ -152,7 +154,7 @@ TEST(AverageTwin, NeedsFiveValidSamplesOfNine) {
   s.noDataValue = 77;
   const V<V<int8_t>> nine = {{-1, -2, -1}, {-2, -1, -2}, {-1, -2, 0}};
   EXPECT_EQ((V<int8_t>{77}), Apply(Average<int8_t>, Draw(nine, 0), 1, 1, s, {0xF0, 0x00}));
-  EXPECT_EQ((V<int8_t>{-1}), Apply(Average<int8_t>, Draw(nine, 0), 1, 1, s, {0xF8, 0x00}));   // -7/5
+  EXPECT_EQ((V<int8_t>{-1}), Apply(Average<int8_t>, Draw(nine, 0), 1, 1, s, {0xF8, 0x00}));  // -7/5
 }
 
 TEST(AverageTwin, RepeatsTheLastRowOfAnOddHeight) {
@@ -161,9 +163,9 @@ TEST(AverageTwin, RepeatsTheLastRowOfAnOddHeight) {
 
 TEST(AverageTwin, GivesTheCentresValueToAnInvalidPixelOfItsFootprint) {
   const V<V<uint8_t>> drawn = {{0, 0, 0, 0}, {0, 10, 90, 0}, {0, 30, 40, 0}, {0, 0, 0, 0}};
-  Settings s = Ratio(0.4);   // pixels 0 and 1 of each axis
+  Settings s = Ratio(0.4);  // pixels 0 and 1 of each axis
   const V<uint8_t> all(2, 0xFF);
-  EXPECT_EQ((V<uint8_t>{43}), Apply(Average<uint8_t>, Draw(drawn, 1), 1, 1, s, all));   // 42.5
+  EXPECT_EQ((V<uint8_t>{43}), Apply(Average<uint8_t>, Draw(drawn, 1), 1, 1, s, all));  // 42.5
   EXPECT_EQ((V<uint8_t>{23}), Apply(Average<uint8_t>, Draw(drawn, 1), 1, 1, s, {0xFD, 0xFF}));
 }
 
@@ -171,32 +173,31 @@ TEST(AverageTwin, FillsAnEmptyFootprint) {
   Settings s = Ratio(2);
   s.noDataValue = 5;
   const V<V<uint8_t>> drawn = {{0, 0, 0, 0}, {0, 7, 8, 0}, {0, 0, 0, 0}};
-  EXPECT_EQ((V<uint8_t>{5, 5, 5, 5, 5, 7, 5, 8}),   // odd columns of odd rows cover a pixel
+  EXPECT_EQ((V<uint8_t>{5, 5, 5, 5, 5, 7, 5, 8}),  // odd columns of odd rows cover a pixel
             Apply(Average<uint8_t>, Draw(drawn, 1), 4, 2, s));
 }
 
 TEST(AverageTwin, KeepsTheMeanLengthOfComplexSamples) {
   Settings s = Ratio(0.5);
-  s.isComplex = true;   // lengths 5, 5, 5 and the root of 17, vector sum (8, 16)
-  const auto out = Apply(Average<double>, Draw<double>({{3, 4, 3, 4}, {3, 4, -1, 4}}, 0, 2), 1, 1, s);
+  s.isComplex = true;  // lengths 5, 5, 5 and the root of 17, vector sum (8, 16)
+  const auto out =
+      Apply(Average<double>, Draw<double>({{3, 4, 3, 4}, {3, 4, -1, 4}}, 0, 2), 1, 1, s);
   const double mean = (15 + std::sqrt(17.0)) / 4;
   EXPECT_NEAR(mean, std::hypot(out[0], out[1]), 1e-14);
   EXPECT_NEAR(2, out[1] / out[0], 1e-14);
 }
 
 TEST(AverageTwin, WrapsTheSquaresOfLargeIntegers) {
-  EXPECT_TRUE(std::isnan(Magnitude(Sample<uint16_t>{65535, 0})));       // 4294836225 is negative
+  EXPECT_TRUE(std::isnan(Magnitude(Sample<uint16_t>{65535, 0})));  // 4294836225 is negative
   EXPECT_EQ(4294836225.0, std::pow(Magnitude(Sample<uint32_t>{65535, 0}), 2));
-  EXPECT_EQ(0, Magnitude(Sample<int32_t>{65536, 0}));                   // 2 to the 32nd
+  EXPECT_EQ(0, Magnitude(Sample<int32_t>{65536, 0}));  // 2 to the 32nd
   EXPECT_EQ(2, Magnitude(Sample<int32_t>{65536, 2}));
   EXPECT_EQ(0, Magnitude(Sample<uint64_t>{uint64_t{1} << 32, 0}));
-  EXPECT_TRUE(std::isnan(Magnitude(Sample<int64_t>{3037000500, 0})));   // just over 2 to the 63rd
+  EXPECT_TRUE(std::isnan(Magnitude(Sample<int64_t>{3037000500, 0})));  // just over 2 to the 63rd
 }
 
 TEST(ModeTwin, GivesATieToTheValueMetFirstColumnByColumn) {
-  const V<V<uint8_t>> tie = {{7, 9, 9},
-                             {7, 5, 9},
-                             {7, 7, 9}};
+  const V<V<uint8_t>> tie = {{7, 9, 9}, {7, 5, 9}, {7, 7, 9}};
   EXPECT_EQ((V<uint8_t>{7}), Apply(Mode<uint8_t>, Draw(tie, 1), 1, 1, Settings{}));
   const V<V<uint8_t>> distinct = {{1, 2, 3}, {4, 5, 6}, {7, 8, 9}};
   EXPECT_EQ((V<uint8_t>{1}), Apply(Mode<uint8_t>, Draw(distinct, 1), 1, 1, Settings{}));
@@ -222,7 +223,7 @@ TEST(ModeTwin, HasAnAbsoluteToleranceAndNoVoteForNotANumber) {
 TEST(BilinearTwin, HalvesToTheMeanOfFour) {
   const V<V<uint8_t>> drawn = {{0, 0, 0, 0}, {0, 1, 2, 0}, {0, 3, 4, 0}, {0, 0, 0, 0}};
   EXPECT_EQ((V<uint8_t>{3}), Apply(Bilinear<uint8_t>, Draw(drawn, 1), 1, 1, Settings{}));
-  EXPECT_EQ((V<uint8_t>{2}),   // (1 + 2 + 3 + 1) / 4: the invalid 4 counts as 1
+  EXPECT_EQ((V<uint8_t>{2}),  // (1 + 2 + 3 + 1) / 4: the invalid 4 counts as 1
             Apply(Bilinear<uint8_t>, Draw(drawn, 1), 1, 1, Settings{}, {0xFF, 0xDF}));
   EXPECT_EQ((V<uint8_t>{0}),
             Apply(Bilinear<uint8_t>, Draw(drawn, 1), 1, 1, Settings{}, {0xFB, 0xFF}));

@@ -23,8 +23,8 @@
 namespace orin::testing {
 
 template <class T>
-using Twin = void (*)(const reference::Block<T>&, const reference::Bits*, const reference::Block<T>&,
-                      const reference::Settings&);
+using Twin = void (*)(const reference::Block<T>&, const reference::Bits*,
+                      const reference::Block<T>&, const reference::Settings&);
 
 template <class T>
 reference::Block<T> BlockOf(TestRaster<T>& raster, const Geometry& g, uint32_t channels,
@@ -47,7 +47,7 @@ struct CaseData {
 
   TestRaster<T> src, expected, actual;
   std::optional<TestMask> mask;
-  std::vector<T> before;   ///< the source's pixels
+  std::vector<T> before;  ///< the source's pixels
 };
 
 /// \returns false when the case has no defined answer
@@ -69,7 +69,7 @@ bool RunTwin(Twin<T> twin, const Case& c, CaseData<T>& data) {
 inline void Configure(IRasterResampler& resampler, const reference::Settings& s, uint64_t seed) {
   if (s.ratioGiven) {
     resampler.SetRatio(s.ratioX, s.ratioY);
-  } else if (seed % 2 == 0) {   // a ratio taken back is no ratio
+  } else if (seed % 2 == 0) {  // a ratio taken back is no ratio
     resampler.SetRatio(7, 0.01);
     resampler.ClearRatio();
   }
@@ -150,8 +150,8 @@ class Differential {
   uint64_t seed_ = 0;
 };
 
-using EveryPixelType = ::testing::Types<int8_t, uint8_t, int16_t, uint16_t, int32_t, uint32_t, float,
-                                        double, int64_t, uint64_t>;
+using EveryPixelType = ::testing::Types<int8_t, uint8_t, int16_t, uint16_t, int32_t, uint32_t,
+                                        float, double, int64_t, uint64_t>;
 
 struct PixelTypeNames {
   template <class T>
