@@ -129,10 +129,12 @@ class Scanner {
   static constexpr std::string_view kItem = "<Item";
 
   bool EndsName(size_t at) const {
-    return at < rest_.size() && (kBlanks.find(rest_[at]) != kBlanks.npos || rest_[at] == '>' ||
-                                 rest_[at] == '/');
+    return at < rest_.size() &&
+           (kBlanks.find(rest_[at]) != kBlanks.npos || rest_[at] == '>' || rest_[at] == '/');
   }
-  void SkipBlanks() { rest_.remove_prefix(std::min(rest_.find_first_not_of(kBlanks), rest_.size())); }
+  void SkipBlanks() {
+    rest_.remove_prefix(std::min(rest_.find_first_not_of(kBlanks), rest_.size()));
+  }
   bool Skip(std::string_view expected) {
     if (rest_.substr(0, expected.size()) != expected) return false;
     rest_.remove_prefix(expected.size());

@@ -12,9 +12,10 @@ namespace orin::drivers {
 namespace {
 
 [[noreturn]] void RefuseLayout(const TiffHandle& tiff, const std::string& layout) {
-  throw Exception(FormatString(_("%s: cannot be read: %s are not supported. Convert the file first."),
-                               tiff.Path().c_str(), layout.c_str()),
-                  "host/drivers/tiff/pixelformat", "FormatOf(const TiffHandle&)", 0);
+  throw Exception(
+      FormatString(_("%s: cannot be read: %s are not supported. Convert the file first."),
+                   tiff.Path().c_str(), layout.c_str()),
+      "host/drivers/tiff/pixelformat", "FormatOf(const TiffHandle&)", 0);
 }
 
 template <class T>
@@ -33,7 +34,8 @@ uint32_t DeliveredBits(uint32_t bits, bool isFloat) {
 std::optional<gobs::DataType> TypeOf(uint32_t bitsPerSample, uint16_t sampleFormat) {
   const bool isComplex =
       sampleFormat == SAMPLEFORMAT_COMPLEXINT || sampleFormat == SAMPLEFORMAT_COMPLEXIEEEFP;
-  const bool isFloat = sampleFormat == SAMPLEFORMAT_IEEEFP || sampleFormat == SAMPLEFORMAT_COMPLEXIEEEFP;
+  const bool isFloat =
+      sampleFormat == SAMPLEFORMAT_IEEEFP || sampleFormat == SAMPLEFORMAT_COMPLEXIEEEFP;
   const bool isSigned = isFloat || sampleFormat == SAMPLEFORMAT_INT || isComplex;
   if (bitsPerSample == 1 && !isSigned) return gobs::eDT_BIT;
   const uint32_t stored = isComplex ? bitsPerSample / 2 : bitsPerSample;
@@ -55,8 +57,9 @@ void ReadSampleLayout(const TiffHandle& tiff, PixelFormat& format) {
   format.swapped = TIFFIsByteSwapped(tiff.Get()) != 0;
   const auto type = TypeOf(format.bitsPerSample, format.sampleFormat);
   if (!type || format.samplesPerPixel == 0)
-    RefuseLayout(tiff, FormatString(_("%u samples a pixel of %u bits with sample format %u"),
-                                    format.samplesPerPixel, format.bitsPerSample, format.sampleFormat));
+    RefuseLayout(tiff,
+                 FormatString(_("%u samples a pixel of %u bits with sample format %u"),
+                              format.samplesPerPixel, format.bitsPerSample, format.sampleFormat));
   format.type = *type;
 }
 
@@ -64,16 +67,19 @@ void ReadGrid(const TiffHandle& tiff, PixelFormat& format) {
   format.width = Field<uint32_t>(tiff, TIFFTAG_IMAGEWIDTH, 0);
   format.height = Field<uint32_t>(tiff, TIFFTAG_IMAGELENGTH, 0);
   if (format.width == 0 || format.height == 0) RefuseLayout(tiff, _("images without pixels"));
-  if (Field<uint32_t>(tiff, TIFFTAG_IMAGEDEPTH, 1) > 1) RefuseLayout(tiff, _("images of several layers"));
+  if (Field<uint32_t>(tiff, TIFFTAG_IMAGEDEPTH, 1) > 1)
+    RefuseLayout(tiff, _("images of several layers"));
   format.tiled = TIFFIsTiled(tiff.Get()) != 0;
   if (format.tiled) {
     format.tileWidth = Field<uint32_t>(tiff, TIFFTAG_TILEWIDTH, 0);
     format.tileHeight = Field<uint32_t>(tiff, TIFFTAG_TILELENGTH, 0);
   } else {
     format.tileWidth = format.width;
-    format.tileHeight = std::min(Field<uint32_t>(tiff, TIFFTAG_ROWSPERSTRIP, format.height), format.height);
+    format.tileHeight =
+        std::min(Field<uint32_t>(tiff, TIFFTAG_ROWSPERSTRIP, format.height), format.height);
   }
-  if (format.tileWidth == 0 || format.tileHeight == 0) RefuseLayout(tiff, _("tiles without pixels"));
+  if (format.tileWidth == 0 || format.tileHeight == 0)
+    RefuseLayout(tiff, _("tiles without pixels"));
   if (format.TilesPerPlane() > std::numeric_limits<uint32_t>::max() / format.samplesPerPixel)
     RefuseLayout(tiff, _("images of more than 4294967295 tiles"));
 }
@@ -90,7 +96,8 @@ void SetUpColours(const TiffHandle& tiff, const PixelFormat& format) {
   uint16_t across = 1, down = 1;
   TIFFGetFieldDefaulted(tiff.Get(), TIFFTAG_YCBCRSUBSAMPLING, &across, &down);
   if (across != 1 || down != 1)
-    RefuseLayout(tiff, FormatString(_("subsampled YCbCr pixels in compression %u"), format.compression));
+    RefuseLayout(tiff,
+                 FormatString(_("subsampled YCbCr pixels in compression %u"), format.compression));
 }
 
 std::string Trim(const std::string& text) {

@@ -15,7 +15,7 @@ struct PixelFormat {
   uint32_t width = 0;   ///< pixels
   uint32_t height = 0;  ///< pixels
   uint32_t samplesPerPixel = 0;
-  gobs::DataType type;         ///< as delivered: odd widths widened to 8, 16 or 32 bits, JPEG YCbCr as RGB
+  gobs::DataType type;  ///< as delivered: odd widths widened to 8, 16 or 32 bits, JPEG YCbCr as RGB
   uint32_t bitsPerSample = 0;  ///< as stored; both components of a complex sample together
   uint32_t tileWidth = 0;      ///< pixels; strips: the image's width
   uint32_t tileHeight = 0;     ///< pixels; strips: rows per strip, at most the image's height
@@ -26,7 +26,8 @@ struct PixelFormat {
   uint16_t photometric = 0;
   uint16_t fillOrder = 1;
   uint16_t sampleFormat = 1;
-  std::string noData;  ///< text of the no-data tag, blanks at its ends removed; empty when there is none
+  std::string
+      noData;  ///< text of the no-data tag, blanks at its ends removed; empty when there is none
 
   /// Bytes of a delivered sample, both components of a complex one; the bit type takes one.
   uint32_t SampleBytes() const { return BytesPerComponent(type) * ComponentsPerSample(type); }
@@ -42,7 +43,8 @@ struct PixelFormat {
   bool WholeBytes() const { return bitsPerSample == SampleBytes() * 8; }
 };
 
-/// The format of the directory at which `tiff` stands; libtiff is set up to deliver RGB where it can.
+/// The format of the directory at which `tiff` stands; libtiff is set up to deliver RGB where it
+/// can.
 /// \throws orin::Exception  a layout that is not supported; the text names the file and the layout
 PixelFormat FormatOf(const TiffHandle& tiff);
 

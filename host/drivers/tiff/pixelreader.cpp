@@ -12,11 +12,11 @@
 namespace orin::drivers {
 namespace {
 
-constexpr uint64_t kLongStrip = uint64_t{16} << 20;     // bytes; a longer one is decoded in bands
-constexpr uint64_t kBand = uint64_t{2} << 20;           // bytes
-constexpr uint64_t kRawChunk = uint64_t{1} << 20;       // bytes of one positioned read
-constexpr uint64_t kSmallCache = uint64_t{32} << 20;    // bytes that are always granted
-constexpr uint64_t kLargeCache = uint64_t{256} << 20;   // bytes that strips may take
+constexpr uint64_t kLongStrip = uint64_t{16} << 20;    // bytes; a longer one is decoded in bands
+constexpr uint64_t kBand = uint64_t{2} << 20;          // bytes
+constexpr uint64_t kRawChunk = uint64_t{1} << 20;      // bytes of one positioned read
+constexpr uint64_t kSmallCache = uint64_t{32} << 20;   // bytes that are always granted
+constexpr uint64_t kLargeCache = uint64_t{256} << 20;  // bytes that strips may take
 
 uint32_t BandRows(const TileDecoder& decoder) {
   const PixelFormat& format = decoder.Format();
@@ -51,10 +51,12 @@ PixelReader::PixelReader(const std::string& path, uint64_t directoryOffset,
     Plane plane{0, {}, std::vector<uint32_t>(channels.size()), false};
     for (const unsigned channel : channels) plane.samples.push_back(channel - 1);
     std::iota(plane.channels.begin(), plane.channels.end(), 0);
-    plane.wholePixels = plane.samples == plane.channels && channels.size() == Format().samplesPerPixel;
+    plane.wholePixels =
+        plane.samples == plane.channels && channels.size() == Format().samplesPerPixel;
     planes_.push_back(std::move(plane));
   }
-  if (bandRows_ < Format().tileHeight)  // one position each: going back means decoding from the start
+  if (bandRows_ <
+      Format().tileHeight)  // one position each: going back means decoding from the start
     for (size_t i = 1; i < planes_.size(); ++i)
       planeDecoders_.push_back(std::make_unique<TileDecoder>(path, directoryOffset));
 }
@@ -95,8 +97,8 @@ PixelReader::Unit PixelReader::UnitAt(int64_t x, int64_t y) const {
   unit.x = column * format.tileWidth;
   unit.y = gridRow * format.tileHeight + unit.firstRow;
   unit.width = std::min<int64_t>(format.tileWidth, format.width - unit.x);
-  unit.rows = static_cast<uint32_t>(std::min<int64_t>(
-      {bandRows_, format.tileHeight - unit.firstRow, format.height - unit.y}));
+  unit.rows = static_cast<uint32_t>(
+      std::min<int64_t>({bandRows_, format.tileHeight - unit.firstRow, format.height - unit.y}));
   return unit;
 }
 
@@ -110,7 +112,8 @@ void PixelReader::LimitCache(const datasources::InsideWindow& window) {
   const uint64_t unitRowBytes = touched(window.x, window.width, format.tileWidth) * planes_.size() *
                                 format.TileRowBytes() * bandRows_;
   const uint64_t rows = format.tiled ? 2 : touched(window.y, window.height, bandRows_) + 1;
-  const uint64_t wanted = format.tiled ? rows * unitRowBytes : std::min(rows * unitRowBytes, kLargeCache);
+  const uint64_t wanted =
+      format.tiled ? rows * unitRowBytes : std::min(rows * unitRowBytes, kLargeCache);
   cache_.SetLimit(std::max(kSmallCache, wanted));
 }
 
@@ -146,7 +149,8 @@ PixelReader::Rows PixelReader::Decoded(const Unit& unit, size_t plane, bool keep
   const uint64_t key = uint64_t{unit.tile} << 32 | unit.firstRow;
   if (const uint8_t* found = cache_.Find(key)) return {found, rowBytes};
   decoder_.RequireDecodable(unit.tile, bandRows_);
-  if (!keep && !scratch_) scratch_ = std::make_unique_for_overwrite<uint8_t[]>(bandRows_ * rowBytes);
+  if (!keep && !scratch_)
+    scratch_ = std::make_unique_for_overwrite<uint8_t[]>(bandRows_ * rowBytes);
   TileCache::Buffer kept = keep ? cache_.NewBuffer() : nullptr;
   uint8_t* samples = keep ? kept.get() : scratch_.get();
   if (bandRows_ == format.tileHeight) decoder_.Decode(unit.tile, samples);
@@ -167,15 +171,18 @@ void PixelReader::CopyRaw(const Unit& unit, const Plane& plane, const Piece& pie
     return;
   }
   if (!scratch_) scratch_ = std::make_unique_for_overwrite<uint8_t[]>(kRawChunk);
-  const bool wholeRows = rowBytes <= kRawChunk && uint64_t(piece.width) * pixelBytes * 4 >= rowBytes;
+  const bool wholeRows =
+      rowBytes <= kRawChunk && uint64_t(piece.width) * pixelBytes * 4 >= rowBytes;
   const int64_t chunkHeight = wholeRows ? int64_t(kRawChunk / rowBytes) : 1;
   const int64_t chunkWidth = wholeRows ? piece.width : int64_t(kRawChunk / pixelBytes);
   for (int64_t y = 0; y < piece.height; y += chunkHeight)
     for (int64_t x = 0; x < piece.width; x += chunkWidth) {
       const Piece chunk{piece.x + x, piece.y + y, std::min(chunkWidth, piece.width - x),
                         std::min(chunkHeight, piece.height - y)};
-      const uint64_t from = start + uint64_t(y) * rowBytes + (wholeRows ? 0 : skipped + uint64_t(x) * pixelBytes);
-      const uint64_t count = wholeRows ? uint64_t(chunk.height) * rowBytes : uint64_t(chunk.width) * pixelBytes;
+      const uint64_t from =
+          start + uint64_t(y) * rowBytes + (wholeRows ? 0 : skipped + uint64_t(x) * pixelBytes);
+      const uint64_t count =
+          wholeRows ? uint64_t(chunk.height) * rowBytes : uint64_t(chunk.width) * pixelBytes;
       decoder_.ReadRaw(unit.tile, from, count, scratch_.get());
       CopyRows({scratch_.get() + (wholeRows ? skipped : 0), rowBytes}, plane, chunk, block);
     }
@@ -183,7 +190,8 @@ void PixelReader::CopyRaw(const Unit& unit, const Plane& plane, const Piece& pie
 
 void PixelReader::FillSparse(const Plane& plane, const Piece& piece, gobs::Raster& block) const {
   const std::vector<uint8_t>& sample = decoder_.SparseSample();
-  const bool oneByte = std::count(sample.begin(), sample.end(), sample[0]) == int64_t(sample.size());
+  const bool oneByte =
+      std::count(sample.begin(), sample.end(), sample[0]) == int64_t(sample.size());
   for (int64_t y = piece.y; y < piece.y + piece.height; ++y) {
     uint8_t* to = PixelAddress(block, piece.x - block.x, y - block.y);
     const auto count = uint64_t(piece.width);
@@ -202,8 +210,7 @@ void PixelReader::CopyRows(const Rows& rows, const Plane& plane, const Piece& pi
   for (int64_t row = 0; row < piece.height; ++row) {
     const uint8_t* from = rows.first + uint64_t(row) * rows.bytes;
     uint8_t* to = PixelAddress(block, piece.x - block.x, piece.y + row - block.y);
-    if (plane.wholePixels)
-      std::memcpy(to, from, uint64_t(piece.width) * blockPixel);
+    if (plane.wholePixels) std::memcpy(to, from, uint64_t(piece.width) * blockPixel);
     else
       for (size_t i = 0; i < plane.samples.size(); ++i)
         copy_(from + plane.samples[i] * sampleBytes, Format().TileSamples(),

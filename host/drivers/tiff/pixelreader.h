@@ -16,8 +16,8 @@
 
 namespace orin::drivers {
 
-/// Has handles of its own; not for two threads at once. A directory that is written meanwhile must have
-/// been complete on disk when the reader was made.
+/// Has handles of its own; not for two threads at once. A directory that is written meanwhile must
+/// have been complete on disk when the reader was made.
 class PixelReader {
  public:
   /// \param directoryOffset  in bytes; 0 is the first directory, any level's directory will do
@@ -27,8 +27,9 @@ class PixelReader {
 
   const PixelFormat& Format() const { return decoder_.Format(); }
 
-  /// Fills the whole buffer of `block`: the pixels at its place, margins that lie in the image included;
-  /// beyond the image the edge pixels are repeated. The bit type takes one byte a sample, 0 or 1.
+  /// Fills the whole buffer of `block`: the pixels at its place, margins that lie in the image
+  /// included; beyond the image the edge pixels are repeated. The bit type takes one byte a sample,
+  /// 0 or 1.
   /// \pre the block has the reader's channel count, the format's type, and lies in the image
   /// \throws orin::Exception  the pixels cannot be read; the text names the file and the tile
   void Read(gobs::Raster& block);
@@ -51,7 +52,7 @@ class PixelReader {
     uint32_t tile;
     uint32_t firstRow;  ///< within the tile
     uint32_t rows;
-    int64_t x, y;       ///< of its first pixel, in the image
+    int64_t x, y;  ///< of its first pixel, in the image
     int64_t width;
   };
   /// Pixels to move, in the image.
@@ -70,13 +71,15 @@ class PixelReader {
   void ReadUnit(const Unit& unit, const Piece& piece, gobs::Raster& block);
   void CopyRaw(const Unit& unit, const Plane& plane, const Piece& piece, gobs::Raster& block);
   void FillSparse(const Plane& plane, const Piece& piece, gobs::Raster& block) const;
-  void CopyRows(const Rows& rows, const Plane& plane, const Piece& piece, gobs::Raster& block) const;
+  void CopyRows(const Rows& rows, const Plane& plane, const Piece& piece,
+                gobs::Raster& block) const;
   Rows Decoded(const Unit& unit, size_t plane, bool keep);
 
   TileDecoder decoder_;
   std::vector<Plane> planes_;
   uint32_t bandRows_;  ///< rows decoded together; the tile's height but for long compressed strips
-  std::vector<std::unique_ptr<TileDecoder>> planeDecoders_;  ///< where each plane keeps its position
+  std::vector<std::unique_ptr<TileDecoder>>
+      planeDecoders_;  ///< where each plane keeps its position
   CopySamples copy_;
   TileCache cache_;
   TileCache::Buffer scratch_;

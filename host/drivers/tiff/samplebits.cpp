@@ -84,7 +84,8 @@ template <class T>
 void PackBytewise(const uint8_t* samples, uint64_t count, uint8_t* packed) {
   for (uint64_t i = 0; i < count; ++i, packed += 3) {
     const uint32_t value = Narrow<T>(Load<T>(samples + i * sizeof(T)), kBytewiseBits);
-    for (int byte = 0; byte < 3; ++byte) packed[byte] = static_cast<uint8_t>(value >> ByteShift(byte));
+    for (int byte = 0; byte < 3; ++byte)
+      packed[byte] = static_cast<uint8_t>(value >> ByteShift(byte));
   }
 }
 

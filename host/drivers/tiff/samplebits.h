@@ -15,8 +15,8 @@ namespace orin::drivers {
 void UnpackSamples(const uint8_t* packed, uint32_t bits, uint64_t count, bool isSigned,
                    uint8_t* samples, uint32_t bytesPerSample);
 
-/// The reverse; a value that `bits` cannot hold becomes the nearest that they can. The last byte of the
-/// row is filled up with zero bits.
+/// The reverse; a value that `bits` cannot hold becomes the nearest that they can. The last byte of
+/// the row is filled up with zero bits.
 /// \param packed  receives PackedBytes(count, bits) bytes
 void PackSamples(const uint8_t* samples, uint32_t bytesPerSample, uint64_t count, uint32_t bits,
                  bool isSigned, uint8_t* packed);

@@ -7,7 +7,8 @@ namespace orin::drivers {
 namespace {
 
 template <uint32_t Bytes>
-void Copy(const uint8_t* from, uint64_t fromStride, uint8_t* to, uint64_t toStride, uint64_t count) {
+void Copy(const uint8_t* from, uint64_t fromStride, uint8_t* to, uint64_t toStride,
+          uint64_t count) {
   if (fromStride == 1 && toStride == 1) {
     std::memcpy(to, from, count * Bytes);
     return;
@@ -20,11 +21,16 @@ void Copy(const uint8_t* from, uint64_t fromStride, uint8_t* to, uint64_t toStri
 
 CopySamples CopierOf(uint32_t sampleBytes) {
   switch (sampleBytes) {
-    case 1: return Copy<1>;
-    case 2: return Copy<2>;
-    case 4: return Copy<4>;
-    case 8: return Copy<8>;
-    default: return Copy<16>;
+    case 1:
+      return Copy<1>;
+    case 2:
+      return Copy<2>;
+    case 4:
+      return Copy<4>;
+    case 8:
+      return Copy<8>;
+    default:
+      return Copy<16>;
   }
 }
 

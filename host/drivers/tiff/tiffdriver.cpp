@@ -17,7 +17,8 @@ namespace {
 
 using namespace std::string_view_literals;
 
-constexpr std::array kMagics = {"II*\0"sv, "MM\0*"sv, "II+\0"sv, "MM\0+"sv};  // classic, then BigTIFF
+constexpr std::array kMagics = {"II*\0"sv, "MM\0*"sv, "II+\0"sv,
+                                "MM\0+"sv};  // classic, then BigTIFF
 
 class TiffDriver final : public datasources::IFormatDriver {
  public:
@@ -29,7 +30,8 @@ class TiffDriver final : public datasources::IFormatDriver {
     struct stat status;
     if (stat(file.c_str(), &status) != 0 || !S_ISREG(status.st_mode)) return kFormatUnknown;
     std::array<char, 4> magic{};
-    if (!std::ifstream(file, std::ios::binary).read(magic.data(), magic.size())) return kFormatUnknown;
+    if (!std::ifstream(file, std::ios::binary).read(magic.data(), magic.size()))
+      return kFormatUnknown;
     for (const std::string_view known : kMagics)
       if (known == std::string_view(magic.data(), magic.size())) return kFormatTiff;
     return kFormatUnknown;

@@ -25,7 +25,10 @@ using datasources::kNoDataKey;
 class TiffReader final : public datasources::ReaderState<datasources::IRasterReader> {
  public:
   TiffReader(const std::string& file, std::vector<unsigned> channels, AuxiliaryData metadata)
-      : file_(file), channels_(std::move(channels)), metadata_(std::move(metadata)), pixels_(file, 0, channels_) {}
+      : file_(file),
+        channels_(std::move(channels)),
+        metadata_(std::move(metadata)),
+        pixels_(file, 0, channels_) {}
 
   unsigned GetWidth() const override { return pixels_.Format().width; }
   unsigned GetHeight() const override { return pixels_.Format().height; }
@@ -68,7 +71,8 @@ bool IsFiniteDecimal(const std::string& text) {
 }
 
 /// Items of the file (no sample) or of one of its channels.
-AuxiliaryData::Items ItemsOf(const std::vector<MetadataItem>& metadata, std::optional<unsigned> sample) {
+AuxiliaryData::Items ItemsOf(const std::vector<MetadataItem>& metadata,
+                             std::optional<unsigned> sample) {
   AuxiliaryData::Items items;
   for (const MetadataItem& item : metadata)
     if (item.domain.empty() && item.sample == sample) items.emplace(item.name, item.text);
@@ -82,9 +86,9 @@ TiffSource::TiffSource(std::string file, datasources::AccessMode access) : file_
   const TiffHandle tiff = TiffHandle::OpenAt(file_, 0);
   format_ = FormatOf(tiff);
   metadata_ = ParseMetadata(tiff.TextOf(TIFFTAG_GDAL_METADATA));
-  const bool declared = std::any_of(metadata_.begin(), metadata_.end(), [](const MetadataItem& item) {
-    return item.domain.empty() && item.name == kNoDataKey;
-  });
+  const bool declared = std::any_of(
+      metadata_.begin(), metadata_.end(),
+      [](const MetadataItem& item) { return item.domain.empty() && item.name == kNoDataKey; });
   if (!declared && IsFiniteDecimal(format_.noData))
     metadata_.push_back({kNoDataKey, std::nullopt, "", "", format_.noData});
 }
@@ -97,7 +101,8 @@ AuxiliaryData TiffSource::MetadataOf(const std::vector<unsigned>& channels) cons
   return {ItemsOf(metadata_, std::nullopt), std::move(channelItems)};
 }
 
-std::unique_ptr<datasources::IRasterReader> TiffSource::OpenReader(const std::vector<unsigned>& channels) {
+std::unique_ptr<datasources::IRasterReader> TiffSource::OpenReader(
+    const std::vector<unsigned>& channels) {
   return std::make_unique<TiffReader>(file_, channels, MetadataOf(channels));
 }
 

@@ -27,10 +27,11 @@ class TiffSource final : public datasources::IRasterSource {
   unsigned Height() const override { return format_.height; }
   unsigned ChannelCount() const override { return format_.samplesPerPixel; }
   gobs::DataType TypeOf(unsigned) const override { return format_.type; }
-  /// Items of the default domain. The no-data value is the item of that name, else the no-data tag where
-  /// that is a finite decimal number.
+  /// Items of the default domain. The no-data value is the item of that name, else the no-data tag
+  /// where that is a finite decimal number.
   datasources::AuxiliaryData MetadataOf(const std::vector<unsigned>& channels) const override;
-  std::unique_ptr<datasources::IRasterReader> OpenReader(const std::vector<unsigned>& channels) override;
+  std::unique_ptr<datasources::IRasterReader> OpenReader(
+      const std::vector<unsigned>& channels) override;
   datasources::ILevelStore* Levels() override { return levels_.get(); }
 
  private:

@@ -36,7 +36,8 @@ class TileCache {
       index_.erase(tiles_.back().first);
       tiles_.pop_back();
     }
-    return recycled ? std::move(recycled) : std::make_unique_for_overwrite<uint8_t[]>(bytesPerTile_);
+    return recycled ? std::move(recycled)
+                    : std::make_unique_for_overwrite<uint8_t[]>(bytesPerTile_);
   }
 
   /// \returns the samples, as `Find` would

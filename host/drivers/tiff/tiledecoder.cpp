@@ -46,12 +46,14 @@ TileDecoder::TileDecoder(const std::string& path, uint64_t directoryOffset)
 }
 
 void TileDecoder::Fail(uint32_t tile, const std::string& reason) const {
-  FailToRead(tiff_.Path(), FormatString(format_.tiled ? _("tile %u: %s") : _("strip %u: %s"), tile,
-                                        reason.empty() ? _("its data are damaged") : reason.c_str()));
+  FailToRead(tiff_.Path(),
+             FormatString(format_.tiled ? _("tile %u: %s") : _("strip %u: %s"), tile,
+                          reason.empty() ? _("its data are damaged") : reason.c_str()));
 }
 
 bool TileDecoder::IsSparse(uint32_t tile) const {
-  return TIFFGetStrileByteCount(tiff_.Get(), tile) == 0 || TIFFGetStrileOffset(tiff_.Get(), tile) == 0;
+  return TIFFGetStrileByteCount(tiff_.Get(), tile) == 0 ||
+         TIFFGetStrileOffset(tiff_.Get(), tile) == 0;
 }
 
 uint32_t TileDecoder::RowsOf(uint32_t tile) const {
@@ -67,15 +69,17 @@ void TileDecoder::RequireDecodable(uint32_t tile, uint32_t rows) const {
     Fail(tile, _("the file ends before it does"));
   const uint64_t rowBytes = std::max(storedRowBytes_, format_.TileRowBytes());
   if (rowBytes > kLargestTile / rows)
-    Fail(tile, FormatString(_("it takes %u times %llu bytes, more than the %llu that are supported"),
-                            rows, static_cast<unsigned long long>(rowBytes),
-                            static_cast<unsigned long long>(kLargestTile)));
+    Fail(tile,
+         FormatString(_("it takes %u times %llu bytes, more than the %llu that are supported"),
+                      rows, static_cast<unsigned long long>(rowBytes),
+                      static_cast<unsigned long long>(kLargestTile)));
 }
 
 void TileDecoder::ReadRaw(uint32_t tile, uint64_t from, uint64_t count, uint8_t* bytes) const {
   const uint64_t start = TIFFGetStrileOffset(tiff_.Get(), tile);
   const uint64_t held = TIFFGetStrileByteCount(tiff_.Get(), tile);
-  if (from > held || count > held - from) Fail(tile, _("it holds fewer bytes than its pixels take"));
+  if (from > held || count > held - from)
+    Fail(tile, _("it holds fewer bytes than its pixels take"));
   if (start > tiff_.FileSize() || from + count > tiff_.FileSize() - start)
     Fail(tile, _("the file ends before it does"));
   while (count > 0) {
@@ -143,8 +147,9 @@ void TileDecoder::Deliver(const uint8_t* stored, uint64_t rows, uint8_t* samples
   const uint64_t count = uint64_t{format_.tileWidth} * format_.TileSamples();
   if (!format_.WholeBytes())
     for (uint64_t row = 0; row < rows; ++row)
-      UnpackSamples(stored + row * storedRowBytes_, format_.bitsPerSample, count, format_.type.isSigned,
-                    samples + row * format_.TileRowBytes(), format_.SampleBytes());
+      UnpackSamples(stored + row * storedRowBytes_, format_.bitsPerSample, count,
+                    format_.type.isSigned, samples + row * format_.TileRowBytes(),
+                    format_.SampleBytes());
   else if (PartsAreExchanged(format_))
     for (uint64_t i = 0; i < rows * count; ++i) std::swap(samples[2 * i], samples[2 * i + 1]);
 }

@@ -12,8 +12,8 @@
 
 namespace orin::drivers {
 
-/// Has a handle of its own; not for two threads at once. Delivered rows are `Format().TileRowBytes()`
-/// bytes long, a tile's rows beyond the image's lower edge are zero.
+/// Has a handle of its own; not for two threads at once. Delivered rows are
+/// `Format().TileRowBytes()` bytes long, a tile's rows beyond the image's lower edge are zero.
 class TileDecoder {
  public:
   /// \param directoryOffset  in bytes; 0 is the first directory
