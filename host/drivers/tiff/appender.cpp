@@ -18,7 +18,8 @@ constexpr uint64_t kClassicLimit = std::numeric_limits<uint32_t>::max();
 
 uint64_t EvenFrom(uint64_t position) { return position + position % 2; }
 
-/// Lays out one directory: count, entries, link, then the values that do not fit into their entries.
+/// Lays out one directory: count, entries, link, then the values that do not fit into their
+/// entries.
 class Layout {
  public:
   Layout(bool isBig, ByteOrder byteOrder)
@@ -71,12 +72,14 @@ NewEntry NumbersEntry(uint16_t tag, uint16_t type, const std::vector<uint64_t>& 
   const unsigned width = ElementBytes(type);
   NewEntry entry{tag, type, numbers.size(), std::vector<uint8_t>(numbers.size() * width)};
   const ByteOrder machine;
-  for (size_t i = 0; i < numbers.size(); ++i) machine.Put(numbers[i], width, &entry.bytes[i * width]);
+  for (size_t i = 0; i < numbers.size(); ++i)
+    machine.Put(numbers[i], width, &entry.bytes[i * width]);
   return entry;
 }
 
 NewEntry TextEntry(uint16_t tag, const std::string& text) {
-  return {tag, TIFF_ASCII, text.size() + 1, std::vector<uint8_t>(text.c_str(), text.c_str() + text.size() + 1)};
+  return {tag, TIFF_ASCII, text.size() + 1,
+          std::vector<uint8_t>(text.c_str(), text.c_str() + text.size() + 1)};
 }
 
 Appender::Appender(PositionedFile& file, bool isBig, ByteOrder byteOrder)
@@ -86,10 +89,11 @@ uint64_t Appender::Reserve(uint64_t bytes) {
   const std::lock_guard lock(mutex_);
   const uint64_t position = EvenFrom(end_);
   if (!isBig_ && (position > kClassicLimit || bytes > kClassicLimit - position))
-    throw Exception(FormatString(_("%s: would pass 4 GiB, the limit of a classic TIFF; use --external, "
-                                   "or delete the side-car if this is one and build it again."),
-                                 file_.Path().c_str()),
-                    "host/drivers/tiff/appender", "Appender::Reserve(uint64_t)", 0);
+    throw Exception(
+        FormatString(_("%s: would pass 4 GiB, the limit of a classic TIFF; use --external, "
+                       "or delete the side-car if this is one and build it again."),
+                     file_.Path().c_str()),
+        "host/drivers/tiff/appender", "Appender::Reserve(uint64_t)", 0);
   end_ = position + bytes;
   return position;
 }

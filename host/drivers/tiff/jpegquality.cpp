@@ -12,11 +12,11 @@ namespace {
 using Table = std::array<int, 64>;
 
 /// The luminance table of quality 50, in the zigzag order of a stream.
-constexpr Table kLuminance = {
-    16, 11, 12, 14, 12, 10, 16, 14, 13, 14, 18,  17,  16,  19,  24,  40,
-    26, 24, 22, 22, 24, 49, 35, 37, 29, 40, 58,  51,  61,  60,  57,  51,
-    56, 55, 64, 72, 92, 78, 64, 68, 87, 69, 55,  56,  80,  109, 81,  87,
-    95, 98, 103, 104, 103, 62, 77, 113, 121, 112, 100, 120, 92, 101, 103, 99};
+constexpr Table kLuminance = {16,  11, 12, 14,  12,  10,  16,  14,  13, 14,  18,  17,  16,
+                              19,  24, 40, 26,  24,  22,  22,  24,  49, 35,  37,  29,  40,
+                              58,  51, 61, 60,  57,  51,  56,  55,  64, 72,  92,  78,  64,
+                              68,  87, 69, 55,  56,  80,  109, 81,  87, 95,  98,  103, 104,
+                              103, 62, 77, 113, 121, 112, 100, 120, 92, 101, 103, 99};
 
 /// The quantisation table 0 of the segment's payload, when it holds it in 8 bits.
 std::optional<Table> TableZero(const uint8_t* payload, size_t bytes) {

@@ -35,7 +35,8 @@ bool LevelBuild::IsEmpty() const {
 }
 
 void LevelBuild::Release(uint32_t plane) {
-  for (uint64_t tile = plane * tilesPerPlane_; tile < (plane + uint64_t{1}) * tilesPerPlane_; ++tile)
+  for (uint64_t tile = plane * tilesPerPlane_; tile < (plane + uint64_t{1}) * tilesPerPlane_;
+       ++tile)
     Forget(tile);
 }
 

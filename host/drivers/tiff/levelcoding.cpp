@@ -18,12 +18,18 @@ constexpr uint64_t kMostTileBytes = 64 << 20;
 constexpr uint64_t kMostTiles = 1 << 26;
 constexpr uint64_t kMostTagBytes = 1 << 20;
 
-constexpr std::array<uint16_t, 9> kInheritedTags = {
-    TIFFTAG_COLORMAP,         TIFFTAG_INKSET,            TIFFTAG_EXTRASAMPLES,
-    TIFFTAG_YCBCRCOEFFICIENTS, TIFFTAG_YCBCRSUBSAMPLING, TIFFTAG_YCBCRPOSITIONING,
-    TIFFTAG_REFERENCEBLACKWHITE, TIFFTAG_GDAL_NODATA,    TIFFTAG_LERC_PARAMETERS};
+constexpr std::array<uint16_t, 9> kInheritedTags = {TIFFTAG_COLORMAP,
+                                                    TIFFTAG_INKSET,
+                                                    TIFFTAG_EXTRASAMPLES,
+                                                    TIFFTAG_YCBCRCOEFFICIENTS,
+                                                    TIFFTAG_YCBCRSUBSAMPLING,
+                                                    TIFFTAG_YCBCRPOSITIONING,
+                                                    TIFFTAG_REFERENCEBLACKWHITE,
+                                                    TIFFTAG_GDAL_NODATA,
+                                                    TIFFTAG_LERC_PARAMETERS};
 constexpr std::array<uint16_t, 4> kYCbCrTags = {TIFFTAG_YCBCRCOEFFICIENTS, TIFFTAG_YCBCRSUBSAMPLING,
-                                                TIFFTAG_YCBCRPOSITIONING, TIFFTAG_REFERENCEBLACKWHITE};
+                                                TIFFTAG_YCBCRPOSITIONING,
+                                                TIFFTAG_REFERENCEBLACKWHITE};
 
 void DropInherited(LevelCoding& coding, const auto& isDropped) {
   std::erase_if(coding.inherited, [&](const NewEntry& entry) { return isDropped(entry.tag); });
@@ -85,8 +91,8 @@ LevelCoding CodingOf(const PositionedFile& file, const TiffStructure& structure,
   LevelCoding coding;
   coding.format = format;
   coding.byteOrder = structure.byteOrder;
-  coding.predictor =
-      static_cast<uint16_t>(NumberOf(file, structure, directory, TIFFTAG_PREDICTOR, PREDICTOR_NONE));
+  coding.predictor = static_cast<uint16_t>(
+      NumberOf(file, structure, directory, TIFFTAG_PREDICTOR, PREDICTOR_NONE));
   const auto subsampling = NumbersIn(file, structure, directory, TIFFTAG_YCBCRSUBSAMPLING);
   if (subsampling.size() == 2) {
     coding.subsamplingX = static_cast<uint16_t>(subsampling[0]);
@@ -95,14 +101,15 @@ LevelCoding CodingOf(const PositionedFile& file, const TiffStructure& structure,
   const auto lerc = NumbersIn(file, structure, directory, TIFFTAG_LERC_PARAMETERS);
   if (lerc.size() == 2) coding.lercExtra = static_cast<uint32_t>(lerc[1]);
   if (const TiffEntry* tables = directory.Find(TIFFTAG_JPEGTABLES))
-    coding.jpegQuality = JpegQualityOf(ReadBytes(file, structure, *tables)).value_or(coding.jpegQuality);
+    coding.jpegQuality =
+        JpegQualityOf(ReadBytes(file, structure, *tables)).value_or(coding.jpegQuality);
   coding.mayBeSparse = HasSparseTiles(file, structure, directory);
   Inherit(file, structure, directory, coding);
   return coding;
 }
 
-LevelCoding PlainCoding(uint32_t width, uint32_t height, uint32_t channels, const gobs::DataType& type,
-                        const std::string& noData) {
+LevelCoding PlainCoding(uint32_t width, uint32_t height, uint32_t channels,
+                        const gobs::DataType& type, const std::string& noData) {
   LevelCoding coding;
   PixelFormat& format = coding.format;
   format.width = width;
@@ -110,8 +117,9 @@ LevelCoding PlainCoding(uint32_t width, uint32_t height, uint32_t channels, cons
   format.samplesPerPixel = channels;
   format.type = type;
   format.bitsPerSample = type.bits * ComponentsPerSample(type);
-  format.sampleFormat = type.isComplex ? (type.isFloat ? SAMPLEFORMAT_COMPLEXIEEEFP : SAMPLEFORMAT_COMPLEXINT)
-                        : type.isFloat ? SAMPLEFORMAT_IEEEFP
+  format.sampleFormat = type.isComplex
+                            ? (type.isFloat ? SAMPLEFORMAT_COMPLEXIEEEFP : SAMPLEFORMAT_COMPLEXINT)
+                        : type.isFloat  ? SAMPLEFORMAT_IEEEFP
                         : type.isSigned ? SAMPLEFORMAT_INT
                                         : SAMPLEFORMAT_UINT;
   format.compression = COMPRESSION_ADOBE_DEFLATE;
@@ -120,8 +128,9 @@ LevelCoding PlainCoding(uint32_t width, uint32_t height, uint32_t channels, cons
   const bool isPlainInteger = !type.isFloat && !type.isComplex && type.bits >= 8;
   coding.predictor = isPlainInteger ? PREDICTOR_HORIZONTAL : PREDICTOR_NONE;
   if (channels > 1)
-    coding.inherited.push_back(NumbersEntry(TIFFTAG_EXTRASAMPLES, TIFF_SHORT,
-                                            std::vector<uint64_t>(channels - 1, EXTRASAMPLE_UNSPECIFIED)));
+    coding.inherited.push_back(
+        NumbersEntry(TIFFTAG_EXTRASAMPLES, TIFF_SHORT,
+                     std::vector<uint64_t>(channels - 1, EXTRASAMPLE_UNSPECIFIED)));
   if (!noData.empty()) coding.inherited.push_back(TextEntry(TIFFTAG_GDAL_NODATA, noData));
   return coding;
 }
@@ -142,7 +151,8 @@ LevelCoding CodingOfLevel(const LevelCoding& image, unsigned level, const std::s
   if (!keepsTiles) format.tileWidth = format.tileHeight = kTileEdge;
   format.tiled = true;
   format.fillOrder = FILLORDER_MSB2LSB;
-  if (format.TilesPerPlane() > kMostTiles / coding.Planes()) refuse(_("%s: level %u would have too many tiles."));
+  if (format.TilesPerPlane() > kMostTiles / coding.Planes())
+    refuse(_("%s: level %u would have too many tiles."));
   if (!TileEncoder::CanEncode(coding)) FallBackToDeflate(coding);
   return coding;
 }
@@ -174,7 +184,8 @@ std::vector<NewEntry> EntriesOf(const LevelCoding& coding) {
   add(TIFFTAG_COMPRESSION, TIFF_SHORT, {format.compression});
   add(TIFFTAG_PHOTOMETRIC, TIFF_SHORT, {format.photometric});
   add(TIFFTAG_SAMPLESPERPIXEL, TIFF_SHORT, {format.samplesPerPixel});
-  add(TIFFTAG_PLANARCONFIG, TIFF_SHORT, {format.planar ? uint64_t{PLANARCONFIG_SEPARATE} : PLANARCONFIG_CONTIG});
+  add(TIFFTAG_PLANARCONFIG, TIFF_SHORT,
+      {format.planar ? uint64_t{PLANARCONFIG_SEPARATE} : PLANARCONFIG_CONTIG});
   add(TIFFTAG_TILEWIDTH, TIFF_LONG, {format.tileWidth});
   add(TIFFTAG_TILELENGTH, TIFF_LONG, {format.tileHeight});
   add(TIFFTAG_SAMPLEFORMAT, TIFF_SHORT, forEachSample(format.sampleFormat));

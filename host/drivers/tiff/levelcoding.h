@@ -1,4 +1,5 @@
-/// How the pixels of a level are stored: everything that its directory and its tiles need to agree on.
+/// How the pixels of a level are stored: everything that its directory and its tiles need to agree
+/// on.
 // SPDX-License-Identifier: MIT
 #pragma once
 
@@ -18,8 +19,8 @@ struct LevelCoding {
   uint16_t subsamplingX = 2;  ///< of YCbCr
   uint16_t subsamplingY = 2;
   int jpegQuality = 90;
-  uint32_t lercExtra = 0;     ///< compression on top of LERC
-  bool mayBeSparse = false;   ///< tiles that hold nothing but no data need not be stored
+  uint32_t lercExtra = 0;           ///< compression on top of LERC
+  bool mayBeSparse = false;         ///< tiles that hold nothing but no data need not be stored
   std::vector<NewEntry> inherited;  ///< tags that describe the samples, copied as they are
 
   /// JPEG takes and gives RGB for stored YCbCr.
@@ -34,11 +35,11 @@ LevelCoding CodingOf(const PositionedFile& file, const TiffStructure& structure,
                      const TiffDirectory& directory, const PixelFormat& format);
 
 /// The coding of an image of no TIFF file: samples without meaning, DEFLATE.
-LevelCoding PlainCoding(uint32_t width, uint32_t height, uint32_t channels, const gobs::DataType& type,
-                        const std::string& noData);
+LevelCoding PlainCoding(uint32_t width, uint32_t height, uint32_t channels,
+                        const gobs::DataType& type, const std::string& noData);
 
-/// The coding for `level` of an image of coding `image`: its size, tiles of 16 pixels or more, and a
-/// compression that can be written here.
+/// The coding for `level` of an image of coding `image`: its size, tiles of 16 pixels or more, and
+/// a compression that can be written here.
 /// \throws orin::Exception  the level has no pixel, or too many tiles; the text names `file`
 LevelCoding CodingOfLevel(const LevelCoding& image, unsigned level, const std::string& file);
 

@@ -16,7 +16,8 @@ struct Range {
 
 /// The factors that turn `size` into `levelSize`, rounding down or up.
 Range FactorsOf(uint32_t size, uint32_t levelSize) {
-  const uint64_t low = uint64_t{size} / (uint64_t{levelSize} + 1) + 1;  // rounding down gives levelSize
+  const uint64_t low =
+      uint64_t{size} / (uint64_t{levelSize} + 1) + 1;  // rounding down gives levelSize
   if (levelSize <= 1) return {low, std::max<uint64_t>(low, size)};
   const uint64_t below = levelSize - 1;
   return {low, (size + below - 1) / below - 1};  // rounding up still gives levelSize
@@ -27,10 +28,12 @@ uint32_t Size(const PositionedFile& file, const TiffStructure& structure,
   return static_cast<uint32_t>(NumberOf(file, structure, directory, tag, 0));
 }
 
-uint64_t Subfile(const PositionedFile& file, const TiffStructure& structure, const TiffDirectory& directory) {
+uint64_t Subfile(const PositionedFile& file, const TiffStructure& structure,
+                 const TiffDirectory& directory) {
   constexpr uint64_t kOldReduced = 2;  // of the older OldSubfileType tag
-  const bool isOldReduced = !directory.Find(TIFFTAG_SUBFILETYPE) &&
-                            NumberOf(file, structure, directory, TIFFTAG_OSUBFILETYPE, 0) == kOldReduced;
+  const bool isOldReduced =
+      !directory.Find(TIFFTAG_SUBFILETYPE) &&
+      NumberOf(file, structure, directory, TIFFTAG_OSUBFILETYPE, 0) == kOldReduced;
   return isOldReduced ? uint64_t{FILETYPE_REDUCEDIMAGE}
                       : NumberOf(file, structure, directory, TIFFTAG_SUBFILETYPE, 0);
 }
@@ -66,7 +69,8 @@ std::optional<StoredLevel> LevelAt(const PositionedFile& file, const TiffStructu
   try {
     stored.format = FormatOf(TiffHandle::OpenAt(file.Path(), directory.offset));
   } catch (const Exception&) {
-    return std::nullopt;  // deliberate: what cannot be read is no level, and the rest of the file is fine
+    return std::nullopt;  // deliberate: what cannot be read is no level, and the rest of the file
+                          // is fine
   }
   if (stored.format.samplesPerPixel != image.samples || stored.format.type != image.type)
     return std::nullopt;
@@ -94,7 +98,8 @@ std::optional<unsigned> FactorOf(uint32_t width, uint32_t height, uint32_t level
     if (power >= low && (!best || std::abs(double(power) - ratio) < std::abs(*best - ratio)))
       best = static_cast<unsigned>(power);
   if (best) return best;
-  return static_cast<unsigned>(std::clamp<uint64_t>(static_cast<uint64_t>(std::llround(ratio)), low, high));
+  return static_cast<unsigned>(
+      std::clamp<uint64_t>(static_cast<uint64_t>(std::llround(ratio)), low, high));
 }
 
 std::vector<StoredLevel> FindLevels(const PositionedFile& file, const TiffStructure& structure,
@@ -127,8 +132,8 @@ Place PlaceOf(const TiffStructure& structure, size_t index) {
           directories[index].next};
 }
 
-Place PlaceOfNew(const PositionedFile& file, const TiffStructure& structure, const ImageShape& image,
-                 uint32_t width, uint32_t height) {
+Place PlaceOfNew(const PositionedFile& file, const TiffStructure& structure,
+                 const ImageShape& image, uint32_t width, uint32_t height) {
   const auto& directories = structure.directories;
   size_t index = image.isInFile ? 1 : 0;
   for (; index < directories.size(); ++index) {

@@ -24,8 +24,8 @@ struct ImageShape {
 
 struct StoredLevel {
   unsigned level = 0;
-  size_t index = 0;         ///< in the chain
-  bool isOurs = false;      ///< it carries a validity for every channel
+  size_t index = 0;     ///< in the chain
+  bool isOurs = false;  ///< it carries a validity for every channel
   PixelFormat format;
   LevelMetadata metadata;
   uint64_t validityPosition = 0;  ///< in the file
@@ -33,7 +33,8 @@ struct StoredLevel {
 
 /// The factor of a level that another program made, from its size, rounded down or up in each axis;
 /// none when the axes do not agree on one of 2 or more. A power of two wins, then the nearest.
-std::optional<unsigned> FactorOf(uint32_t width, uint32_t height, uint32_t levelWidth, uint32_t levelHeight);
+std::optional<unsigned> FactorOf(uint32_t width, uint32_t height, uint32_t levelWidth,
+                                 uint32_t levelHeight);
 
 /// The levels of the image, in the order of the chain; directories that fit no level are left out.
 std::vector<StoredLevel> FindLevels(const PositionedFile& file, const TiffStructure& structure,
@@ -47,8 +48,8 @@ struct Place {
 
 /// The place of a new level of that size: largest first, behind the image and its mask, before the
 /// image's first smaller level and before any other image of the file.
-Place PlaceOfNew(const PositionedFile& file, const TiffStructure& structure, const ImageShape& image,
-                 uint32_t width, uint32_t height);
+Place PlaceOfNew(const PositionedFile& file, const TiffStructure& structure,
+                 const ImageShape& image, uint32_t width, uint32_t height);
 /// The place of a directory that takes over that of directory `index`.
 Place PlaceOf(const TiffStructure& structure, size_t index);
 

@@ -47,8 +47,9 @@ void LevelFile::Refresh() {
 void LevelFile::OpenForChange() {
   if (appender_) return;
   if (!mayChange_)
-    throw Exception(FormatString(_("%s: is open for reading only; no level can be written."), path_.c_str()),
-                    "host/drivers/tiff/levelfile", "LevelFile::OpenForChange()", 0);
+    throw Exception(
+        FormatString(_("%s: is open for reading only; no level can be written."), path_.c_str()),
+        "host/drivers/tiff/levelfile", "LevelFile::OpenForChange()", 0);
   if (isMade_) file_ = std::make_unique<PositionedFile>(path_, PositionedFile::Mode::kUpdate);
   else Make();
   appender_ = std::make_unique<Appender>(*file_, structure_.isBig, structure_.byteOrder);
@@ -75,8 +76,8 @@ void LevelFile::Sync() {
   file_->Sync();
 }
 
-/// A cloud-optimized file says in a text behind its header that it keeps a certain order; this one will
-/// not any more. The text has a blank for the longer word.
+/// A cloud-optimized file says in a text behind its header that it keeps a certain order; this one
+/// will not any more. The text has a blank for the longer word.
 void LevelFile::DeclareEdited() {
   constexpr size_t kMostBytes = 4096;
   const std::string before = "KNOWN_INCOMPATIBLE_EDITION=NO\n ";

@@ -13,8 +13,8 @@
 
 namespace orin::drivers {
 
-/// Opened for writing by the first change only. A file that is made bears the name `PATH.partial` until
-/// its first directory is linked.
+/// Opened for writing by the first change only. A file that is made bears the name `PATH.partial`
+/// until its first directory is linked.
 class LevelFile {
  public:
   /// A file that is there. \throws orin::Exception  it cannot be read as TIFF
@@ -33,7 +33,8 @@ class LevelFile {
   /// Reads the structure again.
   void Refresh();
 
-  /// Ready to append. \throws orin::Exception  the file cannot be opened for writing, or not be made
+  /// Ready to append. \throws orin::Exception  the file cannot be opened for writing, or not be
+  /// made
   Appender& ToAppend();
   /// Changes bytes in place.
   void Overwrite(uint64_t position, const std::string& bytes);

@@ -26,7 +26,8 @@ size_t FindValidity(const std::string& text, const std::string& validity) {
   const size_t name = text.find(std::string("name=\"") + kValidity + '"');
   if (name == text.npos) return name;
   const size_t start = text.find('>', name);
-  const bool isThere = start != text.npos && text.compare(start + 1, validity.size(), validity) == 0;
+  const bool isThere =
+      start != text.npos && text.compare(start + 1, validity.size(), validity) == 0;
   return isThere ? start + 1 : text.npos;
 }
 
@@ -37,7 +38,8 @@ std::string ProgramName() { return "Orin Overviews " ORIN_VERSION; }
 std::string ComposeLevelMetadata(const LevelMetadata& metadata) {
   std::vector<MetadataItem> items;
   const auto add = [&](const char* name, std::string text) {
-    items.push_back({.name = name, .sample = {}, .role = {}, .domain = {}, .text = std::move(text)});
+    items.push_back(
+        {.name = name, .sample = {}, .role = {}, .domain = {}, .text = std::move(text)});
   };
   if (!metadata.method.empty()) add(kMethod, metadata.method);
   add(kFactor, std::to_string(metadata.level));

@@ -17,8 +17,9 @@ struct LevelMetadata {
   unsigned level = 0;        ///< decimation factor; 0 when the tag does not say
   unsigned sourceLevel = 0;  ///< 1 for full resolution; 0 unknown
   std::string program;
-  std::string validity;      ///< one character a channel; empty when the tag has none
-  uint64_t validityAt = 0;   ///< of its first character in the tag's text: changed in place, never moved
+  std::string validity;  ///< one character a channel; empty when the tag has none
+  uint64_t validityAt =
+      0;  ///< of its first character in the tag's text: changed in place, never moved
 };
 
 /// The name and version that levels are signed with.

@@ -1,4 +1,5 @@
-/// How a complete level gets into the file: its directory added and linked, or its tile table patched.
+/// How a complete level gets into the file: its directory added and linked, or its tile table
+/// patched.
 // SPDX-License-Identifier: MIT
 #include <algorithm>
 
@@ -41,7 +42,8 @@ LevelMetadata TiffLevelStore::MetadataFor(unsigned level, const Pending& pending
   metadata.level = level;
   metadata.sourceLevel = lastRead_ ? lastRead_ : settings_.usualSource;
   metadata.program = ProgramName();
-  metadata.validity = before ? before->metadata.validity : std::string(pending.channels.size(), kAbsent);
+  metadata.validity =
+      before ? before->metadata.validity : std::string(pending.channels.size(), kAbsent);
   for (size_t i = 0; i < pending.channels.size(); ++i)
     if (pending.channels[i]) metadata.validity[i] = kInvalid;
   return metadata;
@@ -82,8 +84,8 @@ void TiffLevelStore::Patch(const StoredLevel& stored, const LevelMetadata& metad
   file_->Sync();
 }
 
-void TiffLevelStore::AddDirectory(unsigned level, const LevelMetadata& metadata, const LevelBuild& build,
-                                  const std::vector<uint32_t>& planes) {
+void TiffLevelStore::AddDirectory(unsigned level, const LevelMetadata& metadata,
+                                  const LevelBuild& build, const std::vector<uint32_t>& planes) {
   const TiffStructure& structure = file_->Structure();
   const StoredLevel* before = Find(level);
   const uint64_t tiles = build.TilesPerPlane();
@@ -101,8 +103,9 @@ void TiffLevelStore::AddDirectory(unsigned level, const LevelMetadata& metadata,
   }
   entries.push_back(TextEntry(TIFFTAG_GDAL_METADATA, ComposeLevelMetadata(metadata)));
   const PixelFormat& format = build.Coding().format;
-  const Place place = before ? PlaceOf(structure, before->index)
-                             : PlaceOfNew(file_->File(), structure, settings_.image, format.width, format.height);
+  const Place place =
+      before ? PlaceOf(structure, before->index)
+             : PlaceOfNew(file_->File(), structure, settings_.image, format.width, format.height);
   file_->Link(place, file_->ToAppend().AppendDirectory(std::move(entries), place.next));
 }
 

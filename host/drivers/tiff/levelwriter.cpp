@@ -15,7 +15,11 @@ using gobs::Raster;
 
 LevelWriter::LevelWriter(TiffLevelStore& store, std::string file, unsigned level,
                          std::vector<unsigned> channels, const PixelFormat& format)
-    : store_(store), file_(std::move(file)), level_(level), channels_(std::move(channels)), format_(format) {}
+    : store_(store),
+      file_(std::move(file)),
+      level_(level),
+      channels_(std::move(channels)),
+      format_(format) {}
 
 LevelWriter::~LevelWriter() {
   if (build_) store_.EndWriting(level_, *build_);
@@ -107,12 +111,15 @@ void LevelWriter::CopyPixels(const Raster& block, const Piece& piece,
                              const std::vector<unsigned>& positions, OpenTile& to) const {
   const uint64_t sample = format_.SampleBytes();
   const uint64_t pixel = sample * format_.TileSamples();
-  const bool areWholePixels = positions.size() == format_.TileSamples() && positions.size() == channels_.size() &&
+  const bool areWholePixels = positions.size() == format_.TileSamples() &&
+                              positions.size() == channels_.size() &&
                               std::is_sorted(channels_.begin(), channels_.end());
   for (uint32_t row = 0; row < piece.height; ++row) {
-    const uint64_t first = uint64_t{piece.y - piece.tileY + row} * format_.tileWidth + (piece.x - piece.tileX);
+    const uint64_t first =
+        uint64_t{piece.y - piece.tileY + row} * format_.tileWidth + (piece.x - piece.tileX);
     uint8_t* target = &to.samples[first * pixel];
-    const uint64_t source = LayoutOf(block).Index(int64_t{piece.x} - block.x, int64_t{piece.y} - block.y + row);
+    const uint64_t source =
+        LayoutOf(block).Index(int64_t{piece.x} - block.x, int64_t{piece.y} - block.y + row);
     const uint8_t* from = block.data + source * sample * channels_.size();
     if (areWholePixels) {
       std::memcpy(target, from, piece.width * pixel);
@@ -120,8 +127,8 @@ void LevelWriter::CopyPixels(const Raster& block, const Piece& piece,
     }
     for (const unsigned position : positions) {
       const uint64_t inTile = format_.planar ? 0 : channels_[position] - 1;
-      copy_(from + position * sample, channels_.size(), target + inTile * sample, format_.TileSamples(),
-            piece.width);
+      copy_(from + position * sample, channels_.size(), target + inTile * sample,
+            format_.TileSamples(), piece.width);
     }
   }
 }
@@ -132,7 +139,8 @@ void LevelWriter::Cover(const Piece& piece, uint32_t tileWidth, OpenTile& tile) 
     return;
   }
   for (uint32_t row = 0; row < piece.height; ++row) {
-    uint8_t* first = &tile.isCovered[uint64_t{piece.y - piece.tileY + row} * tileWidth + piece.x - piece.tileX];
+    uint8_t* first =
+        &tile.isCovered[uint64_t{piece.y - piece.tileY + row} * tileWidth + piece.x - piece.tileX];
     tile.missing -= static_cast<uint64_t>(std::count(first, first + piece.width, uint8_t{0}));
     std::fill(first, first + piece.width, uint8_t{1});
   }
@@ -157,9 +165,11 @@ bool LevelWriter::IsLeftOut(const std::vector<uint8_t>& samples) const {
          std::memcmp(samples.data(), samples.data() + size, samples.size() - size) == 0;
 }
 
-void LevelWriter::Finish(uint64_t tile, uint32_t plane, const Piece& piece, std::vector<uint8_t>& samples) {
+void LevelWriter::Finish(uint64_t tile, uint32_t plane, const Piece& piece,
+                         std::vector<uint8_t>& samples) {
   RepeatLastPixels(piece, samples);
-  build_->Record(tile, IsLeftOut(samples) ? TilePlace() : store_.AppendTile(encoder_->Encode(samples, plane)));
+  build_->Record(
+      tile, IsLeftOut(samples) ? TilePlace() : store_.AppendTile(encoder_->Encode(samples, plane)));
 }
 
 }  // namespace orin::drivers

@@ -23,8 +23,8 @@ class LevelWriter final : public datasources::ReaderState<datasources::IRasterWr
  public:
   /// \param store   outlives the writer
   /// \param format  of the level
-  LevelWriter(TiffLevelStore& store, std::string file, unsigned level, std::vector<unsigned> channels,
-              const PixelFormat& format);
+  LevelWriter(TiffLevelStore& store, std::string file, unsigned level,
+              std::vector<unsigned> channels, const PixelFormat& format);
   ~LevelWriter() override;
 
   unsigned GetWidth() const override { return format_.width; }
@@ -54,7 +54,7 @@ class LevelWriter final : public datasources::ReaderState<datasources::IRasterWr
   struct Piece {
     uint64_t tile;  ///< within the plane
     uint32_t x, y, width, height;
-    uint32_t tileX, tileY;          ///< first pixel of the tile
+    uint32_t tileX, tileY;               ///< first pixel of the tile
     uint32_t insideWidth, insideHeight;  ///< of the tile, within the level
   };
 
@@ -63,8 +63,8 @@ class LevelWriter final : public datasources::ReaderState<datasources::IRasterWr
   void WriteInto(const gobs::Raster& block, const Piece& piece, uint32_t plane,
                  const std::vector<unsigned>& positions);
   OpenTile MakeTile(uint64_t tile, const Piece& piece);
-  void CopyPixels(const gobs::Raster& block, const Piece& piece, const std::vector<unsigned>& positions,
-                  OpenTile& to) const;
+  void CopyPixels(const gobs::Raster& block, const Piece& piece,
+                  const std::vector<unsigned>& positions, OpenTile& to) const;
   static void Cover(const Piece& piece, uint32_t tileWidth, OpenTile& tile);
   void RepeatLastPixels(const Piece& piece, std::vector<uint8_t>& samples) const;
   bool IsLeftOut(const std::vector<uint8_t>& samples) const;
@@ -81,9 +81,10 @@ class LevelWriter final : public datasources::ReaderState<datasources::IRasterWr
   // from the first Write on
   std::shared_ptr<LevelBuild> build_;
   std::unique_ptr<TileEncoder> encoder_;
-  std::unique_ptr<PixelReader> storedTiles_;  ///< where other channels come from; null when not needed
+  std::unique_ptr<PixelReader>
+      storedTiles_;  ///< where other channels come from; null when not needed
   CopySamples copy_ = nullptr;
-  std::vector<uint8_t> sparseSample_;         ///< empty when every tile is stored
+  std::vector<uint8_t> sparseSample_;  ///< empty when every tile is stored
   std::map<uint64_t, OpenTile> tiles_;
 };
 

@@ -20,8 +20,8 @@ MemoryTiff::MemoryTiff(std::endian order, std::string file)
   TIFFOpenOptionsSetErrorHandlerExtR(options.get(), &KeepError, contents_.get());
   TIFFOpenOptionsSetWarningHandlerExtR(options.get(), ignore, nullptr);
   tiff_.reset(TIFFClientOpenExt(file_.c_str(), order == std::endian::little ? "wl" : "wb",
-                                contents_.get(), &Read, &Write, &Seek, &Close, &Size, nullptr, nullptr,
-                                options.get()));
+                                contents_.get(), &Read, &Write, &Seek, &Close, &Size, nullptr,
+                                nullptr, options.get()));
   if (!tiff_) Fail();
 }
 
@@ -36,14 +36,17 @@ std::vector<uint8_t> MemoryTiff::StoredTile(uint32_t tile) const {
 }
 
 void MemoryTiff::Fail() const {
-  const std::string reason = contents_->error.empty() ? _("the codec gave no reason") : contents_->error;
-  throw Exception(FormatString(_("%s: a tile cannot be encoded: %s."), file_.c_str(), reason.c_str()),
-                  "host/drivers/tiff/memorytiff", "MemoryTiff::Fail() const", 0);
+  const std::string reason =
+      contents_->error.empty() ? _("the codec gave no reason") : contents_->error;
+  throw Exception(
+      FormatString(_("%s: a tile cannot be encoded: %s."), file_.c_str(), reason.c_str()),
+      "host/drivers/tiff/memorytiff", "MemoryTiff::Fail() const", 0);
 }
 
 tmsize_t MemoryTiff::Read(thandle_t handle, void* buffer, tmsize_t size) {
   auto& contents = *static_cast<Contents*>(handle);
-  const uint64_t left = contents.bytes.size() - std::min<uint64_t>(contents.position, contents.bytes.size());
+  const uint64_t left =
+      contents.bytes.size() - std::min<uint64_t>(contents.position, contents.bytes.size());
   const uint64_t count = std::min(left, static_cast<uint64_t>(size));
   if (count > 0) std::memcpy(buffer, &contents.bytes[contents.position], count);
   contents.position += count;
@@ -61,7 +64,9 @@ tmsize_t MemoryTiff::Write(thandle_t handle, void* buffer, tmsize_t size) {
 
 toff_t MemoryTiff::Seek(thandle_t handle, toff_t offset, int whence) {
   auto& contents = *static_cast<Contents*>(handle);
-  const uint64_t base = whence == SEEK_SET ? 0 : whence == SEEK_CUR ? contents.position : contents.bytes.size();
+  const uint64_t base = whence == SEEK_SET   ? 0
+                        : whence == SEEK_CUR ? contents.position
+                                             : contents.bytes.size();
   return contents.position = base + offset;
 }
 
@@ -69,7 +74,8 @@ toff_t MemoryTiff::Size(thandle_t handle) { return static_cast<Contents*>(handle
 
 int MemoryTiff::Close(thandle_t) { return 0; }
 
-int MemoryTiff::KeepError(TIFF*, void* contents, const char*, const char* format, va_list arguments) {
+int MemoryTiff::KeepError(TIFF*, void* contents, const char*, const char* format,
+                          va_list arguments) {
   auto& error = static_cast<Contents*>(contents)->error;
   char text[512];
   if (error.empty() && std::vsnprintf(text, sizeof text, format, arguments) > 0) error = text;

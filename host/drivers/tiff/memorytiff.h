@@ -41,7 +41,8 @@ class MemoryTiff {
   static toff_t Seek(thandle_t handle, toff_t offset, int whence);
   static toff_t Size(thandle_t handle);
   static int Close(thandle_t handle);
-  static int KeepError(TIFF* tiff, void* contents, const char* module, const char* format, va_list arguments);
+  static int KeepError(TIFF* tiff, void* contents, const char* module, const char* format,
+                       va_list arguments);
 
   std::string file_;
   std::unique_ptr<Contents> contents_;

@@ -24,14 +24,18 @@ namespace {
                   function, 0);
 }
 
-constexpr char kCannotWrite[] = "%s: cannot be written: %s. Free space or change the permissions, "
-                                "then run again.";
+constexpr char kCannotWrite[] =
+    "%s: cannot be written: %s. Free space or change the permissions, "
+    "then run again.";
 
 int FlagsOf(PositionedFile::Mode mode) {
   switch (mode) {
-    case PositionedFile::Mode::kRead: return O_RDONLY;
-    case PositionedFile::Mode::kUpdate: return O_RDWR;
-    case PositionedFile::Mode::kCreate: break;
+    case PositionedFile::Mode::kRead:
+      return O_RDONLY;
+    case PositionedFile::Mode::kUpdate:
+      return O_RDWR;
+    case PositionedFile::Mode::kCreate:
+      break;
   }
   return O_RDWR | O_CREAT | O_TRUNC;
 }
@@ -41,7 +45,8 @@ int FlagsOf(PositionedFile::Mode mode) {
 PositionedFile::PositionedFile(std::string path, Mode mode)
     : path_(std::move(path)), descriptor_(open(path_.c_str(), FlagsOf(mode) | O_CLOEXEC, 0666)) {
   if (descriptor_ < 0)
-    Fail(mode == Mode::kRead ? _("%s: cannot be opened: %s.") : _("%s: cannot be opened for writing: %s."),
+    Fail(mode == Mode::kRead ? _("%s: cannot be opened: %s.")
+                             : _("%s: cannot be opened for writing: %s."),
          path_, std::strerror(errno), "PositionedFile::PositionedFile(std::string, Mode)");
 }
 
@@ -50,7 +55,8 @@ PositionedFile::~PositionedFile() { close(descriptor_); }
 uint64_t PositionedFile::Size() const {
   struct stat status;
   if (fstat(descriptor_, &status) != 0)
-    Fail(_("%s: its size cannot be read: %s."), path_, std::strerror(errno), "PositionedFile::Size() const");
+    Fail(_("%s: its size cannot be read: %s."), path_, std::strerror(errno),
+         "PositionedFile::Size() const");
   return static_cast<uint64_t>(status.st_size);
 }
 
@@ -61,7 +67,8 @@ void PositionedFile::Read(uint64_t position, void* bytes, size_t count) const {
     const ssize_t got = pread(descriptor_, to, count, static_cast<off_t>(position));
     if (got < 0 && errno == EINTR) continue;
     if (got < 0) Fail(_("%s: cannot be read: %s."), path_, std::strerror(errno), kFunction);
-    if (got == 0) Fail(_("%s: cannot be read: %s."), path_, _("the file ends too early"), kFunction);
+    if (got == 0)
+      Fail(_("%s: cannot be read: %s."), path_, _("the file ends too early"), kFunction);
     to += got;
     position += static_cast<uint64_t>(got);
     count -= static_cast<size_t>(got);
@@ -99,8 +106,10 @@ void PositionedFile::Rename(const std::string& path) {
          "PositionedFile::Rename(const std::string&)");
   path_ = path;
   const std::string folder = std::filesystem::path(path).parent_path().string();
-  const int directory = open(folder.empty() ? "." : folder.c_str(), O_RDONLY | O_DIRECTORY | O_CLOEXEC);
-  if (directory < 0) return;  // deliberate: the name is given; not every file system lets it be synced
+  const int directory =
+      open(folder.empty() ? "." : folder.c_str(), O_RDONLY | O_DIRECTORY | O_CLOEXEC);
+  if (directory < 0)
+    return;  // deliberate: the name is given; not every file system lets it be synced
   fsync(directory);
   close(directory);
 }

@@ -1,4 +1,5 @@
-/// An open file that is read and written at given positions; every failure is an exception naming it.
+/// An open file that is read and written at given positions; every failure is an exception naming
+/// it.
 // SPDX-License-Identifier: MIT
 #pragma once
 

@@ -31,7 +31,8 @@ LevelCoding CodingOfImage(const IRasterSource& image) {
     const auto metadata = image.MetadataOf({1});
     std::string noData = metadata.GetFileMetadataValue(datasources::kNoDataKey);
     if (noData.empty()) noData = metadata.GetChanMetadataValue(datasources::kNoDataKey, 1);
-    coding = PlainCoding(image.Width(), image.Height(), image.ChannelCount(), LevelTypeOf(image), noData);
+    coding = PlainCoding(image.Width(), image.Height(), image.ChannelCount(), LevelTypeOf(image),
+                         noData);
   }
   coding.byteOrder = ByteOrder();
   return InPlanes(std::move(coding));
@@ -41,7 +42,8 @@ LevelCoding CodingOfImage(const IRasterSource& image) {
 bool NeedsBig(const LevelCoding& image) {
   constexpr double kClassicLimit = 4294967296.0;
   return double(image.format.width) * image.format.height * image.format.samplesPerPixel *
-             image.format.SampleBytes() >= kClassicLimit;
+             image.format.SampleBytes() >=
+         kClassicLimit;
 }
 
 std::unique_ptr<LevelFile> OpenExisting(const std::string& path) {
@@ -61,13 +63,15 @@ std::unique_ptr<datasources::ILevelStore> TiffSideCar::Open(const std::string& i
   const std::string path = imageFile + ".ovr";
   TiffLevelStore::Settings settings;
   settings.coding = CodingOfImage(image);
-  settings.image = {image.Width(), image.Height(), image.ChannelCount(), settings.coding.format.type, false};
+  settings.image = {image.Width(), image.Height(), image.ChannelCount(),
+                    settings.coding.format.type, false};
   settings.place = datasources::LevelPlace::kSideCar;
   const bool mayReadElsewhere = image.Levels() && !image.Levels()->List().empty();
   settings.usualSource = mayReadElsewhere ? 0 : 1;
   std::error_code ignored;
-  auto file = std::filesystem::exists(path, ignored) ? OpenExisting(path)
-                                                     : LevelFile::NotYetMade(path, NeedsBig(settings.coding));
+  auto file = std::filesystem::exists(path, ignored)
+                  ? OpenExisting(path)
+                  : LevelFile::NotYetMade(path, NeedsBig(settings.coding));
   settings.coding.byteOrder = file->Structure().byteOrder;
   return std::make_unique<TiffLevelStore>(std::move(file), std::move(settings));
 }

@@ -96,7 +96,8 @@ std::optional<TiffDirectory> Parser::ReadDirectory(uint64_t offset) const {
   directory.next = Number(directory.linkPosition, structure_.LinkBytes());
   for (uint64_t i = 0; i < count; ++i)
     AddEntry(&raw[i * entryBytes], start + i * entryBytes, directory);
-  if (!directory.Find(TIFFTAG_IMAGEWIDTH) || !directory.Find(TIFFTAG_IMAGELENGTH)) return std::nullopt;
+  if (!directory.Find(TIFFTAG_IMAGEWIDTH) || !directory.Find(TIFFTAG_IMAGELENGTH))
+    return std::nullopt;
   return directory;
 }
 
@@ -123,12 +124,29 @@ void ByteOrder::Swap(std::vector<uint8_t>& bytes, unsigned elementBytes) const {
 
 unsigned ElementBytes(uint16_t type) {
   switch (type) {
-    case TIFF_BYTE: case TIFF_ASCII: case TIFF_SBYTE: case TIFF_UNDEFINED: return 1;
-    case TIFF_SHORT: case TIFF_SSHORT: return 2;
-    case TIFF_LONG: case TIFF_SLONG: case TIFF_FLOAT: case TIFF_IFD: return 4;
-    case TIFF_RATIONAL: case TIFF_SRATIONAL: case TIFF_DOUBLE: return 8;
-    case TIFF_LONG8: case TIFF_SLONG8: case TIFF_IFD8: return 8;
-    default: return 0;
+    case TIFF_BYTE:
+    case TIFF_ASCII:
+    case TIFF_SBYTE:
+    case TIFF_UNDEFINED:
+      return 1;
+    case TIFF_SHORT:
+    case TIFF_SSHORT:
+      return 2;
+    case TIFF_LONG:
+    case TIFF_SLONG:
+    case TIFF_FLOAT:
+    case TIFF_IFD:
+      return 4;
+    case TIFF_RATIONAL:
+    case TIFF_SRATIONAL:
+    case TIFF_DOUBLE:
+      return 8;
+    case TIFF_LONG8:
+    case TIFF_SLONG8:
+    case TIFF_IFD8:
+      return 8;
+    default:
+      return 0;
   }
 }
 
@@ -147,7 +165,8 @@ TiffStructure ParseStructure(const PositionedFile& file) {
   Parser parser(file, structure);
   uint64_t offset = parser.ReadHeader();
   std::set<uint64_t> seen;
-  while (offset != 0 && structure.directories.size() < kMostDirectories && seen.insert(offset).second) {
+  while (offset != 0 && structure.directories.size() < kMostDirectories &&
+         seen.insert(offset).second) {
     auto directory = parser.ReadDirectory(offset);
     if (!directory) break;
     offset = directory->next;
@@ -171,8 +190,15 @@ std::vector<uint64_t> ReadNumbers(const PositionedFile& file, const TiffStructur
                                   const TiffEntry& entry) {
   std::vector<uint64_t> numbers;
   switch (entry.type) {
-    case TIFF_BYTE: case TIFF_SHORT: case TIFF_LONG: case TIFF_LONG8: case TIFF_IFD: case TIFF_IFD8: break;
-    default: return numbers;
+    case TIFF_BYTE:
+    case TIFF_SHORT:
+    case TIFF_LONG:
+    case TIFF_LONG8:
+    case TIFF_IFD:
+    case TIFF_IFD8:
+      break;
+    default:
+      return numbers;
   }
   std::vector<uint8_t> bytes(entry.bytes);
   file.Read(entry.position, bytes.data(), bytes.size());

@@ -1,4 +1,5 @@
-/// The structure of a TIFF file: header, chain of directories, entries. Pixels are not its business.
+/// The structure of a TIFF file: header, chain of directories, entries. Pixels are not its
+/// business.
 // SPDX-License-Identifier: MIT
 #pragma once
 
@@ -58,8 +59,8 @@ unsigned ElementBytes(uint16_t type);
 /// Bytes of the units that a byte order turns round: half an element for rationals.
 unsigned SwapBytes(uint16_t type);
 
-/// Follows the chain of directories. A link that points at nothing valid, or back, ends it. Nothing is
-/// read outside the file, and no more is allocated than the file holds.
+/// Follows the chain of directories. A link that points at nothing valid, or back, ends it. Nothing
+/// is read outside the file, and no more is allocated than the file holds.
 /// \throws orin::Exception  the header or the first directory is not one of a TIFF file
 TiffStructure ParseStructure(const PositionedFile& file);
 

@@ -13,11 +13,13 @@ namespace orin::drivers {
 using datasources::LevelDescription;
 
 std::unique_ptr<datasources::ILevelStore> OpenInternalLevels(const std::string& file,
-                                                             const PixelFormat& image, bool update) {
+                                                             const PixelFormat& image,
+                                                             bool update) {
   auto levels = std::make_unique<LevelFile>(file, update);
   TiffLevelStore::Settings settings;
   settings.image = {image.width, image.height, image.samplesPerPixel, image.type, true};
-  settings.coding = CodingOf(levels->File(), levels->Structure(), levels->Structure().directories[0], image);
+  settings.coding =
+      CodingOf(levels->File(), levels->Structure(), levels->Structure().directories[0], image);
   settings.usualSource = 1;
   return std::make_unique<TiffLevelStore>(std::move(levels), std::move(settings));
 }
@@ -33,22 +35,24 @@ void TiffLevelStore::Reload() {
 }
 
 void TiffLevelStore::Fail(const char* format, unsigned level, const char* operation) const {
-  throw Exception(FormatString(format, file_->Path().c_str(), level), "host/drivers/tiff/tifflevelstore",
+  throw Exception(FormatString(format, file_->Path().c_str(), level),
+                  "host/drivers/tiff/tifflevelstore",
                   std::string("orin::drivers::TiffLevelStore::") + operation, 0);
 }
 
 const StoredLevel* TiffLevelStore::FindOurs(unsigned level) const {
-  const auto found = std::find_if(levels_.begin(), levels_.end(), [level](const StoredLevel& stored) {
-    return stored.level == level && stored.isOurs;
-  });
+  const auto found = std::find_if(
+      levels_.begin(), levels_.end(),
+      [level](const StoredLevel& stored) { return stored.level == level && stored.isOurs; });
   return found == levels_.end() ? nullptr : &*found;
 }
 
 /// Ours before another program's.
 const StoredLevel* TiffLevelStore::Find(unsigned level) const {
   if (const StoredLevel* ours = FindOurs(level)) return ours;
-  const auto found = std::find_if(levels_.begin(), levels_.end(),
-                                  [level](const StoredLevel& stored) { return stored.level == level; });
+  const auto found =
+      std::find_if(levels_.begin(), levels_.end(),
+                   [level](const StoredLevel& stored) { return stored.level == level; });
   return found == levels_.end() ? nullptr : &*found;
 }
 
@@ -116,13 +120,15 @@ LevelCoding TiffLevelStore::CodingOfStored(const StoredLevel& stored) const {
 void TiffLevelStore::Create(unsigned level, const std::vector<unsigned>& channels,
                             const std::string& method) {
   const std::lock_guard lock(mutex_);
-  if (!file_->MayChange()) Fail(_("%s: is open for reading only; level %u cannot be made."), level, "Create");
+  if (!file_->MayChange())
+    Fail(_("%s: is open for reading only; level %u cannot be made."), level, "Create");
   auto entry = pending_.find(level);
   if (entry == pending_.end()) {
     const StoredLevel* ours = FindOurs(level);
     Pending pending;
     pending.channels.resize(settings_.image.samples);
-    pending.coding = ours ? CodingOfStored(*ours) : CodingOfLevel(settings_.coding, level, file_->Path());
+    pending.coding =
+        ours ? CodingOfStored(*ours) : CodingOfLevel(settings_.coding, level, file_->Path());
     entry = pending_.emplace(level, std::move(pending)).first;
   }
   for (const unsigned channel : channels) entry->second.channels.at(channel - 1) = true;
@@ -136,7 +142,8 @@ std::unique_ptr<datasources::IRasterWriter> TiffLevelStore::OpenWriter(
   const auto pending = pending_.find(level);
   const StoredLevel* stored = Find(level);
   if (pending == pending_.end() && !stored) Fail(_("%s: has no level %u."), level, "OpenWriter");
-  const PixelFormat& format = pending == pending_.end() ? stored->format : pending->second.coding.format;
+  const PixelFormat& format =
+      pending == pending_.end() ? stored->format : pending->second.coding.format;
   return std::make_unique<LevelWriter>(*this, file_->Path(), level, channels, format);
 }
 
@@ -146,28 +153,32 @@ std::unique_ptr<PixelReader> TiffLevelStore::OpenPixels(unsigned level,
   const StoredLevel* stored = Find(level);
   if (!stored) Fail(_("%s: level %u is not finished and cannot be read."), level, "OpenPixels");
   if (!pending_.contains(level)) lastRead_ = level;
-  return std::make_unique<PixelReader>(file_->Path(), file_->Structure().directories[stored->index].offset,
-                                       channels);
+  return std::make_unique<PixelReader>(
+      file_->Path(), file_->Structure().directories[stored->index].offset, channels);
 }
 
 std::unique_ptr<PixelReader> TiffLevelStore::OpenStoredTiles(unsigned level) {
   const std::lock_guard lock(mutex_);
   const StoredLevel* ours = FindOurs(level);
   if (!ours) return nullptr;
-  return std::make_unique<PixelReader>(file_->Path(), file_->Structure().directories[ours->index].offset,
-                                       std::vector<unsigned>{1});
+  return std::make_unique<PixelReader>(
+      file_->Path(), file_->Structure().directories[ours->index].offset, std::vector<unsigned>{1});
 }
 
 /// The pending level; one of ours that is in the file becomes pending again.
-TiffLevelStore::Pending& TiffLevelStore::Reopen(unsigned level, const std::vector<unsigned>& channels) {
+TiffLevelStore::Pending& TiffLevelStore::Reopen(unsigned level,
+                                                const std::vector<unsigned>& channels) {
   const StoredLevel* ours = FindOurs(level);
   const auto entry = pending_.find(level);
   if (entry == pending_.end() && !ours)
-    Fail(_("%s: level %u was not created; another program's level is never written."), level, "BeginWriting");
+    Fail(_("%s: level %u was not created; another program's level is never written."), level,
+         "BeginWriting");
   for (const unsigned channel : channels) {
     const bool isCreated = (ours && ours->metadata.validity[channel - 1] != kAbsent) ||
                            (entry != pending_.end() && entry->second.channels[channel - 1]);
-    if (!isCreated) Fail(_("%s: level %u was not created for all channels to be written."), level, "BeginWriting");
+    if (!isCreated)
+      Fail(_("%s: level %u was not created for all channels to be written."), level,
+           "BeginWriting");
   }
   if (entry != pending_.end()) return entry->second;
   Pending pending;
@@ -177,7 +188,8 @@ TiffLevelStore::Pending& TiffLevelStore::Reopen(unsigned level, const std::vecto
   return pending_.emplace(level, std::move(pending)).first->second;
 }
 
-void TiffLevelStore::Mark(const StoredLevel& stored, const std::vector<unsigned>& channels, char validity) {
+void TiffLevelStore::Mark(const StoredLevel& stored, const std::vector<unsigned>& channels,
+                          char validity) {
   std::string now = stored.metadata.validity;
   for (const unsigned channel : channels) now.at(channel - 1) = validity;
   if (now == stored.metadata.validity) return;
@@ -196,7 +208,8 @@ std::shared_ptr<LevelBuild> TiffLevelStore::BeginWriting(unsigned level,
     if (ours && ours->metadata.validity[channel - 1] == kValid) valid.push_back(channel);
   if (!valid.empty()) Mark(*ours, valid, kInvalid);
   if (!pending.build)
-    pending.build = std::make_shared<LevelBuild>(pending.coding, file_->ToAppend().End(), file_->Links());
+    pending.build =
+        std::make_shared<LevelBuild>(pending.coding, file_->ToAppend().End(), file_->Links());
   ++pending.build->writers;
   return pending.build;
 }
@@ -248,7 +261,8 @@ void TiffLevelStore::SetValid(unsigned level, const std::vector<unsigned>& chann
   const StoredLevel* stored = Find(level);
   RequireStored(stored, level, channels);
   if (stored->isOurs) Mark(*stored, channels, valid ? kValid : kInvalid);
-  else if (!valid) Fail(_("%s: level %u is another program's and cannot be marked."), level, "SetValid");
+  else if (!valid)
+    Fail(_("%s: level %u is another program's and cannot be marked."), level, "SetValid");
 }
 
 void TiffLevelStore::RequireStored(const StoredLevel* stored, unsigned level,

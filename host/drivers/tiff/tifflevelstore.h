@@ -24,26 +24,27 @@ namespace orin::drivers {
 std::unique_ptr<datasources::ILevelStore> OpenInternalLevels(const std::string& file,
                                                              const PixelFormat& image, bool update);
 
-/// A level appears in the file when it is complete: tiles first, then its directory, then the link to
-/// it, then its validity, each durable before the next. Until then it is pending here; a pending level
-/// that is given up leaves nothing behind.
+/// A level appears in the file when it is complete: tiles first, then its directory, then the link
+/// to it, then its validity, each durable before the next. Until then it is pending here; a pending
+/// level that is given up leaves nothing behind.
 ///
 /// Operations may be called from several threads.
 class TiffLevelStore final : public datasources::ILevelStore {
  public:
   struct Settings {
     ImageShape image;
-    LevelCoding coding;          ///< of the image, from which new levels take theirs
+    LevelCoding coding;  ///< of the image, from which new levels take theirs
     datasources::LevelPlace place = datasources::LevelPlace::kInternal;
-    unsigned usualSource = 0;    ///< recorded as a level's source when no level was read for it
+    unsigned usualSource = 0;  ///< recorded as a level's source when no level was read for it
   };
   /// \throws orin::Exception  the file cannot be read
   TiffLevelStore(std::unique_ptr<LevelFile> file, Settings settings);
 
   std::vector<datasources::LevelDescription> List() const override;
-  void Create(unsigned level, const std::vector<unsigned>& channels, const std::string& method) override;
-  std::unique_ptr<datasources::IRasterWriter> OpenWriter(unsigned level,
-                                                         const std::vector<unsigned>& channels) override;
+  void Create(unsigned level, const std::vector<unsigned>& channels,
+              const std::string& method) override;
+  std::unique_ptr<datasources::IRasterWriter> OpenWriter(
+      unsigned level, const std::vector<unsigned>& channels) override;
   void SetValid(unsigned level, const std::vector<unsigned>& channels, bool valid) override;
 
   // For the level writers.
@@ -57,8 +58,8 @@ class TiffLevelStore final : public datasources::ILevelStore {
   std::shared_ptr<LevelBuild> BeginWriting(unsigned level, const std::vector<unsigned>& channels);
   /// Adds a tile to the file. \returns where it is
   TilePlace AppendTile(const std::vector<uint8_t>& bytes);
-  /// A writer leaves: when it is the last one, complete planes are stored, not valid; else all that was
-  /// written is given up.
+  /// A writer leaves: when it is the last one, complete planes are stored, not valid; else all that
+  /// was written is given up.
   void EndWriting(unsigned level, LevelBuild& build) noexcept;
 
  private:
@@ -79,12 +80,16 @@ class TiffLevelStore final : public datasources::ILevelStore {
   Pending& Reopen(unsigned level, const std::vector<unsigned>& channels);
   void Mark(const StoredLevel& stored, const std::vector<unsigned>& channels, char validity);
 
-  LevelMetadata MetadataFor(unsigned level, const Pending& pending, const StoredLevel* before) const;
-  std::vector<uint32_t> PlanesOf(const LevelCoding& coding, const std::vector<unsigned>& channels) const;
+  LevelMetadata MetadataFor(unsigned level, const Pending& pending,
+                            const StoredLevel* before) const;
+  std::vector<uint32_t> PlanesOf(const LevelCoding& coding,
+                                 const std::vector<unsigned>& channels) const;
   std::vector<uint32_t> CompletePlanes(const LevelBuild& build) const;
-  void RequireStored(const StoredLevel* stored, unsigned level, const std::vector<unsigned>& channels) const;
+  void RequireStored(const StoredLevel* stored, unsigned level,
+                     const std::vector<unsigned>& channels) const;
   void Store(unsigned level, Pending& pending, const std::vector<uint32_t>& planes);
-  bool CanPatch(const StoredLevel& stored, const LevelMetadata& metadata, const LevelBuild& build) const;
+  bool CanPatch(const StoredLevel& stored, const LevelMetadata& metadata,
+                const LevelBuild& build) const;
   void Patch(const StoredLevel& stored, const LevelMetadata& metadata, const LevelBuild& build,
              const std::vector<uint32_t>& planes);
   void AddDirectory(unsigned level, const LevelMetadata& metadata, const LevelBuild& build,

@@ -27,7 +27,8 @@ bool SetLayout(TIFF* tiff, const LevelCoding& coding) {
 }
 
 bool SetCodec(TIFF* tiff, const LevelCoding& coding) {
-  if (coding.predictor != PREDICTOR_NONE && !TIFFSetField(tiff, TIFFTAG_PREDICTOR, coding.predictor))
+  if (coding.predictor != PREDICTOR_NONE &&
+      !TIFFSetField(tiff, TIFFTAG_PREDICTOR, coding.predictor))
     return false;
   if (coding.format.photometric == PHOTOMETRIC_YCBCR &&
       !TIFFSetField(tiff, TIFFTAG_YCBCRSUBSAMPLING, coding.subsamplingX, coding.subsamplingY))
@@ -51,10 +52,17 @@ bool SetCodec(TIFF* tiff, const LevelCoding& coding) {
 /// Codecs of which libtiff has the reading side only, or that take no plain samples.
 bool IsReadOnlyCodec(uint16_t compression) {
   switch (compression) {
-    case COMPRESSION_OJPEG: case COMPRESSION_NEXT: case COMPRESSION_THUNDERSCAN:
-    case COMPRESSION_CCITTRLE: case COMPRESSION_CCITTRLEW: case COMPRESSION_CCITTFAX3:
-    case COMPRESSION_CCITTFAX4: case COMPRESSION_JBIG: case COMPRESSION_SGILOG:
-    case COMPRESSION_SGILOG24: case COMPRESSION_PIXARLOG:
+    case COMPRESSION_OJPEG:
+    case COMPRESSION_NEXT:
+    case COMPRESSION_THUNDERSCAN:
+    case COMPRESSION_CCITTRLE:
+    case COMPRESSION_CCITTRLEW:
+    case COMPRESSION_CCITTFAX3:
+    case COMPRESSION_CCITTFAX4:
+    case COMPRESSION_JBIG:
+    case COMPRESSION_SGILOG:
+    case COMPRESSION_SGILOG24:
+    case COMPRESSION_PIXARLOG:
       return true;
     default:
       return !TIFFIsCODECConfigured(compression);
@@ -84,7 +92,8 @@ std::vector<uint8_t> TileEncoder::Pack(const std::vector<uint8_t>& samples) cons
   return packed;
 }
 
-std::vector<uint8_t> TileEncoder::Encode(const std::vector<uint8_t>& samples, uint32_t plane) const {
+std::vector<uint8_t> TileEncoder::Encode(const std::vector<uint8_t>& samples,
+                                         uint32_t plane) const {
   std::vector<uint8_t> packed = Pack(samples);  // a copy: bytes are turned round in place
   if (coding_.format.compression == COMPRESSION_NONE) {
     coding_.byteOrder.Swap(packed, StoredUnit(coding_.format));
