@@ -177,6 +177,7 @@ inline void WriteImage(const std::string& file, const Layout& layout,
   TIFF* tiff = TIFFOpen(file.c_str(), layout.mode);
   ASSERT_NE(nullptr, tiff) << file;
   SetTags(tiff, layout);
+  TIFFWriteCheck(tiff, layout.tile != 0, "");  // makes the tables, also when nothing is stored
   uint32_t index = 0;
   for (uint32_t plane = 0; plane < (layout.planar ? layout.samples : 1u); ++plane)
     for (uint32_t top = 0; top < layout.height; top += layout.TileHeight())
