@@ -10,6 +10,7 @@
 #include <sys/stat.h>
 
 #include "host/datasources/formats.h"
+#include "host/drivers/tiff/sidecar.h"
 #include "host/drivers/tiff/tiffsource.h"
 
 namespace orin::drivers {
@@ -46,7 +47,9 @@ class TiffDriver final : public datasources::IFormatDriver {
 }  // namespace
 
 void RegisterTiffDriver() {
-  datasources::FormatRegistry::Instance().Register(std::make_shared<TiffDriver>());
+  datasources::FormatRegistry& registry = datasources::FormatRegistry::Instance();
+  registry.Register(std::make_shared<TiffDriver>());
+  registry.SetSideCarFormat(std::make_shared<TiffSideCar>());
 }
 
 }  // namespace orin::drivers

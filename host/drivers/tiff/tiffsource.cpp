@@ -12,6 +12,7 @@
 #include <unistd.h>
 
 #include "host/drivers/tiff/pixelreader.h"
+#include "host/drivers/tiff/tifflevelstore.h"
 #include "host/services/exception.h"
 #include "host/services/text.h"
 
@@ -91,6 +92,7 @@ TiffSource::TiffSource(std::string file, datasources::AccessMode access) : file_
       [](const MetadataItem& item) { return item.domain.empty() && item.name == kNoDataKey; });
   if (!declared && IsFiniteDecimal(format_.noData))
     metadata_.push_back({kNoDataKey, std::nullopt, "", "", format_.noData});
+  levels_ = OpenInternalLevels(file_, format_, access == datasources::kUpdate);
 }
 
 TiffSource::~TiffSource() = default;
