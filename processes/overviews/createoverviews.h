@@ -56,10 +56,9 @@ class CreateFileOverviews {
   void ShowProgress(bool on);
 
  private:
-  struct Request;
-
   bool OpenDataset(const std::string& name, orin::datasources::IDataset** out) const;
   bool GetLevelsToCompute(orin::datasources::IDataset* dataset, std::vector<unsigned int>& levels) const;
+  bool GenerateListed();
   bool CreateOverviews(orin::datasources::IDataset** dataset, bool readOnly, std::string fileName,
                        QRTOverviewResampleType type, std::vector<unsigned>& levels);
 

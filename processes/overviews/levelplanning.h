@@ -1,6 +1,9 @@
-/// The decimation factor that the user prefers.
+/// The decimation factor of a pyramid that names no levels.
 // SPDX-License-Identifier: MIT
 #pragma once
 
-/// The factor between the levels of a pyramid, 2 or 3; 2 when the user has no preference.
+/// The factor between the levels of a pyramid that the user prefers, 2 or 3; 2 without a preference.
 unsigned int GetDefaultDecimationLevels();
+
+/// `factor` when it is 2 or 3, else the user's preference.
+unsigned int PyramidFactorOrDefault(long long factor);

@@ -1,0 +1,49 @@
+/// Builds the missing levels of one raster, pass by pass.
+// SPDX-License-Identifier: MIT
+#pragma once
+
+#include <string>
+#include <vector>
+
+#include "host/datasources/dataset.h"
+#include "host/datasources/levelstore.h"
+#include "processes/overviews/resampletype.h"
+#include "processes/qrtfilters/resamplers/parallelio/filteriodriver.h"
+#include "processes/qrtfilters/resamplers/resamplerfactory.h"
+
+/// What a run builds, and with which method.
+struct LevelRequest {
+  orin::datasources::IRasterDataset* raster;  ///< outlives the run
+  std::vector<unsigned> channels;             ///< 1-based
+  std::vector<unsigned> levels;               ///< to build, in this order
+  orin::resamplers::IResamplerFactory* factory;  ///< null for a method that does not exist
+  std::string methodName;                     ///< recorded with the levels
+  bool isTiff;           ///< all channels in one pass
+  bool onlyFromDivisors; ///< a level's source must divide it
+  bool showProgress;     ///< a message at the start of each level
+};
+
+class LevelRun {
+ public:
+  explicit LevelRun(const LevelRequest& request);
+
+  /// Builds all levels. \returns false when progress was refused before everything was done
+  /// \throws orin::Exception  what the host or the method throws; levels finished before stay valid
+  bool Build();
+
+ private:
+  /// Part of the whole run's progress that one pass reports.
+  struct Range {
+    float start;
+    float end;
+  };
+
+  bool BuildLevel(unsigned level);
+  bool BuildPass(unsigned level, const std::vector<unsigned>& channels, const Range& range);
+  unsigned SourceLevelOf(unsigned level, const std::vector<unsigned>& present) const;
+  void Configure(orin::parallelio::LevelDriver& driver, double scale, const Range& range) const;
+
+  const LevelRequest& request_;
+  double totalCost_ = 0;  ///< of all levels, in units of one full-resolution pass
+  double done_ = 0;       ///< fraction of the run
+};
