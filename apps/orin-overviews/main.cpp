@@ -1,2 +1,56 @@
+/// The tool: puts the host's parts together and hands over to the sub-command.
 // SPDX-License-Identifier: MIT
-int main() { return 2; }
+#include <fmt/core.h>
+
+#include <cerrno>
+#include <csignal>
+#include <cstdio>
+#include <cstring>
+
+#include "apps/orin-overviews/build.h"
+#include "apps/orin-overviews/commandline.h"
+#include "apps/orin-overviews/console.h"
+#include "apps/orin-overviews/exitcode.h"
+#include "apps/orin-overviews/info.h"
+#include "apps/orin-overviews/locale.h"
+#include "host/drivers/memory/memorydriver.h"
+#include "host/drivers/tiff/tiffdriver.h"
+#include "host/services/exception.h"
+#include "host/services/preferences.h"
+#include "host/services/text.h"
+
+namespace {
+
+using namespace orin::app;
+
+int Run(const Invocation& invocation) {
+  const bool quiet = invocation.command == Command::kBuild && invocation.build.quiet;
+  Console console({quiet, invocation.verbose, invocation.logFile});
+  const LibraryReports reports(console);
+  orin::drivers::RegisterMemoryDriver();
+  orin::drivers::RegisterTiffDriver();
+  PreferenceRegistry::Install(orin::LoadPreferences(orin::PreferenceFilePath()));
+  const ExitCode code = invocation.command == Command::kBuild ? RunBuild(invocation.build, console)
+                                                              : RunInfo(invocation.info, console);
+  if (std::fflush(stdout) == 0 && !std::ferror(stdout)) return code;
+  console.Error(FormatString(_("The output cannot be written: %s."), std::strerror(errno)));
+  return code == kDone ? kCannotBuild : code;
+}
+
+}  // namespace
+
+int main(int argc, char** argv) {
+  std::signal(SIGXFSZ, SIG_IGN);  // a file that grows too large is reported as an error
+  std::signal(SIGPIPE, SIG_IGN);  // so is a reader that went away; no build is lost to it
+  try {
+    ChooseLanguage();
+    Invocation invocation;
+    if (const auto ended = ParseCommandLine(argc, argv, invocation)) return *ended;
+    return Run(invocation);
+  } catch (const orin::Exception& error) {
+    fmt::print(stderr, "orin-overviews: {}\n", error.GetMessage());
+  } catch (const std::exception& error) {
+    fmt::print(stderr, "orin-overviews: {}\n", error.what());
+  }
+  return kCannotBuild;
+}

@@ -5,10 +5,13 @@
 #include <iostream>
 #include <string>
 
-#include "basic/core/typedispatch/dispatchtype.h"
 #include "host/services/environment.h"
-#include "host/services/exception.h"
-#include "host/services/text.h"
+#include "processes/qrtfilters/resamplers/average.h"
+#include "processes/qrtfilters/resamplers/bicubic.h"
+#include "processes/qrtfilters/resamplers/bilinear.h"
+#include "processes/qrtfilters/resamplers/detail/createkernel.h"
+#include "processes/qrtfilters/resamplers/mode.h"
+#include "processes/qrtfilters/resamplers/nearestneighbour.h"
 
 namespace orin::resamplers {
 namespace {
@@ -21,34 +24,28 @@ std::string RequestedTarget() {
   return target;
 }
 
-/// True when kernels run here. Deliberate: no other target exists, and asking for one gives no resampler.
-bool RunsOnCpu() {
+}  // namespace
+
+bool detail::RunsOnCpu() {
   const std::string target = RequestedTarget();
   if (target == "GPU") std::cout << "Using the GPU!" << std::endl;
   return target.empty() || target == "CPU";
 }
 
-[[noreturn]] IRasterResampler* RefuseMethod(const char* name) {
-  throw Exception(FormatString(_("The method %s is not part of this program."), name),
-                  "processes/qrtfilters/resamplers/factories", "CreateResampler", 0);
+IRasterResampler* NearestNeighbourResamplerFactory::CreateResampler(const gobs::DataType& type) {
+  return detail::CreateKernel<NearestNeighbour>(type);
 }
-
-}  // namespace
-
-IRasterResampler* NearestNeighbourResamplerFactory::CreateResampler(const gobs::DataType&) {
-  return RunsOnCpu() ? RefuseMethod("NEAREST") : nullptr;
+IRasterResampler* AverageResamplerFactory::CreateResampler(const gobs::DataType& type) {
+  return detail::CreateKernel<Average>(type);
 }
-IRasterResampler* AverageResamplerFactory::CreateResampler(const gobs::DataType&) {
-  return RunsOnCpu() ? RefuseMethod("AVERAGE") : nullptr;
+IRasterResampler* ModeResamplerFactory::CreateResampler(const gobs::DataType& type) {
+  return detail::CreateKernel<Mode>(type);
 }
-IRasterResampler* ModeResamplerFactory::CreateResampler(const gobs::DataType&) {
-  return RunsOnCpu() ? RefuseMethod("MODE") : nullptr;
+IRasterResampler* BilinearResamplerFactory::CreateResampler(const gobs::DataType& type) {
+  return detail::CreateKernel<Bilinear>(type);
 }
-IRasterResampler* BilinearResamplerFactory::CreateResampler(const gobs::DataType&) {
-  return RunsOnCpu() ? RefuseMethod("BILINEAR") : nullptr;
-}
-IRasterResampler* BicubicResamplerFactory::CreateResampler(const gobs::DataType&) {
-  return RunsOnCpu() ? RefuseMethod("BICUBIC") : nullptr;
+IRasterResampler* BicubicResamplerFactory::CreateResampler(const gobs::DataType& type) {
+  return detail::CreateKernel<Bicubic>(type);
 }
 
 }  // namespace orin::resamplers

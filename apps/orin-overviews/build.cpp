@@ -1,0 +1,155 @@
+// SPDX-License-Identifier: MIT
+#include "apps/orin-overviews/build.h"
+
+#include <algorithm>
+
+#include "apps/orin-overviews/buildplan.h"
+#include "apps/orin-overviews/buildreport.h"
+#include "apps/orin-overviews/interruption.h"
+#include "apps/orin-overviews/numberlist.h"
+#include "apps/orin-overviews/progressdisplay.h"
+#include "host/services/counter.h"
+#include "host/services/exception.h"
+#include "host/services/text.h"
+#include "host/services/warning.h"
+#include "processes/overviews/createoverviews.h"
+#include "processes/overviews/levelplanning.h"
+
+namespace orin::app {
+namespace {
+
+CreateFileOverviews MakeJob(const BuildOptions& options, const std::string& file) {
+  CreateFileOverviews job(file, options.channels);
+  if (!options.levels.empty())
+    job.SetPyramidLevels(options.levels, options.force);
+  else
+    job.SetPyramidFactor(options.factor ? options.factor : GetDefaultDecimationLevels(),
+                         options.force);
+  job.SetPyramidType(options.method);
+  if (options.placement != Placement::kAutomatic)
+    job.SaveToKvx(options.placement == Placement::kExternal);
+  job.ShowProgress(true);
+  return job;
+}
+
+/// What one run answered.
+struct Outcome {
+  bool built = false;
+  std::vector<unsigned> warningLines;  ///< source lines of the run's own warnings
+};
+
+/// Connects the library's progress and warnings with the tool for the length of one run.
+class RunSinks {
+ public:
+  RunSinks(ProgressReporter& reporter, const Interruption& interruption, Console& console,
+           const std::string& file, Outcome& outcome) {
+    progress_ = tarn::Counter::SetSink([&](float fraction, const std::string* message) {
+      reporter.Report(fraction, message != nullptr);
+      return !interruption.Requested();
+    });
+    warnings_ = tarn::Warning::SetSink([&](const tarn::Report& report) {
+      if (report.sourceFile == kRunSource) outcome.warningLines.push_back(report.line);
+      console.Error(AfterFileName(file, report.message));
+    });
+  }
+  ~RunSinks() {
+    tarn::Counter::SetSink(std::move(progress_));
+    tarn::Warning::SetSink(std::move(warnings_));
+  }
+  RunSinks(const RunSinks&) = delete;
+  RunSinks& operator=(const RunSinks&) = delete;
+
+ private:
+  static constexpr char kRunSource[] = "processes/overviews/createoverviews";
+
+  tarn::ProgressSink progress_;
+  tarn::ReportSink warnings_;
+};
+
+Outcome RunJob(CreateFileOverviews& job, const BuildPlan& plan, const BuildOptions& options,
+               const std::string& file, const Interruption& interruption, Console& console) {
+  Outcome outcome;
+  const auto display = MakeProgressDisplay(console, file, options.quiet);
+  ProgressReporter reporter(ProgressModel(plan.building, plan.report), *display);
+  const RunSinks sinks(reporter, interruption, console, file, outcome);
+  outcome.built = job.Generate();
+  reporter.Finish(outcome.built);
+  return outcome;
+}
+
+/// Why the channels asked for cannot be treated; empty when they can.
+std::string ChannelProblem(const CreateFileOverviews& job, const BuildPlan& plan,
+                           const BuildOptions& options) {
+  if (job.ValidChannelList()) return "";
+  return FormatString(_("--channels names %s, but the file's channels are 1 to %u."),
+                      JoinNumbers(options.channels).c_str(), plan.channelCount);
+}
+
+/// The code of a run that failed; says what is finished and what to do.
+ExitCode ReportFailure(const Outcome& outcome, const BuildPlan& plan, const BuildOptions& options,
+                       const std::string& file, bool interrupted, Console& console) {
+  const LevelState state = LookAtLevels(plan, options, file);
+  if (interrupted && outcome.warningLines.empty()) {
+    console.Error(AfterFileName(file, InterruptedText(state, options)));
+    return kInterrupted;
+  }
+  const unsigned line = outcome.warningLines.empty() ? 0 : outcome.warningLines.front();
+  if (line == 0) console.Error(AfterFileName(file, _("The levels could not be built.")));
+  const std::string advice = AdviceAfterFailure(line, state, options);
+  if (!advice.empty()) console.Error(AfterFileName(file, advice));
+  return CodeOfWarning(line);
+}
+
+ExitCode BuildFile(const BuildOptions& options, const std::string& file,
+                   const Interruption& interruption, Console& console) {
+  const BuildPlan plan = PlanBuild(options, file);
+  CreateFileOverviews job = MakeJob(options, file);
+  if (const std::string problem = ChannelProblem(job, plan, options); !problem.empty()) {
+    console.Error(AfterFileName(file, problem));
+    return kWrongUsage;
+  }
+  if (plan.requested.empty() || plan.channels.empty()) {
+    console.Result(file + ": " + NothingToDoText(plan));
+    return kDone;
+  }
+  if (!options.force)
+    for (const PlannedLevel& planned : plan.building)
+      if (planned.empty) console.Notice(AfterFileName(file, LeftOutText(plan, planned.level)));
+  const Outcome outcome = RunJob(job, plan, options, file, interruption, console);
+  if (!outcome.built)
+    return ReportFailure(outcome, plan, options, file, interruption.Requested(), console);
+  console.Result(file + ": " + SummaryText(plan, LookAtLevels(plan, options, file)));
+  return kDone;
+}
+
+/// The same with every failure reported.
+ExitCode TryFile(const BuildOptions& options, const std::string& file,
+                 const Interruption& interruption, Console& console) {
+  ExitCode code = kCannotOpen;
+  try {
+    OpenForBuild(file, options.placement);
+    code = kCannotBuild;
+    return BuildFile(options, file, interruption, console);
+  } catch (const Exception& error) {
+    console.Error(AfterFileName(file, error.GetMessage()));
+  } catch (const std::exception& error) {
+    console.Error(AfterFileName(file, FormatString(_("The build failed: %s."), error.what())));
+  }
+  return code;
+}
+
+}  // namespace
+
+ExitCode RunBuild(const BuildOptions& options, Console& console) {
+  const Interruption interruption;
+  ExitCode result = kDone;
+  for (size_t i = 0; i < options.files.size(); ++i) {
+    if (interruption.Requested()) return kInterrupted;
+    const ExitCode code = TryFile(options, options.files[i], interruption, console);
+    if (code == kInterrupted) return code;
+    if (code != kDone) result = options.files.size() == 1 ? code : kSomeFailed;
+  }
+  return result;
+}
+
+}  // namespace orin::app

@@ -1,0 +1,81 @@
+// SPDX-License-Identifier: MIT
+#include "apps/orin-overviews/buildoptions.h"
+
+#include "apps/orin-overviews/numberlist.h"
+#include "host/services/text.h"
+
+namespace orin::app {
+namespace {
+
+/// An option whose text `read` turns into a value, or answers why it cannot.
+template <class Read>
+CLI::Option* AddText(CLI::App& command, const std::string& name, const char* kind,
+                     const char* description, Read read) {
+  return command
+      .add_option_function<std::string>(
+          name,
+          [name, read](const std::string& text) {
+            const std::string problem = read(text);
+            if (!problem.empty()) throw CLI::ValidationError(name, problem);
+          },
+          description)
+      ->type_name(kind);
+}
+
+std::string ReadList(NumberList list, std::vector<unsigned>& numbers) {
+  numbers = std::move(list.numbers);
+  return list.problem;
+}
+
+std::string ReadFactor(const std::string& text, unsigned& factor) {
+  if (text != "2" && text != "3")
+    return FormatString(_("the factor is 2 or 3, not \"%s\""), text.c_str());
+  factor = text == "2" ? 2 : 3;
+  return "";
+}
+
+std::string ReadMethod(const std::string& text, QRTOverviewResampleType& method) {
+  method = GetPyramidType(text);
+  if (method != ResampleInvalid) return "";
+  return FormatString(
+      _("there is no method \"%s\"; the methods are nearest, average, mode, bilinear, bicubic"),
+      text.c_str());
+}
+
+void RefuseTogether(const CLI::Option& one, const CLI::Option& other) {
+  if (one.count() && other.count())
+    throw CLI::ValidationError(one.get_name(), FormatString(_("cannot be used together with %s"),
+                                                            other.get_name().c_str()));
+}
+
+}  // namespace
+
+CLI::App* AddBuildCommand(CLI::App& app, BuildOptions& options) {
+  CLI::App* command = app.add_subcommand("build", _("Build the missing overview levels of files."));
+  command->add_option("FILE", options.files, _("Raster files"))->required()->type_name("");
+  const auto* levels =
+      AddText(*command, "--levels", _("LIST"), _("Levels to build, such as 2,4,8"),
+              [&](const std::string& text) { return ReadList(ParseLevels(text), options.levels); });
+  const auto* factor =
+      AddText(*command, "--factor", "2|3", _("Build the whole pyramid, each level this much smaller"),
+              [&](const std::string& text) { return ReadFactor(text, options.factor); });
+  AddText(*command, "--method", _("METHOD"), _("nearest, average, mode, bilinear or bicubic"),
+          [&](const std::string& text) { return ReadMethod(text, options.method); });
+  AddText(*command, "--channels", _("LIST"), _("Channels to treat, such as 1,3-5"),
+          [&](const std::string& text) { return ReadList(ParseChannels(text), options.channels); });
+  const auto* internal = command->add_flag_callback(
+      "--internal", [&] { options.placement = Placement::kInternal; },
+      _("Keep the levels inside the file"));
+  const auto* external = command->add_flag_callback(
+      "--external", [&] { options.placement = Placement::kExternal; },
+      _("Keep the levels in a file beside it"));
+  command->add_flag("--force", options.force, _("Build levels again that are up to date"));
+  command->add_flag("--quiet", options.quiet, _("Print warnings and errors only"));
+  command->final_callback([=] {
+    RefuseTogether(*levels, *factor);
+    RefuseTogether(*internal, *external);
+  });
+  return command;
+}
+
+}  // namespace orin::app

@@ -1,0 +1,29 @@
+/// What a user can ask of `build`.
+// SPDX-License-Identifier: MIT
+#pragma once
+
+#include <CLI/App.hpp>
+#include <string>
+#include <vector>
+
+#include "processes/overviews/resampletype.h"
+
+namespace orin::app {
+
+enum class Placement { kAutomatic, kInternal, kExternal };
+
+struct BuildOptions {
+  std::vector<std::string> files;
+  std::vector<unsigned> levels;    ///< empty: the whole pyramid of `factor`
+  unsigned factor = 0;             ///< 2 or 3; 0: the user's preference
+  QRTOverviewResampleType method = ResampleInvalid;  ///< ResampleInvalid: the user's preference
+  std::vector<unsigned> channels;  ///< empty: all that are wider than one bit
+  Placement placement = Placement::kAutomatic;
+  bool force = false;
+  bool quiet = false;
+};
+
+/// Adds the sub-command. `options` is filled while the command line is parsed and outlives `app`.
+CLI::App* AddBuildCommand(CLI::App& app, BuildOptions& options);
+
+}  // namespace orin::app

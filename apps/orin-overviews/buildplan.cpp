@@ -1,0 +1,129 @@
+// SPDX-License-Identifier: MIT
+#include "apps/orin-overviews/buildplan.h"
+
+#include <algorithm>
+
+#include "host/datasources/datasetmanager.h"
+#include "host/datasources/pyramidlevels.h"
+#include "host/services/exception.h"
+#include "host/services/text.h"
+#include "processes/overviews/levelplanning.h"
+#include "processes/overviews/statusqueries.h"
+
+namespace orin::app {
+namespace {
+
+using datasources::AccessMode;
+using datasources::DatasetManager;
+using datasources::IDataset;
+using datasources::IRasterDataset;
+using datasources::LevelDescription;
+
+std::string FormatNameOf(const IDataset& dataset) {
+  return std::unique_ptr<datasources::IFormatDescriptor>(dataset.GetFormatDescriptor())->GetName();
+}
+
+std::unique_ptr<IDataset> Open(const std::string& file, AccessMode mode) {
+  return std::unique_ptr<IDataset>(DatasetManager::GetInstance()->Open(file, mode));
+}
+
+const IRasterDataset& RasterOf(const IDataset& dataset, const std::string& file) {
+  const auto* raster = dynamic_cast<const IRasterDataset*>(&dataset);
+  if (!raster || raster->GetChannelCount() == 0)
+    throw Exception(FormatString(_("%s: holds no raster."), file.c_str()),
+                    "apps/orin-overviews/buildplan", "orin::app::PlanBuild", 0);
+  return *raster;
+}
+
+std::vector<unsigned> ChannelsToTreat(const IRasterDataset& raster,
+                                      const std::vector<unsigned>& chosen) {
+  if (!chosen.empty()) return chosen;
+  std::vector<unsigned> channels;
+  for (unsigned channel = 1; channel <= raster.GetChannelCount(); ++channel) {
+    const std::unique_ptr<datasources::IChannelInfo> info(raster.GetChannelInfo(channel));
+    if (info->GetDataType().bits > 1) channels.push_back(channel);
+  }
+  return channels;
+}
+
+std::vector<unsigned> RequestedLevels(const BuildOptions& options, const IRasterDataset& raster) {
+  if (!options.levels.empty()) return options.levels;
+  return ComputePyramidLevel(raster.GetWidth(), raster.GetHeight(),
+                             options.factor ? options.factor : GetDefaultDecimationLevels());
+}
+
+std::vector<LevelDescription> DescribeLevels(IDataset& dataset) {
+  auto* raster = dynamic_cast<IRasterDataset*>(&dataset);
+  const std::unique_ptr<datasources::IOverviewInfo> info(raster ? raster->GetOverviewInfo() : nullptr);
+  return info ? info->Describe() : std::vector<LevelDescription>();
+}
+
+bool IsValid(const std::vector<LevelDescription>& levels, unsigned level,
+             const std::vector<unsigned>& channels) {
+  const auto found = std::find_if(levels.begin(), levels.end(),
+                                  [&](const LevelDescription& l) { return l.level == level; });
+  return found != levels.end() && datasources::HoldsForAll(found->validChannels, channels);
+}
+
+std::vector<unsigned> AscendingOnce(std::vector<unsigned> levels) {
+  std::sort(levels.begin(), levels.end());
+  levels.erase(std::unique(levels.begin(), levels.end()), levels.end());
+  return levels;
+}
+
+}  // namespace
+
+std::unique_ptr<IDataset> OpenForBuild(const std::string& file, Placement placement) {
+  std::unique_ptr<IDataset> dataset;
+  AccessMode mode = AccessMode::kUpdate;
+  try {
+    dataset = Open(file, mode);
+  } catch (const Exception&) {
+    mode = AccessMode::kReadOnly;
+    dataset = Open(file, mode);
+  }
+  const bool beside = placement == Placement::kExternal ||
+                      (placement == Placement::kAutomatic &&
+                       (mode == AccessMode::kReadOnly || !SupportsInternalOverviews(dataset.get())));
+  if (!beside) return dataset;
+  dataset.reset();
+  return std::unique_ptr<IDataset>(DatasetManager::GetInstance()->OpenFormat("ZMBALL", file, mode));
+}
+
+BuildPlan PlanBuild(const BuildOptions& options, const std::string& file) {
+  const auto dataset = OpenForBuild(file, options.placement);
+  const IRasterDataset& raster = RasterOf(*dataset, file);
+  BuildPlan plan;
+  plan.width = raster.GetWidth();
+  plan.height = raster.GetHeight();
+  plan.channelCount = raster.GetChannelCount();
+  plan.channels = ChannelsToTreat(raster, options.channels);
+  plan.report = FormatNameOf(*dataset).find("TIFF") == std::string::npos ? LevelReport::kWithinShare
+                                                                         : LevelReport::kToTheEnd;
+  std::vector<unsigned> requested = RequestedLevels(options, raster);
+  std::sort(requested.begin(), requested.end());
+  plan.requested = AscendingOnce(requested);
+  const auto existing = DescribeLevels(*dataset);
+  for (const unsigned level : requested) {
+    if (level < 2) continue;  // the library refuses the request
+    if (options.force || !IsValid(existing, level, plan.channels))
+      plan.building.push_back({level, plan.IsEmpty(level)});
+    else if (plan.kept.empty() || plan.kept.back() != level)
+      plan.kept.push_back(level);
+  }
+  return plan;
+}
+
+LevelState LookAtLevels(const BuildPlan& plan, const BuildOptions& options,
+                        const std::string& file) {
+  LevelState state;
+  state.descriptions = DescribeLevels(*OpenForBuild(file, options.placement));
+  for (const unsigned level : plan.requested) {
+    if (level < 2 || plan.IsEmpty(level)) continue;
+    const bool valid = IsValid(state.descriptions, level, plan.channels);
+    (valid ? state.valid : state.unfinished).push_back(level);
+  }
+  return state;
+}
+
+}  // namespace orin::app

@@ -1,0 +1,131 @@
+// SPDX-License-Identifier: MIT
+#include "apps/orin-overviews/buildreport.h"
+
+#include <algorithm>
+
+#include "apps/orin-overviews/numberlist.h"
+#include "host/services/text.h"
+
+namespace orin::app {
+namespace {
+
+/// Lines at which a run reports, see the messages there.
+enum WarningLine : unsigned {
+  kChannelOutside = 609,
+  kLevelTooSmall = 625,
+  kLevelLargerThanImage = 641,
+  kFormatHoldsNoLevels = 658,
+  kFileIsReadOnly = 670,
+  kComplexNotSupported = 698,
+  kRunFailed = 913,
+};
+
+/// The levels that this run built: valid now and not kept.
+std::vector<unsigned> BuiltLevels(const BuildPlan& plan, const LevelState& state) {
+  std::vector<unsigned> built;
+  for (const unsigned level : state.valid)
+    if (std::find(plan.kept.begin(), plan.kept.end(), level) == plan.kept.end())
+      built.push_back(level);
+  return built;
+}
+
+std::string PlaceText(const datasources::LevelDescription& level) {
+  return level.place == datasources::LevelPlace::kInternal
+             ? std::string(_("inside the file"))
+             : FormatString(_("in %s"), level.file.c_str());
+}
+
+std::string KeptText(const BuildPlan& plan) {
+  return FormatString(_("levels %s exist and are up to date"), JoinNumbers(plan.kept).c_str());
+}
+
+/// "Levels 2, 4 are finished; 8 is not." as far as there are such levels.
+std::string StateText(const LevelState& state) {
+  if (state.valid.empty())
+    return FormatString(_("No level is finished, %s still to do."),
+                        JoinNumbers(state.unfinished).c_str());
+  if (state.unfinished.empty())
+    return FormatString(_("Levels finished: %s."), JoinNumbers(state.valid).c_str());
+  return FormatString(_("Levels finished: %s; still to do: %s."), JoinNumbers(state.valid).c_str(),
+                      JoinNumbers(state.unfinished).c_str());
+}
+
+std::string ContinueText(const BuildOptions& options) {
+  return options.force ? _("The same command without --force continues there.")
+                       : _("The same command continues there.");
+}
+
+}  // namespace
+
+std::string AfterFileName(const std::string& file, const std::string& text) {
+  const std::string name = file + ": ";
+  std::string lines;
+  for (size_t start = 0; start < text.size();) {
+    const size_t end = std::min(text.find('\n', start), text.size());
+    const std::string line = text.substr(start, end - start);
+    start = end + 1;
+    if (line.empty()) continue;
+    if (!lines.empty()) lines += '\n';
+    lines += line.compare(0, name.size(), name) == 0 ? line : name + line;
+  }
+  return lines;
+}
+
+std::string SummaryText(const BuildPlan& plan, const LevelState& state) {
+  const std::vector<unsigned> built = BuiltLevels(plan, state);
+  if (built.empty()) return NothingToDoText(plan);
+  const auto level = std::find_if(state.descriptions.begin(), state.descriptions.end(),
+                                  [&](const auto& l) { return l.level == built.front(); });
+  std::string text = FormatString(_("levels %s built (%s) %s"), JoinNumbers(built).c_str(),
+                                  level->method.c_str(), PlaceText(*level).c_str());
+  if (!plan.kept.empty()) text += "; " + KeptText(plan);
+  return text;
+}
+
+std::string NothingToDoText(const BuildPlan& plan) {
+  if (plan.channels.empty())
+    return _("nothing to do: all channels are masks of one bit, which have no levels");
+  if (!plan.kept.empty()) return FormatString(_("nothing to do: %s"), KeptText(plan).c_str());
+  return FormatString(_("nothing to do: %u x %u pixels need no levels"), plan.width, plan.height);
+}
+
+std::string LeftOutText(const BuildPlan& plan, unsigned level) {
+  return FormatString(_("level %u is left out: of %u x %u pixels nothing would remain."), level,
+                      plan.width, plan.height);
+}
+
+std::string InterruptedText(const LevelState& state, const BuildOptions& options) {
+  const std::string text = std::string(_("Interrupted.")) + " " + StateText(state);
+  return state.unfinished.empty() ? text : text + " " + ContinueText(options);
+}
+
+std::string AdviceAfterFailure(unsigned line, const LevelState& state,
+                               const BuildOptions& options) {
+  switch (line) {
+    case kLevelLargerThanImage:
+      return _("Leave out --force, which makes this an error, or name smaller levels.");
+    case kFormatHoldsNoLevels:
+    case kFileIsReadOnly:
+      return _("Use --external instead of --internal: the levels go to a file beside it.");
+    case kComplexNotSupported:
+      return _("Use --method nearest or --method average.");
+    case kRunFailed:
+      return state.unfinished.empty() ? "" : StateText(state) + " " + ContinueText(options);
+    default:
+      return "";
+  }
+}
+
+ExitCode CodeOfWarning(unsigned line) {
+  switch (line) {
+    case kChannelOutside:
+    case kLevelTooSmall:
+    case kLevelLargerThanImage:
+    case kComplexNotSupported:
+      return kWrongUsage;
+    default:
+      return kCannotBuild;
+  }
+}
+
+}  // namespace orin::app

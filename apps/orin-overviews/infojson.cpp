@@ -1,0 +1,56 @@
+/// What `info` tells, for programs.
+// SPDX-License-Identifier: MIT
+#include <nlohmann/json.hpp>
+
+#include "apps/orin-overviews/rasterinfo.h"
+
+namespace orin::app {
+namespace {
+
+using datasources::LevelDescription;
+using Json = nlohmann::ordered_json;
+
+Json OrNull(const std::string& text) { return text.empty() ? Json() : Json(text); }
+
+Json ChannelsOf(const LevelDescription& level) {
+  Json channels = Json::array();
+  for (size_t i = 0; i < level.validChannels.size(); ++i)
+    channels.push_back({{"channel", i + 1},
+                        {"present", i < level.presentChannels.size() && level.presentChannels[i]},
+                        {"valid", bool(level.validChannels[i])}});
+  return channels;
+}
+
+Json JsonOf(const LevelDescription& level) {
+  const bool inside = level.place == datasources::LevelPlace::kInternal;
+  return {{"level", level.level},
+          {"width", level.width},
+          {"height", level.height},
+          {"place", inside ? "internal" : "side-car"},
+          {"file", level.file},
+          {"method", OrNull(level.method)},
+          {"sourceLevel", level.sourceLevel ? Json(level.sourceLevel) : Json()},
+          {"program", OrNull(level.program)},
+          {"channels", ChannelsOf(level)}};
+}
+
+}  // namespace
+
+std::string JsonOf(const RasterInfo& info) {
+  Json channels = Json::array();
+  for (size_t i = 0; i < info.channels.size(); ++i)
+    channels.push_back({{"channel", i + 1}, {"type", TypeName(info.channels[i])}});
+  Json levels = Json::array();
+  for (const LevelDescription& level : info.levels) levels.push_back(JsonOf(level));
+  const Json all = {
+      {"file", info.file},
+      {"format", {{"name", info.formatName}, {"description", info.formatDescription}}},
+      {"width", info.width},
+      {"height", info.height},
+      {"channels", channels},
+      {"levels", levels}};
+  // A file name need not be UTF-8, JSON must be.
+  return all.dump(2, ' ', false, Json::error_handler_t::replace) + "\n";
+}
+
+}  // namespace orin::app

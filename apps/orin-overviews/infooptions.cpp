@@ -1,0 +1,15 @@
+// SPDX-License-Identifier: MIT
+#include "apps/orin-overviews/infooptions.h"
+
+#include "host/services/text.h"
+
+namespace orin::app {
+
+CLI::App* AddInfoCommand(CLI::App& app, InfoOptions& options) {
+  CLI::App* command = app.add_subcommand("info", _("List the overview levels of a file."));
+  command->add_option("FILE", options.file, _("Raster file"))->required()->type_name("");
+  command->add_flag("--json", options.json, _("Print JSON"));
+  return command;
+}
+
+}  // namespace orin::app

@@ -1,0 +1,92 @@
+/// What `info` tells, for people.
+// SPDX-License-Identifier: MIT
+#include <algorithm>
+#include <array>
+#include <filesystem>
+
+#include "apps/orin-overviews/numberlist.h"
+#include "apps/orin-overviews/rasterinfo.h"
+#include "host/services/text.h"
+
+namespace orin::app {
+namespace {
+
+using datasources::LevelDescription;
+
+constexpr size_t kColumns = 7;
+using Row = std::array<std::string, kColumns>;
+
+/// Columns that a terminal shows of an UTF-8 text without wide characters.
+size_t LengthOf(const std::string& text) {
+  return static_cast<size_t>(
+      std::count_if(text.begin(), text.end(), [](char c) { return (c & 0xC0) != 0x80; }));
+}
+
+std::string TypesText(const std::vector<gobs::DataType>& channels) {
+  std::string text;
+  for (const gobs::DataType& type : channels) {
+    const std::string name = TypeName(type);
+    if (text == name) continue;
+    text += (text.empty() ? "" : ", ") + name;
+  }
+  const bool same = std::all_of(channels.begin(), channels.end(),
+                                [&](const gobs::DataType& type) { return type == channels.front(); });
+  return same && !channels.empty() ? TypeName(channels.front()) : text;
+}
+
+std::string PlaceText(const LevelDescription& level) {
+  if (level.place == datasources::LevelPlace::kInternal) return _("inside");
+  return std::filesystem::path(level.file).filename().string();
+}
+
+/// "yes", "no", or the channels that are up to date.
+std::string ValidText(const LevelDescription& level) {
+  std::vector<unsigned> valid;
+  for (unsigned i = 0; i < level.validChannels.size(); ++i)
+    if (level.validChannels[i]) valid.push_back(i + 1);
+  if (valid.empty()) return _("no");
+  if (valid.size() == level.validChannels.size()) return _("yes");
+  return FormatString(_("channels %s"), JoinNumbers(valid).c_str());
+}
+
+std::string OrDash(const std::string& text) { return text.empty() ? "-" : text; }
+
+Row RowOf(const LevelDescription& level) {
+  return {std::to_string(level.level),
+          std::to_string(level.width) + " x " + std::to_string(level.height),
+          PlaceText(level),
+          OrDash(level.method),
+          level.sourceLevel == 0 ? "-" : std::to_string(level.sourceLevel),
+          ValidText(level),
+          OrDash(level.program)};
+}
+
+std::string TextOf(const std::vector<Row>& rows) {
+  std::array<size_t, kColumns> widths{};
+  for (const Row& row : rows)
+    for (size_t i = 0; i < kColumns; ++i) widths[i] = std::max(widths[i], LengthOf(row[i]));
+  std::string text;
+  for (const Row& row : rows) {
+    for (size_t i = 0; i < kColumns; ++i) {
+      text += row[i];
+      if (i + 1 < kColumns) text.append(widths[i] - LengthOf(row[i]) + 2, ' ');
+    }
+    text += '\n';
+  }
+  return text;
+}
+
+}  // namespace
+
+std::string TableOf(const RasterInfo& info) {
+  std::string text = FormatString(
+      _("%s: %u x %u pixels, %zu channels of %s, %s\n"), info.file.c_str(), info.width, info.height,
+      info.channels.size(), TypesText(info.channels).c_str(), info.formatDescription.c_str());
+  if (info.levels.empty()) return text + _("no overview levels\n");
+  std::vector<Row> rows = {
+      {_("level"), _("size"), _("place"), _("method"), _("from"), _("valid"), _("program")}};
+  for (const LevelDescription& level : info.levels) rows.push_back(RowOf(level));
+  return text + TextOf(rows);
+}
+
+}  // namespace orin::app

@@ -1,0 +1,44 @@
+// SPDX-License-Identifier: MIT
+#include "apps/orin-overviews/rasterinfo.h"
+
+#include <memory>
+
+#include "host/datasources/datasetmanager.h"
+#include "host/datasources/formats.h"
+#include "host/services/exception.h"
+#include "host/services/text.h"
+
+namespace orin::app {
+
+RasterInfo CollectInfo(const std::string& file) {
+  // The generic layer lists the levels inside the file and those beside it together.
+  const std::unique_ptr<datasources::IDataset> dataset(
+      datasources::DatasetManager::GetInstance()->OpenFormat("ZMBALL", file,
+                                                             datasources::AccessMode::kReadOnly));
+  auto* raster = dynamic_cast<datasources::IRasterDataset*>(dataset.get());
+  if (!raster)
+    throw Exception(FormatString(_("%s: holds no raster."), file.c_str()),
+                    "apps/orin-overviews/rasterinfo", "orin::app::CollectInfo(const std::string&)", 0);
+  RasterInfo info;
+  info.file = file;
+  if (const ZMBInfo_s* format = ZMBGetFormatInfo(raster->GetFileFormatCode())) {
+    info.formatName = format->name;
+    info.formatDescription = format->description;
+  }
+  info.width = raster->GetWidth();
+  info.height = raster->GetHeight();
+  for (unsigned channel = 1; channel <= raster->GetChannelCount(); ++channel)
+    info.channels.push_back(
+        std::unique_ptr<datasources::IChannelInfo>(raster->GetChannelInfo(channel))->GetDataType());
+  const std::unique_ptr<datasources::IOverviewInfo> levels(raster->GetOverviewInfo());
+  if (levels) info.levels = levels->Describe();
+  return info;
+}
+
+std::string TypeName(const gobs::DataType& type) {
+  if (type.bits == 1) return "bit";
+  const std::string kind = type.isFloat ? "float" : type.isSigned ? "int" : "uint";
+  return (type.isComplex ? "complex " : "") + kind + std::to_string(type.bits);
+}
+
+}  // namespace orin::app

@@ -1,0 +1,35 @@
+/// What `info` tells of a raster, and its two forms.
+// SPDX-License-Identifier: MIT
+#pragma once
+
+#include <string>
+#include <vector>
+
+#include "basic/gobs/datatype.h"
+#include "host/datasources/dataset.h"
+
+namespace orin::app {
+
+struct RasterInfo {
+  std::string file;
+  std::string formatName;         ///< "TIFF"
+  std::string formatDescription;  ///< "TIFF / GeoTIFF"
+  unsigned width = 0;             ///< pixels
+  unsigned height = 0;            ///< pixels
+  std::vector<gobs::DataType> channels;
+  std::vector<datasources::LevelDescription> levels;  ///< ascending
+};
+
+/// \throws orin::Exception  the file cannot be opened or is no raster
+RasterInfo CollectInfo(const std::string& file);
+
+/// "uint8", "int16", "float32", "complex float64", "bit" ...
+std::string TypeName(const gobs::DataType& type);
+
+/// A heading and a table with one line for each level.
+std::string TableOf(const RasterInfo& info);
+
+/// One JSON object; docs/cli.md describes it.
+std::string JsonOf(const RasterInfo& info);
+
+}  // namespace orin::app
