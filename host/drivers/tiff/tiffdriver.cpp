@@ -1,2 +1,55 @@
 // SPDX-License-Identifier: MIT
 #include "host/drivers/tiff/tiffdriver.h"
+
+#include <array>
+#include <fstream>
+#include <memory>
+#include <string>
+#include <string_view>
+
+#include <sys/stat.h>
+
+#include "host/datasources/formats.h"
+#include "host/drivers/tiff/sidecar.h"
+#include "host/drivers/tiff/tiffsource.h"
+
+namespace orin::drivers {
+namespace {
+
+using namespace std::string_view_literals;
+
+constexpr std::array kMagics = {"II*\0"sv, "MM\0*"sv, "II+\0"sv,
+                                "MM\0+"sv};  // classic, then BigTIFF
+
+class TiffDriver final : public datasources::IFormatDriver {
+ public:
+  std::vector<ZMBInfo_s> Formats() const override {
+    return {{"TIFF", "TIFF / GeoTIFF", kFormatTiff, 1}};
+  }
+
+  ZMBFormatType Identify(const std::string& file) const override {
+    struct stat status;
+    if (stat(file.c_str(), &status) != 0 || !S_ISREG(status.st_mode)) return kFormatUnknown;
+    std::array<char, 4> magic{};
+    if (!std::ifstream(file, std::ios::binary).read(magic.data(), magic.size()))
+      return kFormatUnknown;
+    for (const std::string_view known : kMagics)
+      if (known == std::string_view(magic.data(), magic.size())) return kFormatTiff;
+    return kFormatUnknown;
+  }
+
+  std::unique_ptr<datasources::IRasterSource> Open(const std::string& file,
+                                                   datasources::AccessMode access) override {
+    return std::make_unique<TiffSource>(file, access);
+  }
+};
+
+}  // namespace
+
+void RegisterTiffDriver() {
+  datasources::FormatRegistry& registry = datasources::FormatRegistry::Instance();
+  registry.Register(std::make_shared<TiffDriver>());
+  registry.SetSideCarFormat(std::make_shared<TiffSideCar>());
+}
+
+}  // namespace orin::drivers

@@ -1,4 +1,5 @@
-/// TIFF files: reading their pixels, and keeping levels inside them or in a side-car beside any image.
+/// TIFF files: reading their pixels, and keeping levels inside them or in a side-car beside any
+/// image.
 // SPDX-License-Identifier: MIT
 #pragma once
 

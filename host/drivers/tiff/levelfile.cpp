@@ -1,0 +1,119 @@
+// SPDX-License-Identifier: MIT
+#include "host/drivers/tiff/levelfile.h"
+
+#include <algorithm>
+#include <cstdio>
+#include <utility>
+#include <vector>
+
+#include "host/services/exception.h"
+#include "host/services/text.h"
+
+namespace orin::drivers {
+namespace {
+
+constexpr char kPartial[] = ".partial";
+
+std::vector<uint8_t> EmptyHeader(const TiffStructure& structure) {
+  std::vector<uint8_t> header(structure.HeaderBytes());
+  header[0] = header[1] = structure.byteOrder.order == std::endian::little ? 'I' : 'M';
+  structure.byteOrder.Put(structure.isBig ? TIFF_VERSION_BIG : TIFF_VERSION_CLASSIC, 2, &header[2]);
+  if (structure.isBig) structure.byteOrder.Put(structure.LinkBytes(), 2, &header[4]);
+  return header;
+}
+
+}  // namespace
+
+LevelFile::LevelFile(std::string path, bool mayChange)
+    : path_(std::move(path)),
+      mayChange_(mayChange),
+      isMade_(true),
+      file_(std::make_unique<PositionedFile>(path_, PositionedFile::Mode::kRead)) {
+  structure_ = ParseStructure(*file_);
+}
+
+std::unique_ptr<LevelFile> LevelFile::NotYetMade(std::string path, bool isBig) {
+  std::unique_ptr<LevelFile> file(new LevelFile());
+  file->path_ = std::move(path);
+  file->mayChange_ = true;
+  file->structure_.isBig = isBig;
+  return file;
+}
+
+void LevelFile::Refresh() {
+  if (isMade_) structure_ = ParseStructure(*file_);
+}
+
+void LevelFile::OpenForChange() {
+  if (appender_) return;
+  if (!mayChange_)
+    throw Exception(
+        FormatString(_("%s: is open for reading only; no level can be written."), path_.c_str()),
+        "host/drivers/tiff/levelfile", "LevelFile::OpenForChange()", 0);
+  if (isMade_) file_ = std::make_unique<PositionedFile>(path_, PositionedFile::Mode::kUpdate);
+  else Make();
+  appender_ = std::make_unique<Appender>(*file_, structure_.isBig, structure_.byteOrder);
+}
+
+void LevelFile::Make() {
+  file_ = std::make_unique<PositionedFile>(path_ + kPartial, PositionedFile::Mode::kCreate);
+  const std::vector<uint8_t> header = EmptyHeader(structure_);
+  file_->Write(0, header.data(), header.size());
+}
+
+Appender& LevelFile::ToAppend() {
+  OpenForChange();
+  return *appender_;
+}
+
+void LevelFile::Overwrite(uint64_t position, const std::string& bytes) {
+  OpenForChange();
+  file_->Write(position, bytes.data(), bytes.size());
+}
+
+void LevelFile::Sync() {
+  OpenForChange();
+  file_->Sync();
+}
+
+/// A cloud-optimized file says in a text behind its header that it keeps a certain order; this one
+/// will not any more. The text has a blank for the longer word.
+void LevelFile::DeclareEdited() {
+  constexpr size_t kMostBytes = 4096;
+  const std::string before = "KNOWN_INCOMPATIBLE_EDITION=NO\n ";
+  const std::string after = "KNOWN_INCOMPATIBLE_EDITION=YES\n";
+  const uint64_t start = structure_.HeaderBytes();
+  const uint64_t size = file_->Size();
+  std::string text(std::min<uint64_t>(kMostBytes, size - std::min(size, start)), '\0');
+  file_->Read(start, text.data(), text.size());
+  if (!text.starts_with("GDAL_STRUCTURAL_METADATA_SIZE=")) return;
+  const size_t at = text.find(before);
+  if (at != text.npos) file_->Write(start + at, after.data(), after.size());
+}
+
+void LevelFile::Link(const Place& place, uint64_t directory) {
+  OpenForChange();
+  file_->Sync();
+  if (isMade_) DeclareEdited();
+  appender_->Link(place.linkPosition, directory);
+  file_->Sync();
+  ++links_;
+  if (!isMade_) {
+    file_->Rename(path_);
+    isMade_ = true;
+  }
+  structure_ = ParseStructure(*file_);
+}
+
+void LevelFile::CutBackTo(uint64_t end) {
+  if (!appender_) return;
+  if (isMade_) {
+    appender_->CutBackTo(end);
+    return;
+  }
+  std::remove(file_->Path().c_str());
+  appender_.reset();
+  file_.reset();
+}
+
+}  // namespace orin::drivers

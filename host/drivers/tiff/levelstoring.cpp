@@ -1,0 +1,129 @@
+/// How a complete level gets into the file: its directory added and linked, or its tile table
+/// patched.
+// SPDX-License-Identifier: MIT
+#include <algorithm>
+
+#include "host/drivers/tiff/tifflevelstore.h"
+
+namespace orin::drivers {
+namespace {
+
+/// One of a directory's two tables: offsets or byte counts of all tiles.
+struct TileTable {
+  uint16_t tag;
+  uint64_t TilePlace::*field;
+};
+
+constexpr TileTable kTables[] = {{TIFFTAG_TILEOFFSETS, &TilePlace::offset},
+                                 {TIFFTAG_TILEBYTECOUNTS, &TilePlace::count}};
+
+}  // namespace
+
+std::vector<uint32_t> TiffLevelStore::PlanesOf(const LevelCoding& coding,
+                                               const std::vector<unsigned>& channels) const {
+  if (!coding.format.planar) return {0};
+  std::vector<uint32_t> planes;
+  for (const unsigned channel : channels) planes.push_back(channel - 1);
+  return planes;
+}
+
+std::vector<uint32_t> TiffLevelStore::CompletePlanes(const LevelBuild& build) const {
+  std::vector<uint32_t> planes;
+  for (uint32_t plane = 0; plane < build.Coding().Planes(); ++plane)
+    if (build.IsComplete(plane)) planes.push_back(plane);
+  return planes;
+}
+
+/// \param before  the level of ours that is in the file, or null
+LevelMetadata TiffLevelStore::MetadataFor(unsigned level, const Pending& pending,
+                                          const StoredLevel* before) const {
+  LevelMetadata metadata;
+  metadata.method = pending.method;
+  metadata.level = level;
+  metadata.sourceLevel = lastRead_ ? lastRead_ : settings_.usualSource;
+  metadata.program = ProgramName();
+  metadata.validity =
+      before ? before->metadata.validity : std::string(pending.channels.size(), kAbsent);
+  for (size_t i = 0; i < pending.channels.size(); ++i)
+    if (pending.channels[i]) metadata.validity[i] = kInvalid;
+  return metadata;
+}
+
+/// What is in the directory already stays there: size of numbers, texts, and all but validity.
+bool TiffLevelStore::CanPatch(const StoredLevel& stored, const LevelMetadata& metadata,
+                              const LevelBuild& build) const {
+  const LevelMetadata& old = stored.metadata;
+  if (old.method != metadata.method || old.sourceLevel != metadata.sourceLevel ||
+      old.program != metadata.program)
+    return false;
+  const TiffStructure& structure = file_->Structure();
+  return std::all_of(std::begin(kTables), std::end(kTables), [&](const TileTable& table) {
+    const TiffEntry* entry = structure.directories[stored.index].Find(table.tag);
+    return entry && entry->type == (structure.isBig ? TIFF_LONG8 : TIFF_LONG) &&
+           entry->count == build.TilesPerPlane() * build.Coding().Planes();
+  });
+}
+
+void TiffLevelStore::Patch(const StoredLevel& stored, const LevelMetadata& metadata,
+                           const LevelBuild& build, const std::vector<uint32_t>& planes) {
+  const TiffStructure& structure = file_->Structure();
+  const unsigned width = structure.LinkBytes();
+  const uint64_t tiles = build.TilesPerPlane();
+  file_->Overwrite(stored.validityPosition, metadata.validity);
+  file_->Sync();
+  for (const TileTable& table : kTables) {
+    const TiffEntry* entry = structure.directories[stored.index].Find(table.tag);
+    for (const uint32_t plane : planes) {
+      std::string bytes(tiles * width, '\0');
+      for (uint64_t i = 0; i < tiles; ++i)
+        structure.byteOrder.Put(build.PlacesOf(plane)[i].*table.field, width,
+                                reinterpret_cast<uint8_t*>(&bytes[i * width]));
+      file_->Overwrite(entry->position + plane * tiles * width, bytes);
+    }
+  }
+  file_->Sync();
+}
+
+void TiffLevelStore::AddDirectory(unsigned level, const LevelMetadata& metadata,
+                                  const LevelBuild& build, const std::vector<uint32_t>& planes) {
+  const TiffStructure& structure = file_->Structure();
+  const StoredLevel* before = Find(level);
+  const uint64_t tiles = build.TilesPerPlane();
+  std::vector<NewEntry> entries = EntriesOf(build.Coding());
+  for (const TileTable& table : kTables) {
+    std::vector<uint64_t> numbers;
+    if (before && before->isOurs)  // other planes keep their tiles
+      if (const TiffEntry* entry = structure.directories[before->index].Find(table.tag))
+        numbers = ReadNumbers(file_->File(), structure, *entry);
+    numbers.resize(tiles * build.Coding().Planes());
+    for (const uint32_t plane : planes)
+      std::transform(build.PlacesOf(plane), build.PlacesOf(plane) + tiles, &numbers[plane * tiles],
+                     [&](const TilePlace& place) { return place.*table.field; });
+    entries.push_back(NumbersEntry(table.tag, structure.isBig ? TIFF_LONG8 : TIFF_LONG, numbers));
+  }
+  entries.push_back(TextEntry(TIFFTAG_GDAL_METADATA, ComposeLevelMetadata(metadata)));
+  const PixelFormat& format = build.Coding().format;
+  const Place place =
+      before ? PlaceOf(structure, before->index)
+             : PlaceOfNew(file_->File(), structure, settings_.image, format.width, format.height);
+  file_->Link(place, file_->ToAppend().AppendDirectory(std::move(entries), place.next));
+}
+
+/// Puts the tiles of `planes` into the level's directory; its validity is turned on by nobody here.
+void TiffLevelStore::Store(unsigned level, Pending& pending, const std::vector<uint32_t>& planes) {
+  const std::shared_ptr<LevelBuild> build = pending.build;
+  file_->Sync();
+  file_->Refresh();  // another program may have changed the chain
+  Reload();
+  const StoredLevel* ours = FindOurs(level);
+  const LevelMetadata metadata = MetadataFor(level, pending, ours);
+  if (ours && CanPatch(*ours, metadata, *build)) Patch(*ours, metadata, *build, planes);
+  else AddDirectory(level, metadata, *build, planes);
+  Reload();
+  for (const uint32_t plane : planes) build->Release(plane);
+  if (!build->IsEmpty()) return;
+  build->isClosed = true;
+  pending_.erase(level);
+}
+
+}  // namespace orin::drivers

@@ -1,0 +1,45 @@
+/// An open file that is read and written at given positions; every failure is an exception naming
+/// it.
+// SPDX-License-Identifier: MIT
+#pragma once
+
+#include <cstddef>
+#include <cstdint>
+#include <string>
+
+namespace orin::drivers {
+
+/// Reads and writes of different threads do not disturb each other.
+class PositionedFile {
+ public:
+  enum class Mode {
+    kRead,
+    kUpdate,
+    kCreate  ///< made, or emptied when it is there
+  };
+
+  /// \throws orin::Exception  it cannot be opened in that mode
+  PositionedFile(std::string path, Mode mode);
+  ~PositionedFile();
+  PositionedFile(const PositionedFile&) = delete;
+  PositionedFile& operator=(const PositionedFile&) = delete;
+
+  const std::string& Path() const { return path_; }
+  /// Bytes.
+  uint64_t Size() const;
+  /// \throws orin::Exception  the bytes cannot be read, or the file ends before them
+  void Read(uint64_t position, void* bytes, size_t count) const;
+  /// \throws orin::Exception  not all bytes could be written
+  void Write(uint64_t position, const void* bytes, size_t count);
+  /// Returns when everything written is on the storage device.
+  void Sync();
+  void Truncate(uint64_t size);
+  /// Gives the file its new name, replacing what has it, and makes the name durable.
+  void Rename(const std::string& path);
+
+ private:
+  std::string path_;
+  int descriptor_;
+};
+
+}  // namespace orin::drivers

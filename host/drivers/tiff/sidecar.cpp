@@ -1,0 +1,79 @@
+// SPDX-License-Identifier: MIT
+#include "host/drivers/tiff/sidecar.h"
+
+#include <filesystem>
+#include <utility>
+
+#include "host/drivers/tiff/tifflevelstore.h"
+#include "host/drivers/tiff/tiffsource.h"
+#include "host/services/exception.h"
+#include "host/services/text.h"
+
+namespace orin::drivers {
+namespace {
+
+using datasources::IRasterSource;
+
+/// The type of all levels: that of the first channel that is more than a mask.
+gobs::DataType LevelTypeOf(const IRasterSource& image) {
+  for (unsigned channel = 1; channel <= image.ChannelCount(); ++channel)
+    if (image.TypeOf(channel).bits > 1) return image.TypeOf(channel);
+  return image.TypeOf(1);
+}
+
+LevelCoding CodingOfImage(const IRasterSource& image) {
+  LevelCoding coding;
+  if (const auto* tiff = dynamic_cast<const TiffSource*>(&image)) {
+    const PositionedFile file(tiff->File(), PositionedFile::Mode::kRead);
+    const TiffStructure structure = ParseStructure(file);
+    coding = CodingOf(file, structure, structure.directories[0], tiff->Format());
+  } else {
+    const auto metadata = image.MetadataOf({1});
+    std::string noData = metadata.GetFileMetadataValue(datasources::kNoDataKey);
+    if (noData.empty()) noData = metadata.GetChanMetadataValue(datasources::kNoDataKey, 1);
+    coding = PlainCoding(image.Width(), image.Height(), image.ChannelCount(), LevelTypeOf(image),
+                         noData);
+  }
+  coding.byteOrder = ByteOrder();
+  return InPlanes(std::move(coding));
+}
+
+/// Levels take less than the image, so that they fit where the image would.
+bool NeedsBig(const LevelCoding& image) {
+  constexpr double kClassicLimit = 4294967296.0;
+  return double(image.format.width) * image.format.height * image.format.samplesPerPixel *
+             image.format.SampleBytes() >=
+         kClassicLimit;
+}
+
+std::unique_ptr<LevelFile> OpenExisting(const std::string& path) {
+  try {
+    return std::make_unique<LevelFile>(path, true);
+  } catch (const Exception& reason) {
+    throw Exception(FormatString(_("%s Delete the side-car, or move it away, and run again."),
+                                 reason.GetMessage().c_str()),
+                    "host/drivers/tiff/sidecar", "OpenExisting(const std::string&)", 0);
+  }
+}
+
+}  // namespace
+
+std::unique_ptr<datasources::ILevelStore> TiffSideCar::Open(const std::string& imageFile,
+                                                            IRasterSource& image) {
+  const std::string path = imageFile + ".ovr";
+  TiffLevelStore::Settings settings;
+  settings.coding = CodingOfImage(image);
+  settings.image = {image.Width(), image.Height(), image.ChannelCount(),
+                    settings.coding.format.type, false};
+  settings.place = datasources::LevelPlace::kSideCar;
+  const bool mayReadElsewhere = image.Levels() && !image.Levels()->List().empty();
+  settings.usualSource = mayReadElsewhere ? 0 : 1;
+  std::error_code ignored;
+  auto file = std::filesystem::exists(path, ignored)
+                  ? OpenExisting(path)
+                  : LevelFile::NotYetMade(path, NeedsBig(settings.coding));
+  settings.coding.byteOrder = file->Structure().byteOrder;
+  return std::make_unique<TiffLevelStore>(std::move(file), std::move(settings));
+}
+
+}  // namespace orin::drivers

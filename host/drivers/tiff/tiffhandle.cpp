@@ -1,0 +1,89 @@
+// SPDX-License-Identifier: MIT
+#include "host/drivers/tiff/tiffhandle.h"
+
+#include <algorithm>
+#include <cstdarg>
+#include <cstdio>
+#include <utility>
+
+#include <sys/stat.h>
+
+#include "host/services/exception.h"
+#include "host/services/text.h"
+
+namespace orin::drivers {
+namespace {
+
+// m: no memory map, a file that shrinks must not end the process; c: strips as they are stored.
+constexpr char kOpenMode[] = "rmc";
+constexpr tmsize_t kLargestAllocation = tmsize_t{1} << 30;
+
+/// Keeps the first error: the later ones are its consequences.
+int KeepFirst(TIFF*, void* errors, const char*, const char* format, va_list arguments) {
+  auto& kept = *static_cast<std::string*>(errors);
+  char text[512];
+  if (kept.empty() && std::vsnprintf(text, sizeof text, format, arguments) > 0) kept = text;
+  return 1;  // handled: libtiff prints nothing
+}
+
+int Ignore(TIFF*, void*, const char*, const char*, va_list) { return 1; }
+
+struct OptionsDeleter {
+  void operator()(TIFFOpenOptions* options) const { TIFFOpenOptionsFree(options); }
+};
+
+TIFF* Open(const std::string& path, std::string& errors) {
+  const std::unique_ptr<TIFFOpenOptions, OptionsDeleter> options(TIFFOpenOptionsAlloc());
+  TIFFOpenOptionsSetErrorHandlerExtR(options.get(), KeepFirst, &errors);
+  TIFFOpenOptionsSetWarningHandlerExtR(options.get(), Ignore, nullptr);
+  TIFFOpenOptionsSetMaxSingleMemAlloc(options.get(), kLargestAllocation);
+  return TIFFOpenExt(path.c_str(), kOpenMode, options.get());
+}
+
+bool IsText(TIFFDataType type) {
+  return type == TIFF_ASCII || type == TIFF_BYTE || type == TIFF_UNDEFINED;
+}
+
+}  // namespace
+
+void FailToRead(const std::string& path, std::string reason) {
+  while (!reason.empty() && (reason.back() == '.' || reason.back() == '\n')) reason.pop_back();
+  throw Exception(FormatString(_("%s: cannot be read: %s."), path.c_str(),
+                               reason.empty() ? _("the file is damaged") : reason.c_str()),
+                  "host/drivers/tiff/tiffhandle", "FailToRead(const std::string&, std::string)", 0);
+}
+
+TiffHandle::TiffHandle(const std::string& path)
+    : path_(path), errors_(std::make_unique<std::string>()), tiff_(Open(path, *errors_)) {
+  if (!tiff_) FailToRead(path_, *errors_);
+  struct stat status;
+  if (fstat(Descriptor(), &status) == 0) fileSize_ = static_cast<uint64_t>(status.st_size);
+}
+
+TiffHandle TiffHandle::OpenAt(const std::string& path, uint64_t directoryOffset) {
+  TiffHandle handle(path);
+  handle.MoveTo(directoryOffset);
+  return handle;
+}
+
+void TiffHandle::MoveTo(uint64_t directoryOffset) {
+  if (directoryOffset == 0 || directoryOffset == TIFFCurrentDirOffset(Get())) return;
+  ClearErrors();
+  if (!TIFFSetSubDirectory(Get(), directoryOffset)) FailToRead(path_, FirstError());
+}
+
+std::string TiffHandle::TextOf(uint32_t tag) const {
+  const TIFFField* field = TIFFFindField(Get(), tag, TIFF_ANY);
+  if (!field || !IsText(TIFFFieldDataType(field))) return {};
+  const char* text = nullptr;
+  if (!TIFFFieldPassCount(field)) return TIFFGetField(Get(), tag, &text) == 1 && text ? text : "";
+  uint32_t longCount = 0;
+  uint16_t shortCount = 0;
+  const bool isLong = TIFFFieldReadCount(field) == TIFF_VARIABLE2;
+  const int found = isLong ? TIFFGetField(Get(), tag, &longCount, &text)
+                           : TIFFGetField(Get(), tag, &shortCount, &text);
+  if (found != 1 || !text) return {};
+  return {text, std::find(text, text + (isLong ? longCount : shortCount), '\0')};
+}
+
+}  // namespace orin::drivers

@@ -1,0 +1,277 @@
+// SPDX-License-Identifier: MIT
+#include "host/drivers/tiff/tifflevelstore.h"
+
+#include <algorithm>
+#include <utility>
+
+#include "host/drivers/tiff/levelwriter.h"
+#include "host/services/exception.h"
+#include "host/services/text.h"
+
+namespace orin::drivers {
+
+using datasources::LevelDescription;
+
+std::unique_ptr<datasources::ILevelStore> OpenInternalLevels(const std::string& file,
+                                                             const PixelFormat& image,
+                                                             bool update) {
+  auto levels = std::make_unique<LevelFile>(file, update);
+  TiffLevelStore::Settings settings;
+  settings.image = {image.width, image.height, image.samplesPerPixel, image.type, true};
+  settings.coding =
+      CodingOf(levels->File(), levels->Structure(), levels->Structure().directories[0], image);
+  settings.usualSource = 1;
+  return std::make_unique<TiffLevelStore>(std::move(levels), std::move(settings));
+}
+
+TiffLevelStore::TiffLevelStore(std::unique_ptr<LevelFile> file, Settings settings)
+    : file_(std::move(file)), settings_(std::move(settings)) {
+  Reload();
+}
+
+void TiffLevelStore::Reload() {
+  levels_.clear();
+  if (file_->Exists()) levels_ = FindLevels(file_->File(), file_->Structure(), settings_.image);
+}
+
+void TiffLevelStore::Fail(const char* format, unsigned level, const char* operation) const {
+  throw Exception(FormatString(format, file_->Path().c_str(), level),
+                  "host/drivers/tiff/tifflevelstore",
+                  std::string("orin::drivers::TiffLevelStore::") + operation, 0);
+}
+
+const StoredLevel* TiffLevelStore::FindOurs(unsigned level) const {
+  const auto found = std::find_if(
+      levels_.begin(), levels_.end(),
+      [level](const StoredLevel& stored) { return stored.level == level && stored.isOurs; });
+  return found == levels_.end() ? nullptr : &*found;
+}
+
+/// Ours before another program's.
+const StoredLevel* TiffLevelStore::Find(unsigned level) const {
+  if (const StoredLevel* ours = FindOurs(level)) return ours;
+  const auto found =
+      std::find_if(levels_.begin(), levels_.end(),
+                   [level](const StoredLevel& stored) { return stored.level == level; });
+  return found == levels_.end() ? nullptr : &*found;
+}
+
+LevelDescription TiffLevelStore::Describe(const StoredLevel& stored) const {
+  LevelDescription entry;
+  entry.level = stored.level;
+  entry.width = stored.format.width;
+  entry.height = stored.format.height;
+  entry.place = settings_.place;
+  entry.file = file_->Path();
+  entry.method = stored.metadata.method;
+  const std::string& validity = stored.metadata.validity;
+  for (uint32_t i = 0; i < settings_.image.samples; ++i) {
+    entry.presentChannels.push_back(!stored.isOurs || validity[i] != kAbsent);
+    entry.validChannels.push_back(!stored.isOurs || validity[i] == kValid);
+  }
+  if (!stored.isOurs) return entry;
+  entry.sourceLevel = stored.metadata.sourceLevel;
+  entry.program = stored.metadata.program;
+  return entry;
+}
+
+void TiffLevelStore::AddPending(unsigned level, const Pending& pending,
+                                std::vector<LevelDescription>& list) const {
+  auto entry = std::find_if(list.begin(), list.end(),
+                            [level](const LevelDescription& e) { return e.level == level; });
+  if (entry == list.end() || !FindOurs(level)) {
+    if (entry == list.end()) entry = list.emplace(list.end());
+    *entry = LevelDescription();
+    entry->level = level;
+    entry->width = pending.coding.format.width;
+    entry->height = pending.coding.format.height;
+    entry->place = settings_.place;
+    entry->file = file_->Path();
+    entry->method = pending.method;
+    entry->program = ProgramName();
+    entry->presentChannels = pending.channels;
+    entry->validChannels.assign(pending.channels.size(), false);
+  }
+  for (size_t i = 0; i < pending.channels.size(); ++i)
+    if (pending.channels[i]) entry->presentChannels[i] = true;
+}
+
+std::vector<LevelDescription> TiffLevelStore::List() const {
+  const std::lock_guard lock(mutex_);
+  std::vector<LevelDescription> list;
+  for (const StoredLevel& stored : levels_)
+    if (Find(stored.level) == &stored) list.push_back(Describe(stored));
+  for (const auto& [level, pending] : pending_) AddPending(level, pending, list);
+  std::sort(list.begin(), list.end(),
+            [](const LevelDescription& a, const LevelDescription& b) { return a.level < b.level; });
+  return list;
+}
+
+/// Compression and grid are the stored level's; what a directory does not tell is the image's.
+LevelCoding TiffLevelStore::CodingOfStored(const StoredLevel& stored) const {
+  const TiffStructure& structure = file_->Structure();
+  LevelCoding coding =
+      CodingOf(file_->File(), structure, structure.directories[stored.index], stored.format);
+  coding.jpegQuality = settings_.coding.jpegQuality;
+  coding.mayBeSparse = settings_.coding.mayBeSparse;
+  return coding;
+}
+
+void TiffLevelStore::Create(unsigned level, const std::vector<unsigned>& channels,
+                            const std::string& method) {
+  const std::lock_guard lock(mutex_);
+  if (!file_->MayChange())
+    Fail(_("%s: is open for reading only; level %u cannot be made."), level, "Create");
+  auto entry = pending_.find(level);
+  if (entry == pending_.end()) {
+    const StoredLevel* ours = FindOurs(level);
+    Pending pending;
+    pending.channels.resize(settings_.image.samples);
+    pending.coding =
+        ours ? CodingOfStored(*ours) : CodingOfLevel(settings_.coding, level, file_->Path());
+    entry = pending_.emplace(level, std::move(pending)).first;
+  }
+  for (const unsigned channel : channels) entry->second.channels.at(channel - 1) = true;
+  entry->second.method = method;
+  lastRead_ = 0;
+}
+
+std::unique_ptr<datasources::IRasterWriter> TiffLevelStore::OpenWriter(
+    unsigned level, const std::vector<unsigned>& channels) {
+  const std::lock_guard lock(mutex_);
+  const auto pending = pending_.find(level);
+  const StoredLevel* stored = Find(level);
+  if (pending == pending_.end() && !stored) Fail(_("%s: has no level %u."), level, "OpenWriter");
+  const PixelFormat& format =
+      pending == pending_.end() ? stored->format : pending->second.coding.format;
+  return std::make_unique<LevelWriter>(*this, file_->Path(), level, channels, format);
+}
+
+std::unique_ptr<PixelReader> TiffLevelStore::OpenPixels(unsigned level,
+                                                        const std::vector<unsigned>& channels) {
+  const std::lock_guard lock(mutex_);
+  const StoredLevel* stored = Find(level);
+  if (!stored) Fail(_("%s: level %u is not finished and cannot be read."), level, "OpenPixels");
+  if (!pending_.contains(level)) lastRead_ = level;
+  return std::make_unique<PixelReader>(
+      file_->Path(), file_->Structure().directories[stored->index].offset, channels);
+}
+
+std::unique_ptr<PixelReader> TiffLevelStore::OpenStoredTiles(unsigned level) {
+  const std::lock_guard lock(mutex_);
+  const StoredLevel* ours = FindOurs(level);
+  if (!ours) return nullptr;
+  return std::make_unique<PixelReader>(
+      file_->Path(), file_->Structure().directories[ours->index].offset, std::vector<unsigned>{1});
+}
+
+/// The pending level; one of ours that is in the file becomes pending again.
+TiffLevelStore::Pending& TiffLevelStore::Reopen(unsigned level,
+                                                const std::vector<unsigned>& channels) {
+  const StoredLevel* ours = FindOurs(level);
+  const auto entry = pending_.find(level);
+  if (entry == pending_.end() && !ours)
+    Fail(_("%s: level %u was not created; another program's level is never written."), level,
+         "BeginWriting");
+  for (const unsigned channel : channels) {
+    const bool isCreated = (ours && ours->metadata.validity[channel - 1] != kAbsent) ||
+                           (entry != pending_.end() && entry->second.channels[channel - 1]);
+    if (!isCreated)
+      Fail(_("%s: level %u was not created for all channels to be written."), level,
+           "BeginWriting");
+  }
+  if (entry != pending_.end()) return entry->second;
+  Pending pending;
+  pending.channels.resize(settings_.image.samples);
+  pending.method = ours->metadata.method;
+  pending.coding = CodingOfStored(*ours);
+  return pending_.emplace(level, std::move(pending)).first->second;
+}
+
+void TiffLevelStore::Mark(const StoredLevel& stored, const std::vector<unsigned>& channels,
+                          char validity) {
+  std::string now = stored.metadata.validity;
+  for (const unsigned channel : channels) now.at(channel - 1) = validity;
+  if (now == stored.metadata.validity) return;
+  file_->Overwrite(stored.validityPosition, now);
+  file_->Sync();
+  Reload();
+}
+
+std::shared_ptr<LevelBuild> TiffLevelStore::BeginWriting(unsigned level,
+                                                         const std::vector<unsigned>& channels) {
+  const std::lock_guard lock(mutex_);
+  Pending& pending = Reopen(level, channels);
+  const StoredLevel* ours = FindOurs(level);
+  std::vector<unsigned> valid;
+  for (const unsigned channel : channels)
+    if (ours && ours->metadata.validity[channel - 1] == kValid) valid.push_back(channel);
+  if (!valid.empty()) Mark(*ours, valid, kInvalid);
+  if (!pending.build)
+    pending.build =
+        std::make_shared<LevelBuild>(pending.coding, file_->ToAppend().End(), file_->Links());
+  ++pending.build->writers;
+  return pending.build;
+}
+
+TilePlace TiffLevelStore::AppendTile(const std::vector<uint8_t>& bytes) {
+  Appender* appender = nullptr;
+  {
+    const std::lock_guard lock(mutex_);
+    appender = &file_->ToAppend();
+  }
+  return {appender->Append(bytes), bytes.size()};
+}
+
+void TiffLevelStore::GiveUp(unsigned level, LevelBuild& build) {
+  build.isClosed = true;
+  pending_.erase(level);
+  const bool isLast = std::none_of(pending_.begin(), pending_.end(),
+                                   [](const auto& entry) { return entry.second.build != nullptr; });
+  if (isLast && build.Links() == file_->Links()) file_->CutBackTo(build.FirstEnd());
+}
+
+void TiffLevelStore::EndWriting(unsigned level, LevelBuild& build) noexcept {
+  const std::lock_guard lock(mutex_);
+  if (--build.writers > 0 || build.isClosed) return;
+  try {
+    if (!build.IsEmpty() && build.HasOnlyCompletePlanes())
+      Store(level, pending_.at(level), CompletePlanes(build));
+  } catch (const std::exception&) {
+    // deliberate: a destructor calls this; the level stays what it was in the file
+  }
+  if (build.isClosed) return;
+  try {
+    GiveUp(level, build);
+  } catch (const std::exception&) {
+    // deliberate: what was appended stays behind unused
+  }
+}
+
+void TiffLevelStore::SetValid(unsigned level, const std::vector<unsigned>& channels, bool valid) {
+  const std::lock_guard lock(mutex_);
+  const auto pending = pending_.find(level);
+  if (valid && pending != pending_.end() && pending->second.build) {
+    const std::vector<uint32_t> planes = PlanesOf(pending->second.coding, channels);
+    for (const uint32_t plane : planes)
+      if (!pending->second.build->IsComplete(plane))
+        Fail(_("%s: level %u is not complete and cannot be marked valid."), level, "SetValid");
+    Store(level, pending->second, planes);
+  }
+  const StoredLevel* stored = Find(level);
+  RequireStored(stored, level, channels);
+  if (stored->isOurs) Mark(*stored, channels, valid ? kValid : kInvalid);
+  else if (!valid)
+    Fail(_("%s: level %u is another program's and cannot be marked."), level, "SetValid");
+}
+
+void TiffLevelStore::RequireStored(const StoredLevel* stored, unsigned level,
+                                   const std::vector<unsigned>& channels) const {
+  if (!stored || (!stored->isOurs && pending_.contains(level)))
+    Fail(_("%s: level %u is not complete and cannot be marked."), level, "SetValid");
+  for (const unsigned channel : channels)
+    if (stored->isOurs && stored->metadata.validity.at(channel - 1) == kAbsent)
+      Fail(_("%s: level %u is not complete and cannot be marked."), level, "SetValid");
+}
+
+}  // namespace orin::drivers

@@ -1,0 +1,108 @@
+/// The levels of one raster in a TIFF file: inside the image's own file, or in a side-car.
+// SPDX-License-Identifier: MIT
+#pragma once
+
+#include <map>
+#include <memory>
+#include <mutex>
+#include <string>
+#include <vector>
+
+#include "host/datasources/levelstore.h"
+#include "host/drivers/tiff/levelbuild.h"
+#include "host/drivers/tiff/levelcoding.h"
+#include "host/drivers/tiff/leveldirectories.h"
+#include "host/drivers/tiff/levelfile.h"
+#include "host/drivers/tiff/pixelreader.h"
+
+namespace orin::drivers {
+
+/// The levels inside the TIFF file of an image.
+/// \param image   format of the file's first directory
+/// \param update  levels may be made and changed
+/// \throws orin::Exception  the file's structure cannot be read
+std::unique_ptr<datasources::ILevelStore> OpenInternalLevels(const std::string& file,
+                                                             const PixelFormat& image, bool update);
+
+/// A level appears in the file when it is complete: tiles first, then its directory, then the link
+/// to it, then its validity, each durable before the next. Until then it is pending here; a pending
+/// level that is given up leaves nothing behind.
+///
+/// Operations may be called from several threads.
+class TiffLevelStore final : public datasources::ILevelStore {
+ public:
+  struct Settings {
+    ImageShape image;
+    LevelCoding coding;  ///< of the image, from which new levels take theirs
+    datasources::LevelPlace place = datasources::LevelPlace::kInternal;
+    unsigned usualSource = 0;  ///< recorded as a level's source when no level was read for it
+  };
+  /// \throws orin::Exception  the file cannot be read
+  TiffLevelStore(std::unique_ptr<LevelFile> file, Settings settings);
+
+  std::vector<datasources::LevelDescription> List() const override;
+  void Create(unsigned level, const std::vector<unsigned>& channels,
+              const std::string& method) override;
+  std::unique_ptr<datasources::IRasterWriter> OpenWriter(
+      unsigned level, const std::vector<unsigned>& channels) override;
+  void SetValid(unsigned level, const std::vector<unsigned>& channels, bool valid) override;
+
+  // For the level writers.
+
+  /// A reader of a level that is in the file. \throws orin::Exception  it is not
+  std::unique_ptr<PixelReader> OpenPixels(unsigned level, const std::vector<unsigned>& channels);
+  /// A reader of the level's tiles, or null when they do not exist yet.
+  std::unique_ptr<PixelReader> OpenStoredTiles(unsigned level);
+  /// Marks the channels as not valid and joins or starts the level's build.
+  /// \throws orin::Exception  the level was not created for them
+  std::shared_ptr<LevelBuild> BeginWriting(unsigned level, const std::vector<unsigned>& channels);
+  /// Adds a tile to the file. \returns where it is
+  TilePlace AppendTile(const std::vector<uint8_t>& bytes);
+  /// A writer leaves: when it is the last one, complete planes are stored, not valid; else all that
+  /// was written is given up.
+  void EndWriting(unsigned level, LevelBuild& build) noexcept;
+
+ private:
+  struct Pending {
+    std::vector<bool> channels;  ///< created
+    std::string method;
+    LevelCoding coding;
+    std::shared_ptr<LevelBuild> build;  ///< null until the first write
+  };
+
+  const StoredLevel* Find(unsigned level) const;
+  const StoredLevel* FindOurs(unsigned level) const;
+  void Reload();
+  datasources::LevelDescription Describe(const StoredLevel& stored) const;
+  void AddPending(unsigned level, const Pending& pending,
+                  std::vector<datasources::LevelDescription>& list) const;
+  LevelCoding CodingOfStored(const StoredLevel& stored) const;
+  Pending& Reopen(unsigned level, const std::vector<unsigned>& channels);
+  void Mark(const StoredLevel& stored, const std::vector<unsigned>& channels, char validity);
+
+  LevelMetadata MetadataFor(unsigned level, const Pending& pending,
+                            const StoredLevel* before) const;
+  std::vector<uint32_t> PlanesOf(const LevelCoding& coding,
+                                 const std::vector<unsigned>& channels) const;
+  std::vector<uint32_t> CompletePlanes(const LevelBuild& build) const;
+  void RequireStored(const StoredLevel* stored, unsigned level,
+                     const std::vector<unsigned>& channels) const;
+  void Store(unsigned level, Pending& pending, const std::vector<uint32_t>& planes);
+  bool CanPatch(const StoredLevel& stored, const LevelMetadata& metadata,
+                const LevelBuild& build) const;
+  void Patch(const StoredLevel& stored, const LevelMetadata& metadata, const LevelBuild& build,
+             const std::vector<uint32_t>& planes);
+  void AddDirectory(unsigned level, const LevelMetadata& metadata, const LevelBuild& build,
+                    const std::vector<uint32_t>& planes);
+  void GiveUp(unsigned level, LevelBuild& build);
+  [[noreturn]] void Fail(const char* format, unsigned level, const char* operation) const;
+
+  mutable std::mutex mutex_;
+  std::unique_ptr<LevelFile> file_;
+  Settings settings_;
+  std::vector<StoredLevel> levels_;
+  std::map<unsigned, Pending> pending_;
+  unsigned lastRead_ = 0;  ///< level whose pixels were read since the last Create; 0 none
+};
+
+}  // namespace orin::drivers

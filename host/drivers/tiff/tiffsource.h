@@ -1,0 +1,44 @@
+/// The image of a TIFF file, its first directory, as a raster source.
+// SPDX-License-Identifier: MIT
+#pragma once
+
+#include <memory>
+#include <string>
+#include <vector>
+
+#include "host/datasources/dataset.h"
+#include "host/datasources/levelstore.h"
+#include "host/drivers/tiff/gdalmetadata.h"
+#include "host/drivers/tiff/pixelformat.h"
+
+namespace orin::drivers {
+
+class TiffSource final : public datasources::IRasterSource {
+ public:
+  /// \throws orin::Exception  not a TIFF file, its layout is not supported, or for kUpdate: it cannot be
+  ///                          opened for writing
+  TiffSource(std::string file, datasources::AccessMode access);
+  ~TiffSource() override;
+
+  const std::string& File() const { return file_; }
+  const PixelFormat& Format() const { return format_; }
+
+  unsigned Width() const override { return format_.width; }
+  unsigned Height() const override { return format_.height; }
+  unsigned ChannelCount() const override { return format_.samplesPerPixel; }
+  gobs::DataType TypeOf(unsigned) const override { return format_.type; }
+  /// Items of the default domain. The no-data value is the item of that name, else the no-data tag
+  /// where that is a finite decimal number.
+  datasources::AuxiliaryData MetadataOf(const std::vector<unsigned>& channels) const override;
+  std::unique_ptr<datasources::IRasterReader> OpenReader(
+      const std::vector<unsigned>& channels) override;
+  datasources::ILevelStore* Levels() override { return levels_.get(); }
+
+ private:
+  std::string file_;
+  PixelFormat format_;
+  std::vector<MetadataItem> metadata_;
+  std::unique_ptr<datasources::ILevelStore> levels_;
+};
+
+}  // namespace orin::drivers
