@@ -113,6 +113,7 @@ class Differential {
       omp_set_num_threads(threads);
       SCOPED_TRACE(::testing::Message() << threads << " threads");
       CheckRound();
+      if (::testing::Test::HasFailure()) return;
     }
   }
 
