@@ -1,4 +1,4 @@
-/// Speed of the resampling methods on one thread (OMP_NUM_THREADS=1): method x pixel type x mask, halving.
+/// Speed of the resampling methods when halving; set OMP_NUM_THREADS=1 for one thread.
 // SPDX-License-Identifier: MIT
 #include <benchmark/benchmark.h>
 
@@ -20,12 +20,13 @@ constexpr uint32_t kMargin = 3;   // enough for every method
 /// A block whose samples, margin included, are random bytes; floats are small whole numbers.
 template <class T>
 std::unique_ptr<gobs::Raster> RandomBlock(uint32_t side, uint32_t channels, uint32_t margin) {
-  auto block = std::make_unique<gobs::Raster>(
-      gobs::RasterInfo(side, side, channels, gobs::DataTypeOf<T>()),
-      parallelio::ProcessWindow{margin, margin, 0, 0});
+  auto block =
+      std::make_unique<gobs::Raster>(gobs::RasterInfo(side, side, channels, gobs::DataTypeOf<T>()),
+                                     parallelio::ProcessWindow{margin, margin, 0, 0});
   std::minstd_rand random(1);
   T* const samples = reinterpret_cast<T*>(block->data);
-  for (uint64_t i = 0; i < block->byteSize / sizeof(T); ++i) samples[i] = static_cast<T>(random() >> 8);
+  for (uint64_t i = 0; i < block->byteSize / sizeof(T); ++i)
+    samples[i] = static_cast<T>(random() >> 8);
   return block;
 }
 
@@ -71,11 +72,12 @@ bool RegisterTypes(const std::string& method) {
   return true;
 }
 
-[[maybe_unused]] const bool kRegistered = RegisterTypes<NearestNeighbourResamplerFactory>("Nearest") &&
-                                          RegisterTypes<AverageResamplerFactory>("Average") &&
-                                          RegisterTypes<ModeResamplerFactory>("Mode") &&
-                                          RegisterTypes<BilinearResamplerFactory>("Bilinear") &&
-                                          RegisterTypes<BicubicResamplerFactory>("Bicubic");
+[[maybe_unused]] const bool kRegistered =
+    RegisterTypes<NearestNeighbourResamplerFactory>("Nearest") &&
+    RegisterTypes<AverageResamplerFactory>("Average") &&
+    RegisterTypes<ModeResamplerFactory>("Mode") &&
+    RegisterTypes<BilinearResamplerFactory>("Bilinear") &&
+    RegisterTypes<BicubicResamplerFactory>("Bicubic");
 
 }  // namespace
 }  // namespace orin::resamplers

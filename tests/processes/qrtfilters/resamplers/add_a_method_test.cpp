@@ -1,4 +1,4 @@
-/// A sixth method costs one small file and one factory, and works through the manager like the five.
+/// A sixth method costs one small file and a factory, and works through the manager like the five.
 // SPDX-License-Identifier: MIT
 #include <gtest/gtest.h>
 
@@ -24,14 +24,16 @@ TYPED_TEST(AddedMethod, RunsThroughTheManagerForEveryPixelType) {
   ResamplerManager manager;
   manager.factory = &factory;
   manager.xRatio = manager.yRatio = 0.5;
+  // clang-format off
   const auto src = BlockOf<TypeParam>({{9, 8, 7, 6},
                                        {9, 3, 7, 6},
                                        {9, 8, 7, 2},
                                        {9, 8, 1, 6}}, {1, 1, 1, false});
+  // clang-format on
   const auto dst = testing::EmptyBlock<TypeParam>(2, 2, {1, 0, 0, false}, TypeParam{77});
   manager.ProcessBlock(src.get(), dst.get());
-  EXPECT_EQ((Picture<TypeParam>{{3, 3},
-                                {3, 1}}), testing::PictureOf<TypeParam>(*dst));
+  const Picture<TypeParam> expected{{3, 3}, {3, 1}};
+  EXPECT_EQ(expected, testing::PictureOf<TypeParam>(*dst));
 }
 
 TEST(AddedMethodWithAMask, GetsTheMaskRuleForNothing) {

@@ -9,6 +9,9 @@
 #include "processes/qrtfilters/resamplers/average.h"
 #include "tests/processes/qrtfilters/resamplers/blocks.h"
 
+// Pictures keep their lines.
+// clang-format off
+
 namespace orin::resamplers {
 namespace {
 
@@ -137,7 +140,7 @@ TEST(Average, GroundCoordinatesOfAnEnlargementByTwoTakeTheExactPath) {
 
 TEST(Average, GroundDistancesAreCutToWholeNumbersBeforeTheyAreDivided) {
   Average<uint8_t> kernel;
-  // Columns start at 0.9, 2.4: cut to 0, 2 and divided by 0.5 they are columns 0 and 4, not 1 and 4.
+  // From 0.9 to 2.4: cut to 0 and 2, and divided by 0.5, that is columns 0 to 3; not 1 to 3.
   kernel.SetGeoReference(0, 0, 0.5, 1, 0.9, 0, 1.5, 1);
   const auto src = BlockOf<uint8_t>({{10, 20, 30, 40, 50, 60}}, kMargin);
   EXPECT_EQ((Picture<uint8_t>{{25}}), Resampled<uint8_t>(kernel, *src, nullptr, 1, 1));
@@ -164,7 +167,8 @@ TEST(Average, ClearNeighbourOfAValidCentreCountsAsTheCentre) {
   kernel.SetRatio(0.25, 1);
   const auto src = BlockOf<uint8_t>({{10, 100, 20, 30}}, kMargin);
   const auto mask = MaskOf(*src, {".x.."});
-  EXPECT_EQ((Picture<uint8_t>{{18}}), Resampled<uint8_t>(kernel, *src, mask.get(), 1, 1));   // 70 / 4
+  // 70 / 4
+  EXPECT_EQ((Picture<uint8_t>{{18}}), Resampled<uint8_t>(kernel, *src, mask.get(), 1, 1));
 }
 
 TEST(Average, ClearCentreGivesNoDataInEveryChannel) {
@@ -195,8 +199,7 @@ TEST(Average, ChannelsThatTheSourceLacksNeverReadPastItsBuffer) {
   EXPECT_EQ((Picture<uint8_t>{std::vector<uint8_t>(40, 10)}), testing::PictureOf<uint8_t>(*dst));
 }
 
-/// The complex mean of one line of (re, im) pairs: by the exact path for two samples drawn twice, by the
-/// general one for any other number.
+/// The complex mean of a picture of (re, im) pairs in one pixel.
 template <class T>
 std::vector<T> ComplexMeanOf(const Picture<T>& picture, double ratio) {
   Average<T> kernel;
@@ -215,7 +218,7 @@ std::vector<std::vector<T>> BothPaths(const std::vector<T>& two) {
 }
 
 TEST(AverageComplex, MeanPointsAlongTheSumAndHasTheMeanMagnitude) {
-  for (const auto& mean : BothPaths<double>({3, 4, 4, 3})) {   // magnitudes 5 and 5, sum along (1, 1)
+  for (const auto& mean : BothPaths<double>({3, 4, 4, 3})) {   // magnitudes 5 and 5, along (1, 1)
     EXPECT_NEAR(5 / std::sqrt(2.0), mean[0], 1e-12);
     EXPECT_NEAR(5 / std::sqrt(2.0), mean[1], 1e-12);
   }
@@ -233,11 +236,11 @@ TEST(AverageComplex, LargeIntegersWrapRoundInTheirSquares) {
   // 32768 * 32768 * 2 is 2^31 and wraps to a negative number, whose root is no number.
   for (const auto& mean : BothPaths<short>({-32768, -32768, -32768, -32768}))
     EXPECT_EQ((std::vector<short>{0, 0}), mean);
-  for (const auto& mean : BothPaths<unsigned short>({65535, 0, 65535, 0}))   // 65535^2 as signed: < 0
+  for (const auto& mean : BothPaths<unsigned short>({65535, 0, 65535, 0}))   // as signed: < 0
     EXPECT_EQ((std::vector<unsigned short>{0, 0}), mean);
   for (const auto& mean : BothPaths<unsigned int>({65535, 0, 65535, 0}))     // unsigned: fits
     EXPECT_EQ((std::vector<unsigned int>{65535, 0}), mean);
-  for (const auto& mean : BothPaths<unsigned int>({65536, 7, 65536, 7}))     // 2^32 + 49 wraps to 49
+  for (const auto& mean : BothPaths<unsigned int>({65536, 7, 65536, 7}))   // wraps to 49
     EXPECT_EQ((std::vector<unsigned int>{7, 0}), mean);
   for (const auto& mean : BothPaths<int64_t>({65536, 0, 65536, 0}))
     EXPECT_EQ((std::vector<int64_t>{65536, 0}), mean);

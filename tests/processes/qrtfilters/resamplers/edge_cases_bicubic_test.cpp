@@ -7,6 +7,9 @@
 #include "processes/qrtfilters/resamplers/bicubic.h"
 #include "tests/processes/qrtfilters/resamplers/blocks.h"
 
+// Pictures keep their lines.
+// clang-format off
+
 namespace orin::resamplers {
 namespace {
 
@@ -56,7 +59,8 @@ T IdentityOf(T value) {
 template <class T>
 void ExpectIdentity() {
   using Limits = std::numeric_limits<T>;
-  for (const T value : {Limits::lowest(), Limits::max(), T{0}, T{1}}) EXPECT_EQ(value, IdentityOf(value));
+  for (const T value : {Limits::lowest(), Limits::max(), T{0}, T{1}})
+    EXPECT_EQ(value, IdentityOf(value));
 }
 
 TEST(Bicubic, RatioOneIsTheIdentityUpToSixteenBitsAndForFloat) {
@@ -126,7 +130,8 @@ TEST(Bicubic, HalvingReadsOnePixelLeftAndTwoRight) {
   const auto view = gobs::ViewOf<double>(*src, 1);
   *view.At(-1, 0) = 0;
   // Samples 0, 0, 255, 0 and 255, 0, 0, 0 half way.
-  EXPECT_EQ((Picture<double>{{143.4375, -15.9375}}), Resampled<double>(kernel, *src, nullptr, 2, 1));
+  const auto half = Resampled<double>(kernel, *src, nullptr, 2, 1);
+  EXPECT_EQ((Picture<double>{{143.4375, -15.9375}}), half);
 }
 
 }  // namespace

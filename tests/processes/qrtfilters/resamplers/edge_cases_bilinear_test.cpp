@@ -7,6 +7,9 @@
 #include "processes/qrtfilters/resamplers/bilinear.h"
 #include "tests/processes/qrtfilters/resamplers/blocks.h"
 
+// Pictures keep their lines.
+// clang-format off
+
 namespace orin::resamplers {
 namespace {
 

@@ -8,6 +8,9 @@
 #include "processes/qrtfilters/resamplers/mode.h"
 #include "tests/processes/qrtfilters/resamplers/blocks.h"
 
+// Pictures keep their lines.
+// clang-format off
+
 namespace orin::resamplers {
 namespace {
 
@@ -109,7 +112,8 @@ TEST(Mode, FloatsAreEqualWithinOneFixedTolerance) {
   const double sum = 0.1 + 0.2;
   EXPECT_EQ(sum, ModeOf<double>({{sum, 0.3, 5},
                                  {0.3, 5,   5},
-                                 {0.3, 7,   8}}));   // four of one value, and the first stands for it
+                                 // four of one value, and the first stands for it
+                                 {0.3, 7,   8}}));
 }
 
 TEST(Mode, NoNumbersAndInfinitiesEqualNothing) {
@@ -130,7 +134,7 @@ TEST(Mode, HalvingByRatioMapsToEvenColumns) {
   Mode<int> kernel;
   kernel.SetRatio(0.5, 1);
   const auto src = BlockOf<int>(kSteps, kMargin);
-  // Columns 0, 2, 4: the margin's 1 makes the first a majority; the others tie, and the left one wins.
+  // Columns 0, 2, 4: the margin's 1 makes the first a majority; in a tie the left one wins.
   EXPECT_EQ((Picture<int>{{1, 2, 4}}), Resampled<int>(kernel, *src, nullptr, 3, 1));
 }
 

@@ -31,7 +31,8 @@ template <class T>
 class Minimum final : public Resampler {
  public:
   void Resample(gobs::Raster* src, gobs::Mask* srcMask, gobs::Raster* dst) override {
-    detail::RequireMargin(*src, GetMargin(), "Input rasters must have at least a one pixel margin.");
+    detail::RequireMargin(*src, GetMargin(),
+                          "Input rasters must have at least a one pixel margin.");
     detail::RequireSameChannels(*src, *dst);
     detail::ResampleNeighbourhoods<MinimumMethod<T>, T>(state_, *src, srcMask, *dst);
   }
