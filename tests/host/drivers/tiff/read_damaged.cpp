@@ -187,7 +187,7 @@ TEST(Damaged, TileIsNamedWithTheReason) {
               AllOf(StartsWith(file + ": cannot be read: tile 3: "), HasSubstr("Decoding error")));
 }
 
-/// Writes a directory whose first `count` strips hold so many bytes of no use.
+/// Writes a directory whose first `count` strips or tiles hold so many bytes of no use.
 void WriteClaims(const std::string& file, const Layout& layout, uint32_t count, uint32_t bytes) {
   TIFF* tiff = TIFFOpen(file.c_str(), "w");
   ASSERT_NE(nullptr, tiff);
@@ -195,7 +195,8 @@ void WriteClaims(const std::string& file, const Layout& layout, uint32_t count, 
   TIFFWriteCheck(tiff, layout.tile != 0, "");
   std::vector<uint8_t> stored(bytes, 1);
   for (uint32_t i = 0; i < count; ++i)
-    ASSERT_EQ(tmsize_t{bytes}, TIFFWriteRawStrip(tiff, i, stored.data(), bytes));
+    ASSERT_EQ(tmsize_t{bytes}, layout.tile ? TIFFWriteRawTile(tiff, i, stored.data(), bytes)
+                                           : TIFFWriteRawStrip(tiff, i, stored.data(), bytes));
   TIFFWriteDirectory(tiff);
   TIFFClose(tiff);
 }
@@ -226,6 +227,28 @@ TEST(Huge, ClaimsOfFewBytesFailWithoutTakingMemory) {
     }
   }
   EXPECT_LT(PeakMegabytes(), before + 64);
+}
+
+TEST(Huge, TilesFailWithoutTakingMemory) {
+  const ScratchFolder folder;
+  Layout layout;
+  layout.width = layout.height = layout.tile = 1u << 20;
+  layout.samples = 1024;
+  layout.bits = 128;
+  layout.sampleFormat = SAMPLEFORMAT_COMPLEXIEEEFP;
+  for (const uint16_t compression : {COMPRESSION_NONE, COMPRESSION_ADOBE_DEFLATE}) {
+    layout.compression = compression;
+    const std::string file = folder.File("image.tif");
+    WriteClaims(file, layout, 1, 20);
+    try {
+      drivers::PixelReader reader(file, 0, {1});
+      gobs::Raster block({8, 8, 1, reader.Format().type}, {});
+      reader.Read(block);
+      ADD_FAILURE() << "the pixels are not there";
+    } catch (const Exception& failure) {
+      EXPECT_THAT(failure.what(), StartsWith(file + ": cannot be read: "));
+    }
+  }
 }
 
 TEST(Huge, SparseImagesAreReadWhereverTheWindowLies) {
