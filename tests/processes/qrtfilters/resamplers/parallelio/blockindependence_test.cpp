@@ -3,8 +3,8 @@
 #include <gtest/gtest.h>
 #include <omp.h>
 
-#include <functional>
 #include <memory>
+#include <string>
 #include <vector>
 
 #include "host/datasources/basicreader.h"
@@ -133,11 +133,12 @@ TEST_P(BlockIndependence, OneTwoThreeAndEightThreadsGiveTheSameBytes) {
   }
 }
 
-INSTANTIATE_TEST_SUITE_P(Methods, BlockIndependence, ::testing::Range(0, 5),
-                         [](const ::testing::TestParamInfo<int>& info) {
-                           const char* const names[] = {"Nearest", "Average", "Mode", "Bilinear", "Bicubic"};
-                           return std::string(names[info.param]);
-                         });
+std::string MethodName(const ::testing::TestParamInfo<int>& method) {
+  const char* const names[] = {"Nearest", "Average", "Mode", "Bilinear", "Bicubic"};
+  return names[method.param];
+}
+
+INSTANTIATE_TEST_SUITE_P(Methods, BlockIndependence, ::testing::Range(0, 5), MethodName);
 
 }  // namespace
 }  // namespace orin::parallelio
