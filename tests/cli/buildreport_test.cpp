@@ -37,7 +37,8 @@ LevelState State(std::vector<unsigned> valid, std::vector<unsigned> unfinished, 
 }
 
 TEST(AfterFileName, EveryLineNamesTheFileOnce) {
-  EXPECT_EQ("a.tif: Failed.\na.tif: disk full", AfterFileName("a.tif", "Failed.\na.tif: disk full"));
+  EXPECT_EQ("a.tif: Failed.\na.tif: disk full",
+            AfterFileName("a.tif", "Failed.\na.tif: disk full"));
   EXPECT_EQ("a.tif: one\na.tif: two", AfterFileName("a.tif", "one\n\ntwo\n"));
   EXPECT_EQ("", AfterFileName("a.tif", ""));
 }
@@ -47,6 +48,14 @@ TEST(BuildReport, TheSummaryTellsWhatWasBuiltHowAndWhere) {
             SummaryText(Plan({}), State({2, 4, 8}, {}, LevelPlace::kInternal)));
   EXPECT_EQ("levels built: 4, 8 (AVERAGE, in scene.tif.ovr); already up to date: 2",
             SummaryText(Plan({2}), State({2, 4, 8}, {}, LevelPlace::kSideCar)));
+}
+
+TEST(BuildReport, LevelsInBothPlacesAreWorthANotice) {
+  LevelState state = State({2, 4}, {}, LevelPlace::kInternal);
+  EXPECT_EQ("", HiddenLevelsText(state));
+  state.descriptions.push_back(Level(8, LevelPlace::kSideCar));
+  EXPECT_NE("", HiddenLevelsText(state));
+  EXPECT_EQ("", HiddenLevelsText(State({2, 4}, {}, LevelPlace::kSideCar)));
 }
 
 TEST(BuildReport, NothingToDoSaysWhy) {
@@ -86,8 +95,10 @@ TEST(BuildReport, TheAdviceFitsTheFailure) {
   EXPECT_NE(std::string::npos, AdviceAfterFailure(658, state, options).find("--external"));
   EXPECT_NE(std::string::npos, AdviceAfterFailure(670, state, options).find("--external"));
   EXPECT_NE(std::string::npos, AdviceAfterFailure(698, state, options).find("--method nearest"));
-  EXPECT_EQ("Levels finished: 2; still to do: 4, 8. The same command continues there.",
-            AdviceAfterFailure(913, state, options));
+  EXPECT_EQ(
+      "Levels finished: 2; still to do: 4, 8. "
+      "When the cause is removed, the same command continues there.",
+      AdviceAfterFailure(913, state, options));
   EXPECT_EQ("", AdviceAfterFailure(625, state, options));
 }
 
