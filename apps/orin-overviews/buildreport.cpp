@@ -93,6 +93,8 @@ std::string NothingToDoText(const BuildPlan& plan) {
   if (plan.channels.empty())
     return _("nothing to do: all channels are masks of one bit, which have no levels");
   if (!plan.kept.empty()) return FormatString(_("nothing to do; %s"), KeptText(plan).c_str());
+  if (!plan.building.empty())
+    return _("nothing to do: every level asked for is larger than the image");
   return FormatString(_("nothing to do: %u x %u pixels need no levels"), plan.width, plan.height);
 }
 

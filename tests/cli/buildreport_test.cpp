@@ -62,6 +62,10 @@ TEST(BuildReport, NothingToDoSaysWhy) {
   EXPECT_EQ("nothing to do; already up to date: 2, 4, 8",
             SummaryText(Plan({2, 4, 8}), State({2, 4, 8}, {}, LevelPlace::kInternal)));
   EXPECT_EQ("nothing to do: 1000 x 700 pixels need no levels", NothingToDoText(Plan({})));
+  BuildPlan tooLarge = Plan({});
+  tooLarge.building = {{2000, true}};
+  EXPECT_EQ("nothing to do: every level asked for is larger than the image",
+            NothingToDoText(tooLarge));
   BuildPlan masks = Plan({});
   masks.channels.clear();
   EXPECT_EQ("nothing to do: all channels are masks of one bit, which have no levels",
