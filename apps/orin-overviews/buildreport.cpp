@@ -55,6 +55,13 @@ std::string ContinueText(const BuildOptions& options) {
                        : _("The same command continues there.");
 }
 
+/// After a failure, which comes back unless its cause goes.
+std::string RetryText(const BuildOptions& options) {
+  return options.force
+             ? _("When the cause is removed, the same command without --force continues there.")
+             : _("When the cause is removed, the same command continues there.");
+}
+
 }  // namespace
 
 std::string AfterFileName(const std::string& file, const std::string& text) {
@@ -86,12 +93,24 @@ std::string NothingToDoText(const BuildPlan& plan) {
   if (plan.channels.empty())
     return _("nothing to do: all channels are masks of one bit, which have no levels");
   if (!plan.kept.empty()) return FormatString(_("nothing to do; %s"), KeptText(plan).c_str());
+  if (!plan.building.empty())
+    return _("nothing to do: every level asked for is larger than the image");
   return FormatString(_("nothing to do: %u x %u pixels need no levels"), plan.width, plan.height);
 }
 
 std::string LeftOutText(const BuildPlan& plan, unsigned level) {
   return FormatString(_("level %u is left out: of %u x %u pixels nothing would remain."), level,
                       plan.width, plan.height);
+}
+
+std::string HiddenLevelsText(const LevelState& state) {
+  const auto stands = [&](datasources::LevelPlace place) {
+    return std::any_of(state.descriptions.begin(), state.descriptions.end(),
+                       [&](const auto& level) { return level.place == place; });
+  };
+  if (!stands(datasources::LevelPlace::kInternal) || !stands(datasources::LevelPlace::kSideCar))
+    return "";
+  return _("many programs see only the levels inside the file when there are some beside it too.");
 }
 
 std::string InterruptedText(const LevelState& state, const BuildOptions& options) {
@@ -110,7 +129,7 @@ std::string AdviceAfterFailure(unsigned line, const LevelState& state,
     case kComplexNotSupported:
       return _("Use --method nearest or --method average.");
     case kRunFailed:
-      return state.unfinished.empty() ? "" : StateText(state) + " " + ContinueText(options);
+      return state.unfinished.empty() ? "" : StateText(state) + " " + RetryText(options);
     default:
       return "";
   }

@@ -37,7 +37,8 @@ LevelState State(std::vector<unsigned> valid, std::vector<unsigned> unfinished, 
 }
 
 TEST(AfterFileName, EveryLineNamesTheFileOnce) {
-  EXPECT_EQ("a.tif: Failed.\na.tif: disk full", AfterFileName("a.tif", "Failed.\na.tif: disk full"));
+  EXPECT_EQ("a.tif: Failed.\na.tif: disk full",
+            AfterFileName("a.tif", "Failed.\na.tif: disk full"));
   EXPECT_EQ("a.tif: one\na.tif: two", AfterFileName("a.tif", "one\n\ntwo\n"));
   EXPECT_EQ("", AfterFileName("a.tif", ""));
 }
@@ -49,10 +50,22 @@ TEST(BuildReport, TheSummaryTellsWhatWasBuiltHowAndWhere) {
             SummaryText(Plan({2}), State({2, 4, 8}, {}, LevelPlace::kSideCar)));
 }
 
+TEST(BuildReport, LevelsInBothPlacesAreWorthANotice) {
+  LevelState state = State({2, 4}, {}, LevelPlace::kInternal);
+  EXPECT_EQ("", HiddenLevelsText(state));
+  state.descriptions.push_back(Level(8, LevelPlace::kSideCar));
+  EXPECT_NE("", HiddenLevelsText(state));
+  EXPECT_EQ("", HiddenLevelsText(State({2, 4}, {}, LevelPlace::kSideCar)));
+}
+
 TEST(BuildReport, NothingToDoSaysWhy) {
   EXPECT_EQ("nothing to do; already up to date: 2, 4, 8",
             SummaryText(Plan({2, 4, 8}), State({2, 4, 8}, {}, LevelPlace::kInternal)));
   EXPECT_EQ("nothing to do: 1000 x 700 pixels need no levels", NothingToDoText(Plan({})));
+  BuildPlan tooLarge = Plan({});
+  tooLarge.building = {{2000, true}};
+  EXPECT_EQ("nothing to do: every level asked for is larger than the image",
+            NothingToDoText(tooLarge));
   BuildPlan masks = Plan({});
   masks.channels.clear();
   EXPECT_EQ("nothing to do: all channels are masks of one bit, which have no levels",
@@ -86,8 +99,10 @@ TEST(BuildReport, TheAdviceFitsTheFailure) {
   EXPECT_NE(std::string::npos, AdviceAfterFailure(658, state, options).find("--external"));
   EXPECT_NE(std::string::npos, AdviceAfterFailure(670, state, options).find("--external"));
   EXPECT_NE(std::string::npos, AdviceAfterFailure(698, state, options).find("--method nearest"));
-  EXPECT_EQ("Levels finished: 2; still to do: 4, 8. The same command continues there.",
-            AdviceAfterFailure(913, state, options));
+  EXPECT_EQ(
+      "Levels finished: 2; still to do: 4, 8. "
+      "When the cause is removed, the same command continues there.",
+      AdviceAfterFailure(913, state, options));
   EXPECT_EQ("", AdviceAfterFailure(625, state, options));
 }
 

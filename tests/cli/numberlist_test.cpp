@@ -27,15 +27,18 @@ TEST(NumberList, AChannelNamedTwiceCountsOnceWhereItStoodFirst) {
 }
 
 TEST(NumberList, WhatIsNoListIsNamedInTheProblem) {
-  for (const char* const text : {"", "2,", ",2", "2;4", "two", "2 ,4", "-2", "+2", "4294967296", "0x2"}) {
+  for (const char* const text :
+       {"", "2,", ",2", "2;4", "two", "2 ,4", "-2", "+2", "4294967296", "0x2"}) {
     const NumberList list = ParseLevels(text);
     EXPECT_TRUE(list.numbers.empty()) << text;
-    EXPECT_NE(std::string::npos, list.problem.find("\"" + std::string(text) + "\"")) << list.problem;
+    EXPECT_NE(std::string::npos, list.problem.find("\"" + std::string(text) + "\""))
+        << list.problem;
   }
   for (const char* const text : {"", "1,", "5-3", "1-", "-1", "1-2-3", "a-b"}) {
     const NumberList list = ParseChannels(text);
     EXPECT_TRUE(list.numbers.empty()) << text;
-    EXPECT_NE(std::string::npos, list.problem.find("\"" + std::string(text) + "\"")) << list.problem;
+    EXPECT_NE(std::string::npos, list.problem.find("\"" + std::string(text) + "\""))
+        << list.problem;
   }
 }
 

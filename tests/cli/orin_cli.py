@@ -11,8 +11,8 @@ TOOL = os.environ["ORIN_TOOL"]
 
 def environment(**changes):
     """A user's environment without preferences and without a language of its own."""
-    variables = {name: value for name, value in os.environ.items()
-                 if not name.startswith(("LC_", "ORIN_", "XDG_")) and name not in ("LANG", "LANGUAGE")}
+    own = ("LANG", "LC_", "ORIN_", "XDG_")
+    variables = {name: value for name, value in os.environ.items() if not name.startswith(own)}
     variables.update(ORIN_PREFERENCES="/dev/null", LC_ALL="C.UTF-8", TERM="xterm")
     variables.update({name: str(value) for name, value in changes.items()})
     return variables

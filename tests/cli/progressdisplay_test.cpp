@@ -27,12 +27,18 @@ TEST(ProgressLine, ANarrowTerminalGetsThePerCentAlone) {
 }
 
 TEST(ProgressLine, ALongNameShowsItsEndWithoutCuttingACharacter) {
-  const std::string line =
-      ProgressLine("\xC3\xA9\xC3\xA9\xC3\xA9\xC3\xA9" "123456789012345678901234567.tif", 2, 0, 80);
+  const std::string line = ProgressLine(
+      "\xC3\xA9\xC3\xA9\xC3\xA9\xC3\xA9"
+      "123456789012345678901234567.tif",
+      2, 0, 80);
   EXPECT_EQ(0u, line.find("...567890123456")) << line;
-  const std::string accents =
-      ProgressLine(std::string(40, 'a') + "\xC3\xA9" "23456789012345678901234567", 2, 0, 80);
-  EXPECT_EQ(0u, accents.find("...\xC3\xA9" "2345")) << accents;
+  const std::string accents = ProgressLine(std::string(40, 'a') +
+                                               "\xC3\xA9"
+                                               "23456789012345678901234567",
+                                           2, 0, 80);
+  EXPECT_EQ(0u, accents.find("...\xC3\xA9"
+                             "2345"))
+      << accents;
 }
 
 TEST(ProgressLine, HundredPerCentIsForTheEndAlone) {

@@ -60,8 +60,7 @@ TEST(ProgressModel, TheWholeNeverShrinksAndEndsAtOne) {
     double start = 0.0;
     for (const double end : ends) {
       model.StartLevel(start);
-      for (const double fraction :
-           ReportsOf(start, report == LevelReport::kToTheEnd ? 1.0 : end)) {
+      for (const double fraction : ReportsOf(start, report == LevelReport::kToTheEnd ? 1.0 : end)) {
         const double now = model.Overall(fraction);
         EXPECT_GE(now, before);
         before = now;

@@ -13,12 +13,28 @@ using datasources::LevelPlace;
 
 /// Two channels; level 2 inside, level 4 in the side-car with its second channel out of date.
 RasterInfo Scene() {
-  RasterInfo info{"scene.tif", "TIFF", "TIFF / GeoTIFF", 1001, 777,
-                  {gobs::eDT_8U, gobs::eDT_8U}, {}};
-  info.levels.push_back({2, 500, 388, LevelPlace::kInternal, "scene.tif", "NEAREST", 1,
-                         "Orin Overviews 0.1.0", {true, true}, {true, true}});
-  info.levels.push_back({4, 250, 194, LevelPlace::kSideCar, "dir/scene.tif.ovr", "", 0, "",
-                         {true, true}, {true, false}});
+  RasterInfo info{"scene.tif", "TIFF", "TIFF / GeoTIFF", 1001, 777, {gobs::eDT_8U, gobs::eDT_8U},
+                  {}};
+  info.levels.push_back({2,
+                         500,
+                         388,
+                         LevelPlace::kInternal,
+                         "scene.tif",
+                         "NEAREST",
+                         1,
+                         "Orin Overviews 0.1.0",
+                         {true, true},
+                         {true, true}});
+  info.levels.push_back({4,
+                         250,
+                         194,
+                         LevelPlace::kSideCar,
+                         "dir/scene.tif.ovr",
+                         "",
+                         0,
+                         "",
+                         {true, true},
+                         {true, false}});
   return info;
 }
 
@@ -52,7 +68,8 @@ TEST(RasterInfo, WithoutLevelsTheTableSaysSo) {
 TEST(RasterInfo, ChannelsOfSeveralTypesAreAllNamed) {
   RasterInfo info = Scene();
   info.channels = {gobs::eDT_8U, gobs::eDT_BIT, gobs::eDT_8U};
-  EXPECT_NE(std::string::npos, TableOf(info).find("channels: 3 (uint8, bit, uint8)")) << TableOf(info);
+  EXPECT_NE(std::string::npos, TableOf(info).find("channels: 3 (uint8, bit, uint8)"))
+      << TableOf(info);
 }
 
 TEST(RasterInfo, JsonSaysNullForWhatIsUnknown) {

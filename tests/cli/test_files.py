@@ -28,13 +28,15 @@ class Build(Case):
         answer = run("build", self.file)
         self.assertRan(answer, 0)
         self.assertEqual(f"{self.file}: level 2 done\n{self.file}: level 4 done\n"
-                         f"{self.file}: levels built: 2, 4 (NEAREST, inside the file)\n", answer.stdout)
+                         f"{self.file}: levels built: 2, 4 (NEAREST, inside the file)\n",
+                         answer.stdout)
         self.assertEqual("", answer.stderr)
 
     def test_a_second_build_has_nothing_to_do(self):
         run("build", self.file, "--levels", "2")
         answer = run("build", self.file, "--levels", "4,2")
-        self.assertIn("levels built: 4 (NEAREST, inside the file); already up to date: 2", answer.stdout)
+        self.assertIn("levels built: 4 (NEAREST, inside the file); already up to date: 2",
+                      answer.stdout)
         before = contents(self.file)
         answer = run("build", self.file, "--levels", "2,4")
         self.assertRan(answer, 0)
@@ -45,7 +47,8 @@ class Build(Case):
         small = write_raster(self.path("small.tif"), 200, 100)
         answer = run("build", small)
         self.assertRan(answer, 0)
-        self.assertEqual(f"{small}: nothing to do: 200 x 100 pixels need no levels\n", answer.stdout)
+        self.assertEqual(f"{small}: nothing to do: 200 x 100 pixels need no levels\n",
+                         answer.stdout)
 
     def test_quiet_says_nothing_when_all_is_well(self):
         answer = run("build", self.file, "--quiet")
@@ -62,8 +65,7 @@ class Build(Case):
     def test_levels_below_two_are_wrong_usage(self):
         answer = run("build", self.file, "--levels", "2,1")
         self.assertRan(answer, 2)
-        self.assertIn(f"orin-overviews: {self.file}: OLEVELS[2] = 1  - Levels must be 2 or greater.",
-                      answer.stderr)
+        self.assertIn(f"{self.file}: OLEVELS[2] = 1  - Levels must be 2 or greater.", answer.stderr)
         self.assertEqual([], self.levels())
 
     def test_a_level_larger_than_the_image_is_left_out_with_a_notice(self):
@@ -109,7 +111,42 @@ class Build(Case):
         answer = run("build", self.file, "--external")
         self.assertRan(answer, 0)
         self.assertIn(f"levels built: 2, 4 (NEAREST, in {self.file}.ovr)", answer.stdout)
+        self.assertEqual("", answer.stderr)
         self.assertEqual(before, contents(self.file))
+
+    def test_a_side_car_beside_levels_inside_is_worth_a_notice(self):
+        run("build", self.file, "--levels", "2")
+        answer = run("build", self.file, "--levels", "2,4", "--external")
+        self.assertRan(answer, 0)
+        self.assertIn(f"{self.file}: many programs see only the levels inside", answer.stderr)
+
+
+class ReadOnlyFile(Case):
+    def setUp(self):
+        super().setUp()
+        self.file = write_raster(self.path("scene.tif"), 1003, 777)
+        os.chmod(self.file, 0o444)
+        os.chmod(self.folder, 0o777)
+
+    def build(self, *arguments):
+        """A build by a user who cannot write the file: the superuser could, and stands back."""
+        user = {"user": 65534} if os.geteuid() == 0 else {}
+        try:
+            return subprocess.run([TOOL, "build", self.file, *arguments], capture_output=True,
+                                  text=True, env=environment(), timeout=60, check=False, **user)
+        except PermissionError:
+            self.skipTest("the tool lies where other users cannot run it")
+
+    def test_it_gets_a_side_car(self):
+        answer = self.build()
+        self.assertRan(answer, 0)
+        self.assertIn(f"levels built: 2, 4 (NEAREST, in {self.file}.ovr)", answer.stdout)
+
+    def test_levels_inside_are_refused(self):
+        answer = self.build("--internal")
+        self.assertRan(answer, 5)
+        self.assertIn("not possible for a read-only file", answer.stderr)
+        self.assertIn("--external", answer.stderr)
 
 
 class Info(Case):
@@ -122,20 +159,23 @@ class Info(Case):
         self.assertRan(run("build", self.file, "--levels", "4", "--external"), 0)
         answer = info(self.file)
         program = run("--version").stdout.strip()
-        valid = [{"channel": 1, "present": True, "valid": True}, {"channel": 2, "present": True, "valid": True}]
+        valid = [{"channel": channel, "present": True, "valid": True} for channel in (1, 2)]
         self.assertEqual({"name": "TIFF", "description": "TIFF / GeoTIFF"}, answer["format"])
         self.assertEqual((1003, 777), (answer["width"], answer["height"]))
-        self.assertEqual([{"channel": 1, "type": "uint8"}, {"channel": 2, "type": "uint8"}], answer["channels"])
+        self.assertEqual([{"channel": channel, "type": "uint8"} for channel in (1, 2)],
+                         answer["channels"])
         inside, beside = answer["levels"]
-        self.assertEqual({"level": 2, "width": 501, "height": 388, "place": "internal", "file": self.file,
-                          "method": "NEAREST", "sourceLevel": 1, "program": program, "channels": valid}, inside)
-        self.assertEqual(("side-car", self.file + ".ovr", 4, 250, 194),
-                         tuple(beside[key] for key in ("place", "file", "level", "width", "height")))
+        self.assertEqual({"level": 2, "width": 501, "height": 388, "place": "internal",
+                          "file": self.file, "method": "NEAREST", "sourceLevel": 1,
+                          "program": program, "channels": valid}, inside)
+        found = [beside[key] for key in ("place", "file", "level", "width", "height")]
+        self.assertEqual(["side-car", self.file + ".ovr", 4, 250, 194], found)
 
     def test_the_table_names_every_level(self):
         run("build", self.file)
         lines = run("info", self.file).stdout.splitlines()
-        self.assertEqual(f"{self.file}: 1003 x 777 pixels, channels: 2 (uint8), TIFF / GeoTIFF", lines[0])
+        self.assertEqual(f"{self.file}: 1003 x 777 pixels, channels: 2 (uint8), TIFF / GeoTIFF",
+                         lines[0])
         self.assertRegex(lines[2], r"^2 +501 x 388 +inside +NEAREST +1 +yes +Orin Overviews")
         self.assertRegex(lines[3], r"^4 +250 x 194 +inside +NEAREST +2 +yes +Orin Overviews")
 
@@ -158,8 +198,9 @@ class Interrupted(Case):
         """A build of a large file that is sent a signal as soon as its first level is done."""
         file = write_raster(self.path("large.tif"), 6000, 6000, channels=3,
                             options=["TILED=YES", "COMPRESS=DEFLATE"])
-        build = subprocess.Popen([TOOL, "build", file, *more, "--levels", "2,3,5"], stdout=subprocess.PIPE,
-                                 stderr=subprocess.PIPE, text=True, env=environment())
+        build = subprocess.Popen([TOOL, "build", file, *more, "--levels", "2,3,5"],
+                                 stdout=subprocess.PIPE, stderr=subprocess.PIPE, text=True,
+                                 env=environment())
         self.assertIn("level 2 done", build.stdout.readline())
         build.send_signal(number)
         build.send_signal(number)  # a second one does nothing worse
@@ -197,8 +238,8 @@ class DiskFull(Case):
         def no_more():
             resource.setrlimit(resource.RLIMIT_FSIZE, (limit, limit))
 
-        answer = subprocess.run([TOOL, "build", file], capture_output=True, text=True, env=environment(),
-                                preexec_fn=no_more, timeout=120, check=False)
+        answer = subprocess.run([TOOL, "build", file], capture_output=True, text=True,
+                                env=environment(), preexec_fn=no_more, timeout=120, check=False)
         self.assertEqual(5, answer.returncode, answer.stderr)
         self.assertIn(f"orin-overviews: {file}: Failed to create overviews.", answer.stderr)
         self.assertIn("File too large", answer.stderr)

@@ -27,7 +27,8 @@ class Preferences(Case):
     def test_and_from_the_configuration_folder(self):
         os.mkdir(self.path("orin"))
         self.path("orin/preferences.toml", "[raster-layer]\noverview-method = 2\n")
-        self.assertEqual(([2, 4], {"MODE"}), self.built(ORIN_PREFERENCES="", XDG_CONFIG_HOME=self.folder))
+        self.assertEqual(([2, 4], {"MODE"}),
+                         self.built(ORIN_PREFERENCES="", XDG_CONFIG_HOME=self.folder))
 
     def test_the_command_line_wins(self):
         preferences = self.path("mine.toml", '[raster-layer]\noverview-method = "average"\n'
@@ -43,10 +44,12 @@ class BadPreferences(Case):
     def warning(self, text):
         """Standard error of a run whose preference file holds `text`."""
         preferences = self.path("bad.toml", text)
-        return preferences, run("info", self.path("missing.tif"), ORIN_PREFERENCES=preferences).stderr
+        answer = run("info", self.path("missing.tif"), ORIN_PREFERENCES=preferences)
+        return preferences, answer.stderr
 
     def test_a_value_that_cannot_be_used_is_reported_with_file_and_line(self):
-        file, errors = self.warning('[raster-layer]\noverview-method = "average"\ndecimation-factor = 5\n')
+        file, errors = self.warning('[raster-layer]\noverview-method = "average"\n'
+                                    "decimation-factor = 5\n")
         self.assertIn(f"orin-overviews: {file}:3: decimation-factor must be 2 or 3.", errors)
         self.assertNotIn(":2:", errors)
 

@@ -50,7 +50,8 @@ class ProgressBar(Case):
         for frame in frames:
             self.assertLess(len(frame), 60)
         self.assertTrue(seen.endswith("\r\x1b[K"), repr(seen[-40:]))
-        self.assertEqual(f"{self.file}: levels built: 2, 4, 8, 16, 32 (NEAREST, inside the file)\n", output)
+        self.assertEqual(f"{self.file}: levels built: 2, 4, 8, 16, 32 (NEAREST, inside the file)\n",
+                         output)
 
     def test_quiet_draws_none(self):
         code, output, seen = self.on_terminal("--quiet")

@@ -67,14 +67,15 @@ class FilesThatCannotBeOpened(Case):
     def test_the_reason_is_given_and_the_code_is_four(self):
         text = self.path("notes.txt", "no raster\n")
         missing = self.path("missing.tif")
-        for file, reason in ((missing, "No such file or directory"), (self.folder, "is a directory"),
-                             (text, "is not a raster file")):
+        for file, reason in ((missing, "No such file or directory"),
+                             (self.folder, "is a directory"), (text, "is not a raster file")):
             for command in ("build", "info"):
                 with self.subTest(file=file, command=command):
                     answer = run(command, file)
                     self.assertRan(answer, 4)
                     self.assertEqual("", answer.stdout)
-                    self.assertTrue(answer.stderr.startswith(f"orin-overviews: {file}: "), answer.stderr)
+                    self.assertTrue(answer.stderr.startswith(f"orin-overviews: {file}: "),
+                                    answer.stderr)
                     self.assertIn(reason, answer.stderr)
                     self.assertEqual(1, answer.stderr.count(file))
 
@@ -92,7 +93,8 @@ class LogFile(Case):
         answer = run("build", self.path("missing.tif"), "--log-file", log)
         self.assertRan(answer, 4)
         with open(log, encoding="utf-8") as file:
-            self.assertRegex(file.read(), r"^\d{4}-\d\d-\d\dT\d\d:\d\d:\d\d\.\d{3}\S+ error: .*missing\.tif")
+            self.assertRegex(file.read(),
+                             r"^\d{4}-\d\d-\d\dT\d\d:\d\d:\d\d\.\d{3}\S+ error: .*missing\.tif")
 
     def test_a_log_file_that_cannot_be_written_is_an_error(self):
         answer = run("--log-file", self.folder, "info", "a.tif")
