@@ -36,13 +36,13 @@ std::string PlaceText(const datasources::LevelDescription& level) {
 }
 
 std::string KeptText(const BuildPlan& plan) {
-  return FormatString(_("levels %s exist and are up to date"), JoinNumbers(plan.kept).c_str());
+  return FormatString(_("already up to date: %s"), JoinNumbers(plan.kept).c_str());
 }
 
-/// "Levels 2, 4 are finished; 8 is not." as far as there are such levels.
+/// "Levels finished: 2, 4; still to do: 8." as far as there are such levels.
 std::string StateText(const LevelState& state) {
   if (state.valid.empty())
-    return FormatString(_("No level is finished, %s still to do."),
+    return FormatString(_("Levels finished: none; still to do: %s."),
                         JoinNumbers(state.unfinished).c_str());
   if (state.unfinished.empty())
     return FormatString(_("Levels finished: %s."), JoinNumbers(state.valid).c_str());
@@ -76,7 +76,7 @@ std::string SummaryText(const BuildPlan& plan, const LevelState& state) {
   if (built.empty()) return NothingToDoText(plan);
   const auto level = std::find_if(state.descriptions.begin(), state.descriptions.end(),
                                   [&](const auto& l) { return l.level == built.front(); });
-  std::string text = FormatString(_("levels %s built (%s) %s"), JoinNumbers(built).c_str(),
+  std::string text = FormatString(_("levels built: %s (%s, %s)"), JoinNumbers(built).c_str(),
                                   level->method.c_str(), PlaceText(*level).c_str());
   if (!plan.kept.empty()) text += "; " + KeptText(plan);
   return text;
@@ -85,7 +85,7 @@ std::string SummaryText(const BuildPlan& plan, const LevelState& state) {
 std::string NothingToDoText(const BuildPlan& plan) {
   if (plan.channels.empty())
     return _("nothing to do: all channels are masks of one bit, which have no levels");
-  if (!plan.kept.empty()) return FormatString(_("nothing to do: %s"), KeptText(plan).c_str());
+  if (!plan.kept.empty()) return FormatString(_("nothing to do; %s"), KeptText(plan).c_str());
   return FormatString(_("nothing to do: %u x %u pixels need no levels"), plan.width, plan.height);
 }
 
