@@ -44,6 +44,12 @@ class Case(unittest.TestCase):
         self.assertEqual(code, answer.returncode, answer.stdout + answer.stderr)
 
 
+def contents(path):
+    """The bytes of a file."""
+    with open(path, "rb") as file:
+        return file.read()
+
+
 def write_raster(path, columns, rows, channels=1, type_name="Byte", options=()):
     """Writes a TIFF with GDAL whose pixels differ everywhere."""
     import numpy
@@ -52,8 +58,9 @@ def write_raster(path, columns, rows, channels=1, type_name="Byte", options=()):
     dataset = gdal.GetDriverByName("GTiff").Create(
         str(path), columns, rows, channels, gdal.GetDataTypeByName(type_name), list(options))
     for channel in range(channels):
-        values = (numpy.arange(columns)[None, :] * 7 + numpy.arange(rows)[:, None] * 13 + channel) % 251
-        dataset.GetRasterBand(channel + 1).WriteArray(values)
+        across = (numpy.arange(columns) * 7 + channel).astype(numpy.uint8)
+        down = (numpy.arange(rows) * 13).astype(numpy.uint8)
+        dataset.GetRasterBand(channel + 1).WriteArray(numpy.add.outer(down, across))
     dataset.FlushCache()
     del dataset
     return str(path)
