@@ -63,15 +63,17 @@ CLI::App* AddBuildCommand(CLI::App& app, BuildOptions& options) {
           [&](const std::string& text) { return ReadMethod(text, options.method); });
   AddText(*command, "--channels", _("LIST"), _("Channels to treat, such as 1,3-5"),
           [&](const std::string& text) { return ReadList(ParseChannels(text), options.channels); });
-  const auto* internal = command->add_flag("--internal", std::string(_("Keep the levels inside the file")));
-  const auto* external = command->add_flag("--external", std::string(_("Keep the levels in a file beside it")));
+  const auto* internal = command->add_flag_callback(
+      "--internal", [&] { options.placement = Placement::kInternal; },
+      _("Keep the levels inside the file"));
+  const auto* external = command->add_flag_callback(
+      "--external", [&] { options.placement = Placement::kExternal; },
+      _("Keep the levels in a file beside it"));
   command->add_flag("--force", options.force, _("Build levels again that are up to date"));
   command->add_flag("--quiet", options.quiet, _("Print warnings and errors only"));
-  command->final_callback([=, &options] {
+  command->final_callback([=] {
     RefuseTogether(*levels, *factor);
     RefuseTogether(*internal, *external);
-    if (internal->count()) options.placement = Placement::kInternal;
-    if (external->count()) options.placement = Placement::kExternal;
   });
   return command;
 }

@@ -62,7 +62,7 @@ bool IsValid(const std::vector<LevelDescription>& levels, unsigned level,
              const std::vector<unsigned>& channels) {
   const auto found = std::find_if(levels.begin(), levels.end(),
                                   [&](const LevelDescription& l) { return l.level == level; });
-  return found != levels.end() && HoldsForAll(found->validChannels, channels);
+  return found != levels.end() && datasources::HoldsForAll(found->validChannels, channels);
 }
 
 std::vector<unsigned> AscendingOnce(std::vector<unsigned> levels) {

@@ -58,7 +58,9 @@ int Entry(const toml::table& file, std::string_view key, int otherwise, const ch
 std::optional<toml::table> Parse(const std::string& path) {
   std::ifstream stream(path, std::ios::binary);
   std::ostringstream text;
-  if (!stream || (stream.peek() != std::ifstream::traits_type::eof() && !(text << stream.rdbuf()))) {
+  const bool isEmpty = stream.peek() == std::ifstream::traits_type::eof();
+  // A directory opens well; its first read sets the bad bit.
+  if (!stream.is_open() || stream.bad() || (!isEmpty && !(text << stream.rdbuf()))) {
     WarnAt(path, 0, _("The preference file cannot be read."));
     return std::nullopt;
   }

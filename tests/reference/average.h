@@ -17,15 +17,15 @@ struct Sample {
   T re, im;
 };
 
-/// re x re + im x im, wrapped to the width of the type by dropping the higher ones. Signed operands multiply
-/// as their two's complement: the low bits of a product do not depend on the sign.
+/// re x re + im x im, wrapped to the width of the type by dropping the higher ones. Signed operands
+/// multiply as their two's complement: the low bits of a product do not depend on the sign.
 template <class Unsigned>
 Unsigned WrappedSquareSum(Unsigned re, Unsigned im) {
   return static_cast<Unsigned>(static_cast<Unsigned>(re * re) + static_cast<Unsigned>(im * im));
 }
 
-/// Length of a complex sample. Deliberate: the integer sums wrap, at 32 or at 64 bits, and a negative
-/// one has no length (NaN); the 32-bit float sums are single precision.
+/// Length of a complex sample. Deliberate: the integer sums wrap, at 32 or at 64 bits, and a
+/// negative one has no length (NaN); the 32-bit float sums are single precision.
 template <class T>
 double Magnitude(Sample<T> v) {
   if constexpr (std::is_floating_point_v<T>) {
@@ -34,13 +34,11 @@ double Magnitude(Sample<T> v) {
     const T sum = re + im;
     return std::sqrt(static_cast<double>(sum));
   } else if constexpr (sizeof(T) == 8) {
-    const uint64_t sum =
-        WrappedSquareSum(static_cast<uint64_t>(v.re), static_cast<uint64_t>(v.im));
+    const uint64_t sum = WrappedSquareSum(static_cast<uint64_t>(v.re), static_cast<uint64_t>(v.im));
     if (std::is_signed_v<T>) return std::sqrt(static_cast<double>(static_cast<int64_t>(sum)));
     return std::sqrt(static_cast<double>(sum));
   } else {
-    const uint32_t sum =
-        WrappedSquareSum(static_cast<uint32_t>(v.re), static_cast<uint32_t>(v.im));
+    const uint32_t sum = WrappedSquareSum(static_cast<uint32_t>(v.re), static_cast<uint32_t>(v.im));
     if (std::is_same_v<T, uint32_t>) return std::sqrt(static_cast<double>(sum));
     return std::sqrt(static_cast<double>(static_cast<int32_t>(sum)));
   }
@@ -94,8 +92,8 @@ void WriteNoData(const Block<T>& dst, bool isComplex, int64_t i, int64_t j, doub
     dst.At(i, j, k) = k < dst.channels ? Convert<T>(noDataValue) : T{};
 }
 
-/// One channel, exactly `f` times smaller, f = 2 or 3. Invalid samples do not count; with fewer than
-/// 2 of 4, or 5 of 9, there is no data.
+/// One channel, exactly `f` times smaller, f = 2 or 3. Invalid samples do not count; with fewer
+/// than 2 of 4, or 5 of 9, there is no data.
 template <class T>
 void AverageExact(const Block<T>& src, const Bits* mask, const Block<T>& dst, const Settings& s,
                   int64_t f) {
@@ -135,7 +133,7 @@ inline Footprint FootprintOf(const Settings& s, int64_t i, double dstPixelSize, 
   const double index = static_cast<double>(i);
   Footprint f{};
   if (s.georeferenced) {
-    const auto ground = [&](double position) {   // whole ground units: deliberate, both truncations
+    const auto ground = [&](double position) {  // whole ground units: deliberate, both truncations
       const auto distance = static_cast<double>(Truncate32(position * dstPixelSize + offset));
       return Truncate32(distance / srcPixelSize);
     };
@@ -159,8 +157,8 @@ std::vector<Sample<T>> SamplesUnder(const Block<T>& src, const Bits* mask, bool 
   for (int64_t row = y.start; row < y.end; ++row) {
     for (int64_t column = x.start; column < x.end; ++column) {
       const bool valid = mask == nullptr || mask->Valid(column, row);
-      samples.push_back(SampleAt(src, isComplex, valid ? column : x.centre, valid ? row : y.centre,
-                                 channel));
+      samples.push_back(
+          SampleAt(src, isComplex, valid ? column : x.centre, valid ? row : y.centre, channel));
     }
   }
   return samples;
@@ -201,12 +199,10 @@ void Average(const Block<T>& src, const Bits* mask, const Block<T>& dst, const S
     ratioX = s.dstPixelSizeX / s.srcPixelSizeX;
     ratioY = s.dstPixelSizeY / s.srcPixelSizeY;
   }
-  if (dst.channels == 1 && ratioX == 0.5 && ratioY == 0.5)
-    AverageExact(src, mask, dst, s, 2);
+  if (dst.channels == 1 && ratioX == 0.5 && ratioY == 0.5) AverageExact(src, mask, dst, s, 2);
   else if (dst.channels == 1 && ratioX == 1.0 / 3 && ratioY == 1.0 / 3)
     AverageExact(src, mask, dst, s, 3);
-  else
-    AverageGeneral(src, mask, dst, s, ratioX, ratioY);
+  else AverageGeneral(src, mask, dst, s, ratioX, ratioY);
 }
 
 }  // namespace orin::reference

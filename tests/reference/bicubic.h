@@ -35,8 +35,8 @@ inline double CubicOfDoubles(const std::array<double, 4>& q, double t) {
 }
 
 template <class T>
-double CubicSurface(const Block<T>& src, const Bits* mask, int64_t x0, int64_t y0, int64_t k, double fx,
-                    double fy) {
+double CubicSurface(const Block<T>& src, const Bits* mask, int64_t x0, int64_t y0, int64_t k,
+                    double fx, double fy) {
   std::array<double, 4> lines{};
   for (int j = 0; j < 4; ++j) {
     std::array<float, 4> q{};

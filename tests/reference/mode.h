@@ -19,11 +19,11 @@ template <class T>
 bool SameValue(T a, T b) {
   if constexpr (std::is_floating_point_v<T>)
     return std::fabs(static_cast<double>(a) - static_cast<double>(b)) < 2.220446049250313e-16;
-  else
-    return a == b;
+  else return a == b;
 }
 
-/// The most frequent value; of equally frequent ones, the first. A NaN has no vote, its own included.
+/// The most frequent value; of equally frequent ones, the first. A NaN has no vote, its own
+/// included.
 template <class T>
 T MostFrequent(const std::array<T, 9>& v) {
   std::array<int, 9> n{};
@@ -47,9 +47,15 @@ inline int64_t ModeIndex(const Settings& s, int64_t i, double dstPixelSize, doub
 
 /// The nine pixels, column by column; an invalid neighbour's place is taken by the centre.
 inline std::array<Position, 9> ModeNeighbours(int64_t x, int64_t y, const Bits* mask) {
-  std::array<Position, 9> nine = {{{x - 1, y - 1}, {x - 1, y}, {x - 1, y + 1},
-                                   {x, y - 1},     {x, y},     {x, y + 1},
-                                   {x + 1, y - 1}, {x + 1, y}, {x + 1, y + 1}}};
+  std::array<Position, 9> nine = {{{x - 1, y - 1},
+                                   {x - 1, y},
+                                   {x - 1, y + 1},
+                                   {x, y - 1},
+                                   {x, y},
+                                   {x, y + 1},
+                                   {x + 1, y - 1},
+                                   {x + 1, y},
+                                   {x + 1, y + 1}}};
   if (mask != nullptr)
     for (Position& p : nine)
       if (!mask->Valid(p.x, p.y)) p = {x, y};

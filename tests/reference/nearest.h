@@ -10,7 +10,8 @@
 
 namespace orin::reference {
 
-/// The mapped coordinate of destination index `i`; a corner by ratio, a centre by ground coordinates.
+/// The mapped coordinate of destination index `i`; a corner by ratio, a centre by ground
+/// coordinates.
 inline double NearestCoordinate(const Settings& s, int64_t i, double dstPixelSize, double offset,
                                 double srcPixelSize, double ratio) {
   const double index = static_cast<double>(i);
@@ -18,8 +19,8 @@ inline double NearestCoordinate(const Settings& s, int64_t i, double dstPixelSiz
   return index / ratio;
 }
 
-/// Truncates to 64 bits, keeps the low 32 of them, and clamps what is too large: deliberate, so that a
-/// coordinate of -1 or less lands on the last pixel.
+/// Truncates to 64 bits, keeps the low 32 of them, and clamps what is too large: deliberate, so
+/// that a coordinate of -1 or less lands on the last pixel.
 /// \throws NotDefined  the coordinate does not fit 64 bits
 inline int64_t NearestIndex(double coordinate, int64_t size) {
   const double truncated = std::trunc(coordinate);

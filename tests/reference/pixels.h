@@ -8,17 +8,17 @@
 
 namespace orin::reference {
 
-/// Thrown by a twin for a case that has no defined answer: a position outside the block's buffer, or
-/// a block without the margin that the method needs.
+/// Thrown by a twin for a case that has no defined answer: a position outside the block's buffer,
+/// or a block without the margin that the method needs.
 struct NotDefined {};
 
 /// A block whose buffer starts at the top-left corner of its margin. Does not own its values.
 template <class T>
 struct Block {
-  int64_t width, height;      ///< pixels, margins not counted
-  int64_t marginX, marginY;   ///< pixels, on each side
+  int64_t width, height;     ///< pixels, margins not counted
+  int64_t marginX, marginY;  ///< pixels, on each side
   int64_t channels;
-  int64_t components;         ///< per channel: 2 when complex, else 1
+  int64_t components;  ///< per channel: 2 when complex, else 1
   T* values;
 
   /// Component `k` of the pixel (x, y); k counts the components of the whole pixel.
@@ -67,8 +67,8 @@ inline double RatioOf(bool given, double ratio, int64_t srcSize, int64_t dstSize
   return static_cast<double>(dstSize) / static_cast<double>(srcSize);
 }
 
-/// The source position of a destination pixel's centre, half a pixel subtracted, for the methods that
-/// interpolate.
+/// The source position of a destination pixel's centre, half a pixel subtracted, for the methods
+/// that interpolate.
 inline double CentrePosition(const Settings& s, int64_t i, double dstPixelSize, double offset,
                              double srcPixelSize, double ratio) {
   const double centre = static_cast<double>(i) + 0.5;

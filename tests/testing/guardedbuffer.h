@@ -65,7 +65,7 @@ class GuardedBuffer {
   void Unpoison() { ASAN_UNPOISON_MEMORY_REGION(store_.data(), store_.size() * 8); }
 
   size_t size_;
-  std::vector<uint64_t> store_;   // words, so that the buffer is aligned for every pixel type
+  std::vector<uint64_t> store_;  // words, so that the buffer is aligned for every pixel type
 };
 
 }  // namespace orin::testing

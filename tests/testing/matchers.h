@@ -17,9 +17,9 @@
 namespace orin::testing {
 
 enum class NotANumber {
-  kBitForBit,   ///< copied values
-  kAnyPayload   ///< computed values: which operand's sign and payload a NaN inherits is up to the
-                ///< compiler's order of operands, and no method promises it
+  kBitForBit,  ///< copied values
+  kAnyPayload  ///< computed values: which operand's sign and payload a NaN inherits is up to the
+               ///< compiler's order of operands, and no method promises it
 };
 
 template <class T>
@@ -43,7 +43,8 @@ std::string Exactly(const T& value) {
 
 /// Compares whole buffers, margins included.
 template <class T>
-::testing::AssertionResult SamePixels(TestRaster<T>& expected, TestRaster<T>& actual, NotANumber nan) {
+::testing::AssertionResult SamePixels(TestRaster<T>& expected, TestRaster<T>& actual,
+                                      NotANumber nan) {
   const Geometry& g = expected.Size();
   const uint32_t perPixel = expected.ValuesPerPixel();
   for (size_t i = 0; i < expected.ValueCount(); ++i) {

@@ -46,16 +46,41 @@ template <class T>
 std::vector<T> LimitsOf() {
   using L = std::numeric_limits<T>;
   if constexpr (std::is_floating_point_v<T>) {
-    return {T(0), T(-0.0), T(1), T(-1), T(0.5), T(-0.5), T(0.1), T(0.3), L::denorm_min(),
-            -L::denorm_min(), L::min(), -L::min(), L::min() / 2, L::max(), L::lowest(), L::epsilon(),
-            L::infinity(), -L::infinity(), L::quiet_NaN(), T(9007199254740993.0), T(1e19), T(-1e19)};
+    return {T(0),         T(-0.0),       T(1),           T(-1),           T(0.5),
+            T(-0.5),      T(0.1),        T(0.3),         L::denorm_min(), -L::denorm_min(),
+            L::min(),     -L::min(),     L::min() / 2,   L::max(),        L::lowest(),
+            L::epsilon(), L::infinity(), -L::infinity(), L::quiet_NaN(),  T(9007199254740993.0),
+            T(1e19),      T(-1e19)};
   } else if constexpr (sizeof(T) == 8) {
-    return {T(0), T(1), T(-1), L::min(), L::max(), T(L::max() - 1), T(L::min() + 1),
-            T((int64_t{1} << 53) + 1), T(-((int64_t{1} << 53) + 1)), T((int64_t{1} << 24) + 1),
-            T(INT64_MAX), T(INT64_MAX - 512), T(INT64_MIN), T(3037000500)};
+    return {T(0),
+            T(1),
+            T(-1),
+            L::min(),
+            L::max(),
+            T(L::max() - 1),
+            T(L::min() + 1),
+            T((int64_t{1} << 53) + 1),
+            T(-((int64_t{1} << 53) + 1)),
+            T((int64_t{1} << 24) + 1),
+            T(INT64_MAX),
+            T(INT64_MAX - 512),
+            T(INT64_MIN),
+            T(3037000500)};
   } else {
-    return {T(0), T(1), T(-1), T(2), T(-2), L::min(), L::max(), T(L::max() - 1), T(L::min() + 1),
-            T(L::max() / 2), T(16777217), T(46341), T(32768), T(-7)};
+    return {T(0),
+            T(1),
+            T(-1),
+            T(2),
+            T(-2),
+            L::min(),
+            L::max(),
+            T(L::max() - 1),
+            T(L::min() + 1),
+            T(L::max() / 2),
+            T(16777217),
+            T(46341),
+            T(32768),
+            T(-7)};
   }
 }
 
@@ -80,9 +105,15 @@ void FillRandomly(Random& random, Values kind, T* values, size_t count) {
   const std::vector<T> limits = LimitsOf<T>();
   for (size_t i = 0; i < count; ++i) {
     switch (kind) {
-      case Values::kFew: values[i] = SmallValue<T>(random, -1, 2); break;
-      case Values::kSmall: values[i] = SmallValue<T>(random, -100, 100); break;
-      case Values::kAnyBits: values[i] = AnyBits<T>(random); break;
+      case Values::kFew:
+        values[i] = SmallValue<T>(random, -1, 2);
+        break;
+      case Values::kSmall:
+        values[i] = SmallValue<T>(random, -100, 100);
+        break;
+      case Values::kAnyBits:
+        values[i] = AnyBits<T>(random);
+        break;
       case Values::kLimits:
         values[i] = random.OneIn(3) ? SmallValue<T>(random, -3, 3) : random.From(limits);
         break;
@@ -91,11 +122,39 @@ void FillRandomly(Random& random, Values kind, T* values, size_t count) {
 }
 
 /// In range, fractional, on a rounding edge, out of the range of some or of every type.
-inline constexpr std::array<double, 34> kNoDataValues = {
-    0.0, -0.0, 1.0, 7.0, 255.0, 255.4, 254.5, 254.49, 0.5, -0.5, 0.49999999999999994,
-    -0.49999999999999994, -1.0, -3.2, -3.5, 127.5, 126.5, -128.5, -128.49, -9999.0, 32767.4, 65535.5,
-    2147483647.5, -2147483649.0, 4294967295.5, 9007199254740993.0, 9223372036854775807.0,
-    9223372036854774784.0, 18446744073709551615.0, 18446744073709549568.0, 1e300, -1e300,
-    std::numeric_limits<double>::infinity(), std::numeric_limits<double>::quiet_NaN()};
+inline constexpr std::array<double, 34> kNoDataValues = {0.0,
+                                                         -0.0,
+                                                         1.0,
+                                                         7.0,
+                                                         255.0,
+                                                         255.4,
+                                                         254.5,
+                                                         254.49,
+                                                         0.5,
+                                                         -0.5,
+                                                         0.49999999999999994,
+                                                         -0.49999999999999994,
+                                                         -1.0,
+                                                         -3.2,
+                                                         -3.5,
+                                                         127.5,
+                                                         126.5,
+                                                         -128.5,
+                                                         -128.49,
+                                                         -9999.0,
+                                                         32767.4,
+                                                         65535.5,
+                                                         2147483647.5,
+                                                         -2147483649.0,
+                                                         4294967295.5,
+                                                         9007199254740993.0,
+                                                         9223372036854775807.0,
+                                                         9223372036854774784.0,
+                                                         18446744073709551615.0,
+                                                         18446744073709549568.0,
+                                                         1e300,
+                                                         -1e300,
+                                                         std::numeric_limits<double>::infinity(),
+                                                         std::numeric_limits<double>::quiet_NaN()};
 
 }  // namespace orin::testing

@@ -56,7 +56,7 @@ class TestRaster {
  private:
   Geometry geometry_;
   uint32_t valuesPerPixel_;
-  std::unique_ptr<GuardedBuffer> buffer_;   // before the raster that looks at it
+  std::unique_ptr<GuardedBuffer> buffer_;  // before the raster that looks at it
   std::unique_ptr<gobs::Raster> raster_;
 };
 
@@ -83,8 +83,8 @@ class TestMask {
       : geometry_(g),
         bytes_(std::move(bytes)),
         buffer_(std::make_unique<GuardedBuffer>(bytes_.size())),
-        mask_(std::make_unique<gobs::Mask>(g.width, g.height, parallelio::ProcessWindow{
-                                                                  g.marginX, g.marginY, 0, 0})) {
+        mask_(std::make_unique<gobs::Mask>(g.width, g.height,
+                                           parallelio::ProcessWindow{g.marginX, g.marginY, 0, 0})) {
     std::copy(bytes_.begin(), bytes_.end(), buffer_->Data());
     mask_->begin = buffer_->Data();
     mask_->end = buffer_->Data() + buffer_->Size();

@@ -6,9 +6,11 @@
 #include <string>
 
 #include "host/services/environment.h"
-#include "host/services/exception.h"
-#include "host/services/text.h"
+#include "processes/qrtfilters/resamplers/average.h"
+#include "processes/qrtfilters/resamplers/bicubic.h"
+#include "processes/qrtfilters/resamplers/bilinear.h"
 #include "processes/qrtfilters/resamplers/detail/createkernel.h"
+#include "processes/qrtfilters/resamplers/mode.h"
 #include "processes/qrtfilters/resamplers/nearestneighbour.h"
 
 namespace orin::resamplers {
@@ -22,11 +24,6 @@ std::string RequestedTarget() {
   return target;
 }
 
-[[noreturn]] IRasterResampler* RefuseMethod(const char* name) {
-  throw Exception(FormatString(_("The method %s is not part of this program."), name),
-                  "processes/qrtfilters/resamplers/factories", "CreateResampler", 0);
-}
-
 }  // namespace
 
 bool detail::RunsOnCpu() {
@@ -38,17 +35,17 @@ bool detail::RunsOnCpu() {
 IRasterResampler* NearestNeighbourResamplerFactory::CreateResampler(const gobs::DataType& type) {
   return detail::CreateKernel<NearestNeighbour>(type);
 }
-IRasterResampler* AverageResamplerFactory::CreateResampler(const gobs::DataType&) {
-  return detail::RunsOnCpu() ? RefuseMethod("AVERAGE") : nullptr;
+IRasterResampler* AverageResamplerFactory::CreateResampler(const gobs::DataType& type) {
+  return detail::CreateKernel<Average>(type);
 }
-IRasterResampler* ModeResamplerFactory::CreateResampler(const gobs::DataType&) {
-  return detail::RunsOnCpu() ? RefuseMethod("MODE") : nullptr;
+IRasterResampler* ModeResamplerFactory::CreateResampler(const gobs::DataType& type) {
+  return detail::CreateKernel<Mode>(type);
 }
-IRasterResampler* BilinearResamplerFactory::CreateResampler(const gobs::DataType&) {
-  return detail::RunsOnCpu() ? RefuseMethod("BILINEAR") : nullptr;
+IRasterResampler* BilinearResamplerFactory::CreateResampler(const gobs::DataType& type) {
+  return detail::CreateKernel<Bilinear>(type);
 }
-IRasterResampler* BicubicResamplerFactory::CreateResampler(const gobs::DataType&) {
-  return detail::RunsOnCpu() ? RefuseMethod("BICUBIC") : nullptr;
+IRasterResampler* BicubicResamplerFactory::CreateResampler(const gobs::DataType& type) {
+  return detail::CreateKernel<Bicubic>(type);
 }
 
 }  // namespace orin::resamplers

@@ -10,8 +10,10 @@
 
 namespace orin::resamplers::detail {
 
-/// False for a source without a single pixel: all that can be written then is no data.
-inline bool HasPixels(const gobs::RasterInfo& src) { return src.width != 0 && src.height != 0; }
+/// False for a source without a single sample: all that can be written then is no data.
+inline bool HasSamples(const gobs::RasterInfo& src) {
+  return src.width != 0 && src.height != 0 && src.channelCount != 0;
+}
 
 /// Fills the useful area of `dst` with copies of `pixel`.
 template <class T>

@@ -23,8 +23,8 @@
 namespace orin::testing {
 
 template <class T>
-using Twin = void (*)(const reference::Block<T>&, const reference::Bits*, const reference::Block<T>&,
-                      const reference::Settings&);
+using Twin = void (*)(const reference::Block<T>&, const reference::Bits*,
+                      const reference::Block<T>&, const reference::Settings&);
 
 template <class T>
 reference::Block<T> BlockOf(TestRaster<T>& raster, const Geometry& g, uint32_t channels,
@@ -47,7 +47,7 @@ struct CaseData {
 
   TestRaster<T> src, expected, actual;
   std::optional<TestMask> mask;
-  std::vector<T> before;   ///< the source's pixels
+  std::vector<T> before;  ///< the source's pixels
 };
 
 /// \returns false when the case has no defined answer
@@ -69,7 +69,7 @@ bool RunTwin(Twin<T> twin, const Case& c, CaseData<T>& data) {
 inline void Configure(IRasterResampler& resampler, const reference::Settings& s, uint64_t seed) {
   if (s.ratioGiven) {
     resampler.SetRatio(s.ratioX, s.ratioY);
-  } else if (seed % 2 == 0) {   // a ratio taken back is no ratio
+  } else if (seed % 2 == 0) {  // a ratio taken back is no ratio
     resampler.SetRatio(7, 0.01);
     resampler.ClearRatio();
   }
@@ -86,7 +86,6 @@ void RunProduct(resamplers::IResamplerFactory& factory, const Case& c, CaseData<
   const std::unique_ptr<IRasterResampler> resampler(factory.CreateResampler(type));
   ASSERT_NE(resampler, nullptr);
   Configure(*resampler, c.settings, c.seed);
-  omp_set_num_threads(c.threads);
   resampler->Resample(data.src.Get(), data.mask ? data.mask->Get() : nullptr, data.actual.Get());
 }
 
@@ -108,18 +107,26 @@ class Differential {
                NotANumber nan)
       : factory_(factory), twin_(twin), can_(can), nan_(nan) {}
 
-  void CheckEveryCombination(int rounds) {
-    for (int round = 0; round < rounds; ++round)
-      for (const MappingPlan& plan : kMappings)
-        for (int mask = 0; mask < 4; ++mask)
-          for (const uint32_t channels : kChannelCounts)
-            for (int isComplex = 0; isComplex <= (can_.complexData ? 1 : 0); ++isComplex) {
-              CheckOne(plan, static_cast<MaskKind>(mask), channels, isComplex != 0);
-              if (::testing::Test::HasFailure()) return;
-            }
+  /// Other pixels and sizes for each number of threads.
+  void CheckEveryCombination() {
+    for (const int threads : kThreadCounts) {
+      omp_set_num_threads(threads);
+      SCOPED_TRACE(::testing::Message() << threads << " threads");
+      for (int round = 0; round < kRoundsPerThreadCount; ++round) CheckRound();
+    }
   }
 
  private:
+  void CheckRound() {
+    for (const MappingPlan& plan : kMappings)
+      for (int mask = 0; mask < 4; ++mask)
+        for (const uint32_t channels : kChannelCounts)
+          for (int isComplex = 0; isComplex <= (can_.complexData ? 1 : 0); ++isComplex) {
+            CheckOne(plan, static_cast<MaskKind>(mask), channels, isComplex != 0);
+            if (::testing::Test::HasFailure()) return;
+          }
+  }
+
   /// Draws until the twin has an answer.
   void CheckOne(const MappingPlan& plan, MaskKind mask, uint32_t channels, bool isComplex) {
     for (int attempt = 0; attempt < 200; ++attempt) {
@@ -134,6 +141,8 @@ class Differential {
     ADD_FAILURE() << "no defined case for ratio " << plan.ratioX << ", " << plan.ratioY;
   }
 
+  static constexpr int kRoundsPerThreadCount = 2;
+
   resamplers::IResamplerFactory& factory_;
   Twin<T> twin_;
   Abilities can_;
@@ -141,8 +150,8 @@ class Differential {
   uint64_t seed_ = 0;
 };
 
-using EveryPixelType = ::testing::Types<int8_t, uint8_t, int16_t, uint16_t, int32_t, uint32_t, float,
-                                        double, int64_t, uint64_t>;
+using EveryPixelType = ::testing::Types<int8_t, uint8_t, int16_t, uint16_t, int32_t, uint32_t,
+                                        float, double, int64_t, uint64_t>;
 
 struct PixelTypeNames {
   template <class T>

@@ -14,9 +14,9 @@ TYPED_TEST_SUITE(AverageAndItsTwin, EveryPixelType, PixelTypeNames);
 
 TYPED_TEST(AverageAndItsTwin, WriteTheSameBytes) {
   resamplers::AverageResamplerFactory factory;
-  const Abilities can{.leastMargin = 1, .complexData = true, .fewerChannelsOut = true};
+  const Abilities can{.leastMargin = 0, .complexData = true, .fewerChannelsOut = true};
   Differential<TypeParam>(factory, reference::Average<TypeParam>, can, NotANumber::kAnyPayload)
-      .CheckEveryCombination(1);
+      .CheckEveryCombination();
 }
 
 }  // namespace orin::testing

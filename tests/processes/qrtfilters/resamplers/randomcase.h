@@ -21,20 +21,20 @@ enum class MappingKind { kRatioGiven, kFromSizes, kGround };
 /// How large the destination is beside the source, and by which of the three ways it is said.
 struct MappingPlan {
   MappingKind kind;
-  double ratioX, ratioY;   ///< destination size / source size
+  double ratioX, ratioY;  ///< destination size / source size
 };
 
 inline constexpr std::array<MappingPlan, 21> kMappings = {{
-    {MappingKind::kRatioGiven, 0.5, 0.5},     {MappingKind::kRatioGiven, 1.0 / 3, 1.0 / 3},
-    {MappingKind::kRatioGiven, 0.25, 0.25},   {MappingKind::kRatioGiven, 2.0 / 3, 2.0 / 3},
-    {MappingKind::kRatioGiven, 0.2, 0.2},     {MappingKind::kRatioGiven, 0.4, 0.4},
-    {MappingKind::kRatioGiven, 1, 1},         {MappingKind::kRatioGiven, 1.5, 1.25},
-    {MappingKind::kRatioGiven, 3, 2},         {MappingKind::kRatioGiven, 0.5, 1.0 / 3},
-    {MappingKind::kFromSizes, 0.5, 0.5},      {MappingKind::kFromSizes, 1.0 / 3, 1.0 / 3},
-    {MappingKind::kFromSizes, 0.7, 0.15},     {MappingKind::kFromSizes, 1.3, 1},
-    {MappingKind::kGround, 0.5, 0.5},         {MappingKind::kGround, 1.0 / 3, 1.0 / 3},
-    {MappingKind::kGround, 0.4, 0.65},        {MappingKind::kGround, 1, 1},
-    {MappingKind::kGround, 2, 2},             {MappingKind::kGround, 3, 3},
+    {MappingKind::kRatioGiven, 0.5, 0.5},   {MappingKind::kRatioGiven, 1.0 / 3, 1.0 / 3},
+    {MappingKind::kRatioGiven, 0.25, 0.25}, {MappingKind::kRatioGiven, 2.0 / 3, 2.0 / 3},
+    {MappingKind::kRatioGiven, 0.2, 0.2},   {MappingKind::kRatioGiven, 0.4, 0.4},
+    {MappingKind::kRatioGiven, 1, 1},       {MappingKind::kRatioGiven, 1.5, 1.25},
+    {MappingKind::kRatioGiven, 3, 2},       {MappingKind::kRatioGiven, 0.5, 1.0 / 3},
+    {MappingKind::kFromSizes, 0.5, 0.5},    {MappingKind::kFromSizes, 1.0 / 3, 1.0 / 3},
+    {MappingKind::kFromSizes, 0.7, 0.15},   {MappingKind::kFromSizes, 1.3, 1},
+    {MappingKind::kGround, 0.5, 0.5},       {MappingKind::kGround, 1.0 / 3, 1.0 / 3},
+    {MappingKind::kGround, 0.4, 0.65},      {MappingKind::kGround, 1, 1},
+    {MappingKind::kGround, 2, 2},           {MappingKind::kGround, 3, 3},
     {MappingKind::kGround, 1.6, 0.5},
 }};
 inline constexpr std::array<uint32_t, 5> kChannelCounts = {1, 2, 3, 4, 7};
@@ -42,9 +42,9 @@ inline constexpr std::array<int, 4> kThreadCounts = {1, 2, 3, 8};
 
 /// What a method can be asked.
 struct Abilities {
-  uint32_t leastMargin;        ///< of the source, in pixels
+  uint32_t leastMargin;  ///< of the source, in pixels
   bool complexData = false;
-  bool farAway = false;        ///< ground offsets of any size are defined
+  bool farAway = false;  ///< ground offsets of any size are defined
   bool fewerChannelsOut = false;
 };
 
@@ -55,7 +55,6 @@ struct Case {
   MaskKind mask;
   uint32_t srcChannels, dstChannels;
   Geometry src, dst;
-  int threads;
   Values values;
   reference::Settings settings;
 };
@@ -69,10 +68,10 @@ inline std::ostream& operator<<(std::ostream& out, const Case& c) {
   out.precision(17);
   return out << "seed " << c.seed << ": mapping " << int(c.plan.kind) << ", mask " << int(c.mask)
              << ", channels " << c.srcChannels << " -> " << c.dstChannels << ", source " << c.src
-             << ", destination " << c.dst << ", threads " << c.threads << ", values "
-             << int(c.values) << "\n  complex " << s.isComplex << ", no data " << s.noDataValue
-             << ", ratio " << (s.ratioGiven ? "given " : "not given ") << s.ratioX << ", "
-             << s.ratioY << ", ground " << s.georeferenced << " origins " << s.srcOriginX << ", "
+             << ", destination " << c.dst << ", values " << int(c.values) << "\n  complex "
+             << s.isComplex << ", no data " << s.noDataValue << ", ratio "
+             << (s.ratioGiven ? "given " : "not given ") << s.ratioX << ", " << s.ratioY
+             << ", ground " << s.georeferenced << " origins " << s.srcOriginX << ", "
              << s.srcOriginY << " -> " << s.dstOriginX << ", " << s.dstOriginY << " pixels "
              << s.srcPixelSizeX << ", " << s.srcPixelSizeY << " -> " << s.dstPixelSizeX << ", "
              << s.dstPixelSizeY;
@@ -96,12 +95,13 @@ inline double ChooseGround(Random& random, double ratio, const Abilities& can, d
 
 /// A size from one pixel to just over 64, mostly round a power of two.
 inline uint32_t ChooseSize(Random& random) {
-  static constexpr std::array<uint32_t, 14> kSizes = {1, 2, 3, 5, 15, 16, 17, 24, 31, 32, 33, 63, 64, 65};
+  static constexpr std::array<uint32_t, 14> kSizes = {1,  2,  3,  5,  15, 16, 17,
+                                                      24, 31, 32, 33, 63, 64, 65};
   return random.From(kSizes);
 }
 
-/// About `ratio` times the source that lies beyond `offset`: what fills it, a little more or less, or
-/// any part of it.
+/// About `ratio` times the source that lies beyond `offset`: what fills it, a little more or less,
+/// or any part of it.
 inline uint32_t ChooseDestination(Random& random, uint32_t srcSize, double offset, double ratio) {
   const double fitting = std::floor((srcSize - offset) * ratio);
   const auto full = static_cast<int64_t>(std::clamp(fitting, 1.0, 80.0));
@@ -140,15 +140,12 @@ inline Case MakeCase(uint64_t seed, const MappingPlan& plan, MaskKind mask, uint
   c.dstChannels = channels;
   if (can.fewerChannelsOut && random.OneIn(6))
     c.dstChannels = static_cast<uint32_t>(random.Between(1, channels));
-  const auto margin = [&] {
-    return static_cast<uint32_t>(can.leastMargin + random.Between(0, 2));
-  };
+  const auto margin = [&] { return static_cast<uint32_t>(can.leastMargin + random.Between(0, 2)); };
   c.src = {ChooseSize(random), ChooseSize(random), margin(), margin()};
   if (random.OneIn(6)) c.src.width = 1;
   if (random.OneIn(6)) c.src.height = 1;
   c.dst.marginX = static_cast<uint32_t>(random.Between(0, 3));
   c.dst.marginY = static_cast<uint32_t>(random.Between(0, 3));
-  c.threads = random.From(kThreadCounts);
   c.values = static_cast<Values>(random.Between(0, 3));
   c.settings.isComplex = isComplex;
   if (!random.OneIn(10)) c.settings.noDataValue = random.From(kNoDataValues);
@@ -159,7 +156,7 @@ inline Case MakeCase(uint64_t seed, const MappingPlan& plan, MaskKind mask, uint
 inline std::vector<uint8_t> MaskBytes(Random& random, MaskKind kind, const Geometry& g) {
   std::vector<uint8_t> bytes(TestMask::BytesFor(g), kind == MaskKind::kAllSet ? 0xFF : 0x00);
   if (kind != MaskKind::kRandom) return bytes;
-  const int64_t density = random.Between(0, 2);   // three of four clear, half, three of four set
+  const int64_t density = random.Between(0, 2);  // three of four clear, half, three of four set
   for (uint8_t& byte : bytes) {
     const uint64_t bits = random.Bits();
     const auto a = static_cast<uint8_t>(bits), b = static_cast<uint8_t>(bits >> 8);

@@ -1,0 +1,93 @@
+/// Progress refused at every possible call.
+// SPDX-License-Identifier: MIT
+#include <gtest/gtest.h>
+
+#include "tests/processes/overviews/overviewstesting.h"
+
+namespace orin::testing {
+namespace {
+
+/// Raster large enough for several blocks a level at the run's memory budget.
+drivers::MemoryRaster SeveralBlocks() { return NoiseOf(6000, 4000, 1, gobs::DataTypeOf<double>()); }
+
+size_t CallsOfAnUndisturbedRun(const drivers::MemoryRaster& raster, const char* file, int code) {
+  RecordingHost host;
+  host.Put(file, raster, code);
+  EXPECT_TRUE(JobFor(file, {2, 4}).Generate());
+  return host.Progress().size();
+}
+
+struct Place {
+  const char* file;
+  int code;
+  datasources::LevelPlace place;
+};
+
+class Cancellation : public ::testing::TestWithParam<Place> {};
+
+TEST_P(Cancellation, AtAnyCallLeavesNoUnfinishedLevelValidAndTheNextRunFinishes) {
+  const Place& place = GetParam();
+  const drivers::MemoryRaster raster = SeveralBlocks();
+  const size_t calls = CallsOfAnUndisturbedRun(raster, place.file, place.code);
+  ASSERT_GT(calls, 8u);
+  for (size_t n = 1; n <= calls; ++n) {
+    RecordingHost host;
+    host.Put(place.file, raster, place.code);
+    host.RefuseProgressAt(n);
+    const bool answer = JobFor(place.file, {2, 4}).Generate();
+    const bool both = IsValid(host, place.file, 2, place.place) && IsValid(host, place.file, 4, place.place);
+    EXPECT_TRUE(both || !answer) << n;
+    EXPECT_TRUE(host.Warnings().empty()) << n;
+    EXPECT_EQ(1.0f, host.Progress().back()) << n;
+    EXPECT_EQ(0, host.Live().Total()) << n;
+    EXPECT_TRUE(JobFor(place.file, {2, 4}).Generate()) << n;
+    EXPECT_TRUE(IsValid(host, place.file, 2, place.place)) << n;
+    EXPECT_TRUE(IsValid(host, place.file, 4, place.place)) << n;
+  }
+}
+
+INSTANTIATE_TEST_SUITE_P(
+    Places, Cancellation,
+    ::testing::Values(Place{"a.tif", kFormatTiff, datasources::LevelPlace::kInternal},
+                      Place{"a.odd", 99, datasources::LevelPlace::kSideCar}));
+
+TEST(CancellationOfALevel, MarksNothingAndBuildsNothingMore) {
+  RecordingHost host;
+  host.Put("a.tif", SeveralBlocks());
+  host.RefuseProgressAt(4);  // 0.0, message, first block, second block
+  EXPECT_FALSE(JobFor("a.tif", {2, 4}).Generate());
+  EXPECT_FALSE(IsValid(host, "a.tif", 2));
+  EXPECT_TRUE(host.Log("store.SetValid").empty());
+  EXPECT_TRUE(host.Log("store.Create(4").empty());
+}
+
+TEST(CancellationOfALevel, AtItsLastReportMarksItValidAndStopsTheRun) {
+  RecordingHost host;
+  host.Put("a.odd", NoiseOf(64, 64, 1), 99);
+  host.RefuseProgressAt(4);  // 0.0, message, the only block, the level's end at 0.8
+  EXPECT_FALSE(JobFor("a.odd", {2, 4}).Generate());
+  EXPECT_TRUE(IsValid(host, "a.odd", 2, datasources::LevelPlace::kSideCar));
+  EXPECT_TRUE(host.Log("sidecar.Create(4").empty());
+}
+
+TEST(CancellationOfALevel, ARefusalOfTheRunsOwnReportsIsIgnored) {
+  for (const size_t n : {size_t{1}, size_t{2}}) {
+    RecordingHost host;
+    host.Put("a.tif", NoiseOf(64, 64, 1));
+    host.RefuseProgressAt(n);
+    EXPECT_TRUE(JobFor("a.tif", {2}).Generate());
+    EXPECT_TRUE(IsValid(host, "a.tif", 2));
+  }
+}
+
+TEST(CancellationOfAList, StopsTheList) {
+  RecordingHost host;
+  for (const char* file : {"a.tif", "b.tif"}) host.Put(file, NoiseOf(300, 10, 1));
+  host.RefuseProgressAt(3);
+  std::vector<std::string> files = {"a.tif", "b.tif"};
+  EXPECT_FALSE(CreateFileOverviews().Generate(files));
+  EXPECT_TRUE(host.Log("Open(b.tif").empty());
+}
+
+}  // namespace
+}  // namespace orin::testing
