@@ -12,14 +12,16 @@ namespace {
 const Layout kImage{.width = 401, .height = 301, .tile = 64};
 
 /// Adds a directory with libtiff, as other programs do.
-void AddDirectory(const std::string& file, const Layout& layout, uint32_t subfile, const char* metadata = nullptr) {
+void AddDirectory(const std::string& file, const Layout& layout, uint32_t subfile,
+                  const char* metadata = nullptr) {
   Layout added = layout;
   added.mode = "a";
   TIFF* tiff = TIFFOpen(file.c_str(), "a");
   SetTags(tiff, added);
   TIFFSetField(tiff, TIFFTAG_SUBFILETYPE, subfile);
   if (metadata) {
-    static const TIFFFieldInfo kMetadata{42112, -1, -1, TIFF_ASCII, FIELD_CUSTOM, 1, 0, const_cast<char*>("metadata")};
+    static const TIFFFieldInfo kMetadata{42112,        -1, -1, TIFF_ASCII,
+                                         FIELD_CUSTOM, 1,  0,  const_cast<char*>("metadata")};
     TIFFMergeFieldInfo(tiff, &kMetadata, 1);
     TIFFSetField(tiff, 42112, metadata);
   }
@@ -61,7 +63,8 @@ TEST_F(Chain, StandsLargestFirstWhateverWasBuiltFirst) {
     EXPECT_EQ("401x301 200x150 133x100 100x75 50x37", SizesOf(file));
     EXPECT_EQ((std::vector<unsigned>{2, 3, 4, 8}), FactorsOf(file));
     for (uint16_t i = 0; i < 4; ++i)
-      EXPECT_EQ("", WrongTile(file, uint16_t(i + 1), LevelLayout(kImage, std::vector<unsigned>{2, 3, 4, 8}[i])));
+      EXPECT_EQ("", WrongTile(file, uint16_t(i + 1),
+                              LevelLayout(kImage, std::vector<unsigned>{2, 3, 4, 8}[i])));
   } while (std::next_permutation(order.begin(), order.end()));
 }
 
@@ -82,7 +85,7 @@ TEST_F(Chain, ListsLevelsOfOtherProgramsByTheirFactor) {
                "<Item name=\"RESAMPLING\">CUBIC</Item></GDALMetadata>");
   AddDirectory(file_, Sized(134, 101), FILETYPE_REDUCEDIMAGE);
   AddDirectory(file_, Sized(100, 75), FILETYPE_REDUCEDIMAGE);
-  AddDirectory(file_, Sized(100, 10), FILETYPE_REDUCEDIMAGE);               // no factor fits both axes
+  AddDirectory(file_, Sized(100, 10), FILETYPE_REDUCEDIMAGE);  // no factor fits both axes
   AddDirectory(file_, Sized(50, 37), FILETYPE_REDUCEDIMAGE | FILETYPE_MASK);  // a mask's level
   Layout twoSamples = Sized(25, 18);
   twoSamples.samples = 2;
@@ -117,7 +120,8 @@ TEST_F(Chain, ReplacesAnotherProgramsLevelInItsPlaceWhenTheNewOneIsComplete) {
 TEST_F(Chain, KeepsAnotherProgramsLevelWhenTheNewOneIsGivenUp) {
   AddDirectory(file_, Sized(201, 151), FILETYPE_REDUCEDIMAGE);
   const auto before = BytesOf(file_);
-  Build(file_, kImage, {.level = 2, .edge = 64, .goesOn = [](unsigned n) { return n < 3; }, .marksValid = false});
+  Build(file_, kImage,
+        {.level = 2, .edge = 64, .goesOn = [](unsigned n) { return n < 3; }, .marksValid = false});
   EXPECT_EQ(before, BytesOf(file_));
   EXPECT_EQ("1", ValidityOf(LevelsOf(file_).at(0)));
 }
@@ -176,14 +180,16 @@ TEST_F(Chain, OfACloudOptimizedFileIsDeclaredEdited) {
       "GDAL_STRUCTURAL_METADATA_SIZE=000140 bytes\nLAYOUT=IFDS_BEFORE_DATA\n"
       "BLOCK_ORDER=ROW_MAJOR\nKNOWN_INCOMPATIBLE_EDITION=NO\n ";
   auto bytes = BytesOf(file_);
-  // The ghost text goes behind the header over the first tile's first bytes; only its text matters here.
+  // The ghost text goes behind the header over the first tile's first bytes; only its text matters
+  // here.
   std::copy(ghost.begin(), ghost.end(), bytes.begin() + 8);
   std::ofstream(file_, std::ios::binary).write(bytes.data(), std::streamsize(bytes.size()));
-  Build(file_, kImage, {.level = 2, .goesOn = [&](unsigned) {
-                          const auto now = BytesOf(file_);
-                          EXPECT_EQ(ghost, std::string(now.begin() + 8, now.begin() + 8 + long(ghost.size())));
-                          return true;
-                        }});
+  Build(file_, kImage,
+        {.level = 2, .goesOn = [&](unsigned) {
+           const auto now = BytesOf(file_);
+           EXPECT_EQ(ghost, std::string(now.begin() + 8, now.begin() + 8 + long(ghost.size())));
+           return true;
+         }});
   const auto now = BytesOf(file_);
   const std::string text(now.begin() + 8, now.begin() + 8 + long(ghost.size()));
   EXPECT_NE(text.npos, text.find("KNOWN_INCOMPATIBLE_EDITION=YES\n")) << text;

@@ -8,15 +8,16 @@
 namespace orin::tests {
 namespace {
 
-const Layout kImage{.width = 200, .height = 160, .samples = 3, .tile = 32, .photometric = PHOTOMETRIC_RGB};
+const Layout kImage{
+    .width = 200, .height = 160, .samples = 3, .tile = 32, .photometric = PHOTOMETRIC_RGB};
 constexpr unsigned kBlocks = 6;  // of 40 pixels, of level 2
 
 class Interrupted : public TiffStore {
  protected:
   Interrupted() : file_(folder_.File("image.tif")) { WriteImage(file_, kImage); }
 
-  /// Builds level 2 in a process of its own, which ends without any clean-up before block `stop`, or
-  /// before the level is marked valid.
+  /// Builds level 2 in a process of its own, which ends without any clean-up before block `stop`,
+  /// or before the level is marked valid.
   void KilledBuild(unsigned stop, const std::string& method = "NEAREST") const {
     const pid_t child = fork();
     ASSERT_LE(0, child);
@@ -44,7 +45,10 @@ TEST_F(Interrupted, BuildLeavesTheFileAsItWas) {
   const auto before = BytesOf(file_);
   for (unsigned stop = 0; stop < kBlocks; ++stop) {
     Build(file_, kImage,
-          {.level = 2, .edge = 40, .goesOn = [=](unsigned block) { return block < stop; }, .marksValid = false});
+          {.level = 2,
+           .edge = 40,
+           .goesOn = [=](unsigned block) { return block < stop; },
+           .marksValid = false});
     EXPECT_EQ(before, BytesOf(file_)) << "stopped before block " << stop;
   }
 }
@@ -53,7 +57,10 @@ TEST_F(Interrupted, BuildOfALaterLevelLeavesTheEarlierOnes) {
   Build(file_, kImage, {.level = 2});
   const auto before = BytesOf(file_);
   Build(file_, kImage,
-        {.level = 4, .edge = 20, .goesOn = [](unsigned block) { return block < 3; }, .marksValid = false});
+        {.level = 4,
+         .edge = 20,
+         .goesOn = [](unsigned block) { return block < 3; },
+         .marksValid = false});
   EXPECT_EQ(before, BytesOf(file_));
 }
 
@@ -62,7 +69,10 @@ TEST_F(Interrupted, RebuildKeepsTheOldPixelsButNotTheirValidity) {
   const auto before = BytesOf(file_);
   for (unsigned stop = 1; stop < kBlocks; ++stop) {
     Build(file_, kImage,
-          {.level = 2, .edge = 40, .goesOn = [=](unsigned block) { return block < stop; }, .marksValid = false});
+          {.level = 2,
+           .edge = 40,
+           .goesOn = [=](unsigned block) { return block < stop; },
+           .marksValid = false});
     EXPECT_EQ(before.size(), BytesOf(file_).size());
     EXPECT_EQ("000", ValidityOf(LevelsOf(file_).at(0)));
     EXPECT_EQ("", WrongTile(file_, 1, LevelLayout(kImage, 2)));
@@ -107,7 +117,11 @@ TEST_F(Interrupted, SomeChannelsOfAPlanarLevelAreKeptWhenOthersAreGivenUp) {
   Build(file_, planar, {.level = 2, .channels = {2}});
   EXPECT_EQ("-1-", ValidityOf(LevelsOf(file_).at(0)));
   Build(file_, planar,
-        {.level = 2, .edge = 40, .channels = {1}, .goesOn = [](unsigned block) { return block < 2; }, .marksValid = false});
+        {.level = 2,
+         .edge = 40,
+         .channels = {1},
+         .goesOn = [](unsigned block) { return block < 2; },
+         .marksValid = false});
   EXPECT_EQ("-1-", ValidityOf(LevelsOf(file_).at(0)));
   Build(file_, planar, {.level = 2, .channels = {1, 3}});
   EXPECT_EQ("111", ValidityOf(LevelsOf(file_).at(0)));

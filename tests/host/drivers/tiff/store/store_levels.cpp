@@ -45,31 +45,41 @@ std::vector<Kind> Kinds() {
       {"ComplexInt16", Grey(32, SAMPLEFORMAT_COMPLEXINT)},
       {"ComplexFloat32", Grey(64, SAMPLEFORMAT_COMPLEXIEEEFP)},
       {"ComplexFloat64", Grey(128, SAMPLEFORMAT_COMPLEXIEEEFP)},
-      Of("ComplexFloat32BigEndian", [](Layout& l) { l.mode = "wb"; }, Grey(64, SAMPLEFORMAT_COMPLEXIEEEFP)),
-      Of("ComplexBigEndianDeflate",
-         [](Layout& l) { l.mode = "wb", l.compression = COMPRESSION_ADOBE_DEFLATE; },
-         Grey(32, SAMPLEFORMAT_COMPLEXINT)),
+      Of(
+          "ComplexFloat32BigEndian", [](Layout& l) { l.mode = "wb"; },
+          Grey(64, SAMPLEFORMAT_COMPLEXIEEEFP)),
+      Of(
+          "ComplexBigEndianDeflate",
+          [](Layout& l) { l.mode = "wb", l.compression = COMPRESSION_ADOBE_DEFLATE; },
+          Grey(32, SAMPLEFORMAT_COMPLEXINT)),
       {"Bits12", Grey(12, SAMPLEFORMAT_UINT)},
-      Of("Bits12BigEndian", [](Layout& l) { l.mode = "wb"; }, Grey(12, SAMPLEFORMAT_UINT)),
+      Of(
+          "Bits12BigEndian", [](Layout& l) { l.mode = "wb"; }, Grey(12, SAMPLEFORMAT_UINT)),
       {"Bits4", Grey(4, SAMPLEFORMAT_UINT)},
-      Of("Bits12Deflate", [](Layout& l) { l.compression = COMPRESSION_ADOBE_DEFLATE; },
-         Grey(12, SAMPLEFORMAT_UINT)),
+      Of(
+          "Bits12Deflate", [](Layout& l) { l.compression = COMPRESSION_ADOBE_DEFLATE; },
+          Grey(12, SAMPLEFORMAT_UINT)),
       Of("Deflate", [](Layout& l) { l.compression = COMPRESSION_ADOBE_DEFLATE; }),
       Of("OldDeflate", [](Layout& l) { l.compression = COMPRESSION_DEFLATE; }),
-      Of("DeflatePredictor", [](Layout& l) { l.compression = COMPRESSION_ADOBE_DEFLATE, l.predictor = 2; }),
+      Of("DeflatePredictor",
+         [](Layout& l) { l.compression = COMPRESSION_ADOBE_DEFLATE, l.predictor = 2; }),
       Of("DeflatePredictorBigEndian16",
          [](Layout& l) {
            l.compression = COMPRESSION_ADOBE_DEFLATE, l.predictor = 2, l.bits = 16, l.mode = "wb";
          }),
-      Of("DeflateFloatPredictor",
-         [](Layout& l) { l.compression = COMPRESSION_ADOBE_DEFLATE, l.predictor = 3; },
-         Grey(32, SAMPLEFORMAT_IEEEFP)),
+      Of(
+          "DeflateFloatPredictor",
+          [](Layout& l) { l.compression = COMPRESSION_ADOBE_DEFLATE, l.predictor = 3; },
+          Grey(32, SAMPLEFORMAT_IEEEFP)),
       Of("Lzw", [](Layout& l) { l.compression = COMPRESSION_LZW, l.predictor = 2, l.tile = 128; }),
       Of("PackBits", [](Layout& l) { l.compression = COMPRESSION_PACKBITS; }),
       Of("Lzma", [](Layout& l) { l.compression = COMPRESSION_LZMA; }),
-      Of("Zstd", [](Layout& l) { l.compression = COMPRESSION_ZSTD, l.predictor = 2, l.planar = true; }),
+      Of("Zstd",
+         [](Layout& l) { l.compression = COMPRESSION_ZSTD, l.predictor = 2, l.planar = true; }),
       Of("WebP", [](Layout& l) { l.compression = COMPRESSION_WEBP, l.tile = 64; }),
-      Of("Lerc", [](Layout& l) { l.compression = COMPRESSION_LERC; }, Grey(32, SAMPLEFORMAT_IEEEFP)),
+      Of(
+          "Lerc", [](Layout& l) { l.compression = COMPRESSION_LERC; },
+          Grey(32, SAMPLEFORMAT_IEEEFP)),
       Of("LercPlanes", [](Layout& l) { l.compression = COMPRESSION_LERC, l.planar = true; }),
       Of("Cmyk", [](Layout& l) { l.photometric = PHOTOMETRIC_SEPARATED, l.samples = 4; }),
   };
@@ -79,7 +89,8 @@ class EveryKind : public TiffStore, public ::testing::WithParamInterface<Kind> {
 
 TEST_P(EveryKind, OfImageKeepsItsLevelsPixels) {
   const Layout& layout = GetParam().layout;
-  if (!TIFFIsCODECConfigured(layout.compression)) GTEST_SKIP() << "libtiff was built without the codec";
+  if (!TIFFIsCODECConfigured(layout.compression))
+    GTEST_SKIP() << "libtiff was built without the codec";
   const std::string file = folder_.File("image.tif");
   WriteImage(file, layout);
   const auto before = BytesOf(file);
@@ -121,7 +132,8 @@ TEST_F(TiffStore, JpegLevelKeepsYCbCrAndItsTilesStandAlone) {
   accessor.CreateLevel(2);
   const std::unique_ptr<IRasterWriter> writer(accessor.CreateRasterWriter(2));
   gobs::Raster block({128, 128, 3, gobs::eDT_8U}, {});
-  for (uint32_t i = 0; i < block.byteSize; ++i) block.data[i] = i % 3 == 0 ? 200 : i % 3 == 1 ? 100 : 50;
+  for (uint32_t i = 0; i < block.byteSize; ++i)
+    block.data[i] = i % 3 == 0 ? 200 : i % 3 == 1 ? 100 : 50;
   writer->Write(block);
   accessor.SetLevelValid(2, true);
 
@@ -136,7 +148,8 @@ TEST_F(TiffStore, JpegLevelKeepsYCbCrAndItsTilesStandAlone) {
   void* tables = nullptr;
   EXPECT_EQ(0, TIFFGetField(tiff, TIFFTAG_JPEGTABLES, &tablesSize, &tables));
   std::vector<uint8_t> tile(64 * 64 * 3);
-  EXPECT_EQ(tmsize_t(tile.size()), TIFFReadEncodedTile(tiff, 3, tile.data(), tmsize_t(tile.size())));
+  EXPECT_EQ(tmsize_t(tile.size()),
+            TIFFReadEncodedTile(tiff, 3, tile.data(), tmsize_t(tile.size())));
   EXPECT_NEAR(200, tile[0], 3);
   EXPECT_NEAR(100, tile[1], 3);
   EXPECT_NEAR(50, tile[2], 3);

@@ -12,7 +12,8 @@
 namespace orin::tests {
 namespace {
 
-const Layout kImage{.width = 200, .height = 160, .samples = 3, .tile = 32, .photometric = PHOTOMETRIC_RGB};
+const Layout kImage{
+    .width = 200, .height = 160, .samples = 3, .tile = 32, .photometric = PHOTOMETRIC_RGB};
 
 /// No file grows beyond `bytes` while it lives.
 class FileSizeLimit {
@@ -48,7 +49,8 @@ TEST_F(TiffStore, DiskThatFillsUpAnywhereLeavesTheImageAndACleanReport) {
       Build(file, kImage, {.level = 2});
       ADD_FAILURE() << "a level was built in " << limit << " bytes";
     } catch (const Exception& failure) {
-      EXPECT_NE(std::string::npos, failure.GetMessage().find(file + ": cannot be written: ")) << failure.GetMessage();
+      EXPECT_NE(std::string::npos, failure.GetMessage().find(file + ": cannot be written: "))
+          << failure.GetMessage();
       ++refused;
     }
     ASSERT_EQ(before, BytesOf(file)) << "limit " << limit;
@@ -72,7 +74,8 @@ TEST_F(TiffStore, ClassicFileNeverPassesFourGiB) {
       Build(file, kImage, {.level = 2});
       ADD_FAILURE() << "the level fitted into " << room << " bytes";
     } catch (const Exception& failure) {
-      EXPECT_NE(std::string::npos, failure.GetMessage().find("would pass 4 GiB")) << failure.GetMessage();
+      EXPECT_NE(std::string::npos, failure.GetMessage().find("would pass 4 GiB"))
+          << failure.GetMessage();
     }
     EXPECT_EQ(size, std::filesystem::file_size(file));
   }

@@ -23,17 +23,18 @@ TEST(Factor, OfASizeIsTheOneThatMadeIt) {
     uint32_t width, height, levelWidth, levelHeight;
     unsigned factor;
   };
-  for (const Case& c : std::vector<Case>{{1001, 777, 500, 388, 2},
-                                         {1001, 777, 501, 389, 2},   // rounded up
-                                         {1001, 777, 501, 388, 2},   // each axis its own way
-                                         {1000, 1000, 333, 333, 3},
-                                         {1000, 1000, 334, 334, 3},
-                                         {20000, 20000, 78, 78, 256},  // 254 to 259: the power of two
-                                         {20000, 20000, 79, 79, 256},
-                                         {20000, 20000, 30, 30, 667},
-                                         {1000, 1, 500, 1, 2},
-                                         {1000, 1, 250, 1, 4},
-                                         {3000, 3000, 1, 1, 2048}})
+  for (const Case& c :
+       std::vector<Case>{{1001, 777, 500, 388, 2},
+                         {1001, 777, 501, 389, 2},  // rounded up
+                         {1001, 777, 501, 388, 2},  // each axis its own way
+                         {1000, 1000, 333, 333, 3},
+                         {1000, 1000, 334, 334, 3},
+                         {20000, 20000, 78, 78, 256},  // 254 to 259: the power of two
+                         {20000, 20000, 79, 79, 256},
+                         {20000, 20000, 30, 30, 667},
+                         {1000, 1, 500, 1, 2},
+                         {1000, 1, 250, 1, 4},
+                         {3000, 3000, 1, 1, 2048}})
     EXPECT_EQ(c.factor, FactorOf(c.width, c.height, c.levelWidth, c.levelHeight))
         << c.width << "x" << c.height << " to " << c.levelWidth << "x" << c.levelHeight;
 }
@@ -52,7 +53,9 @@ TEST(Factor, OfAnySizeLeadsBackToThatSize) {
     const uint32_t width = 2 + random() % 50000, height = 2 + random() % 50000;
     const uint32_t level = 2 + random() % std::min(std::min(width, height) - 1, 600u);
     const bool up = random() % 2 != 0;
-    const auto reduced = [&](uint32_t size, uint32_t by) { return (size + (up ? by - 1 : 0)) / by; };
+    const auto reduced = [&](uint32_t size, uint32_t by) {
+      return (size + (up ? by - 1 : 0)) / by;
+    };
     const auto factor = FactorOf(width, height, reduced(width, level), reduced(height, level));
     ASSERT_TRUE(factor) << width << "x" << height << " by " << level;
     for (const auto& [size, by] : {std::pair{width, level}, std::pair{height, level}}) {
@@ -64,7 +67,8 @@ TEST(Factor, OfAnySizeLeadsBackToThatSize) {
 }
 
 TEST(Metadata, OfALevelIsReadBackAndItsValidityIsFound) {
-  const LevelMetadata written{.method = "A<&>B", .level = 8, .sourceLevel = 4, .program = "Orin \"x\"", .validity = "10-1"};
+  const LevelMetadata written{
+      .method = "A<&>B", .level = 8, .sourceLevel = 4, .program = "Orin \"x\"", .validity = "10-1"};
   const std::string text = ComposeLevelMetadata(written);
   const LevelMetadata read = drivers::ParseLevelMetadata(text);
   EXPECT_EQ(written.method, read.method);
@@ -76,9 +80,10 @@ TEST(Metadata, OfALevelIsReadBackAndItsValidityIsFound) {
 }
 
 TEST(Metadata, WithoutAWholeValidityHasNone) {
-  for (const char* text : {"", "<GDALMetadata>", "<GDALMetadata><Item name=\"ORIN_VALID\">12</Item></GDALMetadata>",
-                           "<GDALMetadata><Item name=\"ORIN_VALID\">&#49;</Item></GDALMetadata>",
-                           "<Item name=\"ORIN_VALID\""})
+  for (const char* text :
+       {"", "<GDALMetadata>", "<GDALMetadata><Item name=\"ORIN_VALID\">12</Item></GDALMetadata>",
+        "<GDALMetadata><Item name=\"ORIN_VALID\">&#49;</Item></GDALMetadata>",
+        "<Item name=\"ORIN_VALID\""})
     EXPECT_EQ("", drivers::ParseLevelMetadata(text).validity) << text;
 }
 
@@ -131,20 +136,22 @@ TEST_F(Parts, DirectoryIsReadByLibtiffAsItWasComposed) {
   for (const bool isBig : {false, true})
     for (const std::endian order : {std::endian::little, std::endian::big}) {
       const std::string name = folder_.File("composed.tif");
-      const std::string mode = std::string("w") + (isBig ? "8" : "") + (order == std::endian::little ? "l" : "b");
+      const std::string mode =
+          std::string("w") + (isBig ? "8" : "") + (order == std::endian::little ? "l" : "b");
       WriteImage(name, {.width = 5, .height = 5, .mode = mode.c_str()});
       const size_t link = LinkOfFirst(name);
       PositionedFile file(name, PositionedFile::Mode::kUpdate);
       Appender appender(file, isBig, {order});
-      const uint64_t at = appender.AppendDirectory({drivers::TextEntry(TIFFTAG_SOFTWARE, "a longer text"),
-                                                    drivers::NumbersEntry(TIFFTAG_IMAGEWIDTH, TIFF_LONG, {70000}),
-                                                    drivers::NumbersEntry(TIFFTAG_IMAGELENGTH, TIFF_SHORT, {300}),
-                                                    drivers::NumbersEntry(TIFFTAG_BITSPERSAMPLE, TIFF_SHORT, {8, 8, 8}),
-                                                    drivers::NumbersEntry(TIFFTAG_SAMPLESPERPIXEL, TIFF_SHORT, {3}),
-                                                    drivers::NumbersEntry(TIFFTAG_PHOTOMETRIC, TIFF_SHORT, {2}),
-                                                    drivers::NumbersEntry(TIFFTAG_STRIPOFFSETS, TIFF_LONG, {8}),
-                                                    drivers::NumbersEntry(TIFFTAG_STRIPBYTECOUNTS, TIFF_LONG, {25})},
-                                                   0);
+      const uint64_t at = appender.AppendDirectory(
+          {drivers::TextEntry(TIFFTAG_SOFTWARE, "a longer text"),
+           drivers::NumbersEntry(TIFFTAG_IMAGEWIDTH, TIFF_LONG, {70000}),
+           drivers::NumbersEntry(TIFFTAG_IMAGELENGTH, TIFF_SHORT, {300}),
+           drivers::NumbersEntry(TIFFTAG_BITSPERSAMPLE, TIFF_SHORT, {8, 8, 8}),
+           drivers::NumbersEntry(TIFFTAG_SAMPLESPERPIXEL, TIFF_SHORT, {3}),
+           drivers::NumbersEntry(TIFFTAG_PHOTOMETRIC, TIFF_SHORT, {2}),
+           drivers::NumbersEntry(TIFFTAG_STRIPOFFSETS, TIFF_LONG, {8}),
+           drivers::NumbersEntry(TIFFTAG_STRIPBYTECOUNTS, TIFF_LONG, {25})},
+          0);
       EXPECT_EQ(0u, at % 2);
       appender.Link(link, at);
       TIFF* tiff = TIFFOpen(name.c_str(), "rm");
@@ -152,8 +159,10 @@ TEST_F(Parts, DirectoryIsReadByLibtiffAsItWasComposed) {
       uint32_t width = 0, height = 0;
       uint16_t bits = 0;
       char* text = nullptr;
-      EXPECT_TRUE(TIFFGetField(tiff, TIFFTAG_IMAGEWIDTH, &width) && TIFFGetField(tiff, TIFFTAG_IMAGELENGTH, &height) &&
-                  TIFFGetField(tiff, TIFFTAG_BITSPERSAMPLE, &bits) && TIFFGetField(tiff, TIFFTAG_SOFTWARE, &text));
+      EXPECT_TRUE(TIFFGetField(tiff, TIFFTAG_IMAGEWIDTH, &width) &&
+                  TIFFGetField(tiff, TIFFTAG_IMAGELENGTH, &height) &&
+                  TIFFGetField(tiff, TIFFTAG_BITSPERSAMPLE, &bits) &&
+                  TIFFGetField(tiff, TIFFTAG_SOFTWARE, &text));
       EXPECT_EQ(70000u, width);
       EXPECT_EQ(300u, height);
       EXPECT_EQ(8u, bits);
@@ -171,7 +180,8 @@ TEST_F(Parts, EncoderNamesTheFileAndTheCodecsReason) {
     drivers::TileEncoder(coding, "scene.tif").Encode(std::vector<uint8_t>(1024), 0);
     ADD_FAILURE() << "JPEG took floats";
   } catch (const Exception& refused) {
-    EXPECT_EQ(0u, refused.GetMessage().find("scene.tif: a tile cannot be encoded: ")) << refused.GetMessage();
+    EXPECT_EQ(0u, refused.GetMessage().find("scene.tif: a tile cannot be encoded: "))
+        << refused.GetMessage();
   }
 }
 

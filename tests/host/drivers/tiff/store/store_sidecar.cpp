@@ -12,7 +12,8 @@
 namespace orin::tests {
 namespace {
 
-const Layout kImage{.width = 200, .height = 160, .samples = 3, .tile = 32, .photometric = PHOTOMETRIC_RGB};
+const Layout kImage{
+    .width = 200, .height = 160, .samples = 3, .tile = 32, .photometric = PHOTOMETRIC_RGB};
 
 Layout InPlanes(Layout layout) {
   layout.planar = layout.samples > 1;
@@ -39,7 +40,9 @@ class PlainImage final : public datasources::IRasterSource {
   datasources::AuxiliaryData MetadataOf(const std::vector<unsigned>&) const override {
     return {{{datasources::kNoDataKey, "-9999"}}, {}};
   }
-  std::unique_ptr<datasources::IRasterReader> OpenReader(const std::vector<unsigned>&) override { return nullptr; }
+  std::unique_ptr<datasources::IRasterReader> OpenReader(const std::vector<unsigned>&) override {
+    return nullptr;
+  }
   datasources::ILevelStore* Levels() override { return nullptr; }
 
  private:
@@ -49,7 +52,10 @@ class PlainImage final : public datasources::IRasterSource {
 
 class SideCar : public TiffStore {
  protected:
-  SideCar() : file_(folder_.File("image.tif")), sideCar_(file_ + ".ovr"), partial_(sideCar_ + ".partial") {
+  SideCar()
+      : file_(folder_.File("image.tif")),
+        sideCar_(file_ + ".ovr"),
+        partial_(sideCar_ + ".partial") {
     WriteImage(file_, kImage);
   }
   bool Exists(const std::string& name) const { return std::filesystem::exists(name); }
@@ -100,7 +106,11 @@ TEST_F(SideCar, LeavesNothingBehindWhenItsFirstLevelIsGivenUp) {
   {
     const auto dataset = OpenGeneric(file_);
     Build(*dataset, kImage,
-          {.level = 2, .edge = 40, .channels = {1}, .goesOn = [](unsigned block) { return block < 3; }, .marksValid = false});
+          {.level = 2,
+           .edge = 40,
+           .channels = {1},
+           .goesOn = [](unsigned block) { return block < 3; },
+           .marksValid = false});
   }
   EXPECT_FALSE(Exists(sideCar_));
   EXPECT_FALSE(Exists(partial_));
@@ -117,7 +127,11 @@ TEST_F(SideCar, StartsAnewOverTheRestsOfAKilledRun) {
 TEST_F(SideCar, CanStartAgainAfterBeingGivenUpInTheSameRun) {
   const auto dataset = OpenGeneric(file_);
   Build(*dataset, kImage,
-        {.level = 2, .edge = 40, .channels = {1}, .goesOn = [](unsigned block) { return block < 5; }, .marksValid = false});
+        {.level = 2,
+         .edge = 40,
+         .channels = {1},
+         .goesOn = [](unsigned block) { return block < 5; },
+         .marksValid = false});
   Build(*dataset, kImage, {.level = 2, .channels = {1}});
   EXPECT_EQ("1--", ValidityOf(LevelsOf(*dataset).at(0)));
 }
@@ -147,7 +161,8 @@ TEST_F(SideCar, ThatCannotBeReadIsNeverOverwritten) {
     OpenGeneric(file_);
     ADD_FAILURE() << "an unreadable side-car was taken";
   } catch (const Exception& refused) {
-    EXPECT_EQ(0u, refused.GetMessage().find(sideCar_ + ": cannot be read: ")) << refused.GetMessage();
+    EXPECT_EQ(0u, refused.GetMessage().find(sideCar_ + ": cannot be read: "))
+        << refused.GetMessage();
     EXPECT_NE(std::string::npos, refused.GetMessage().find("Delete the side-car"));
   }
   EXPECT_EQ("no TIFF file", std::string(BytesOf(sideCar_).data(), 12));

@@ -63,7 +63,8 @@ TEST_F(Structure, OfEveryPrefixOfAFileIsReadOrRefused) {
     unsigned read = 0, refused = 0;
     for (size_t length = 0; length < bytes.size(); length += length < 600 ? 1 : 37) {
       try {
-        EXPECT_GE(3u, Parse({bytes.begin(), bytes.begin() + std::ptrdiff_t(length)}).directories.size());
+        EXPECT_GE(
+            3u, Parse({bytes.begin(), bytes.begin() + std::ptrdiff_t(length)}).directories.size());
         ++read;
       } catch (const Exception&) {
         ++refused;
@@ -97,7 +98,10 @@ TEST_F(Structure, OfDamagedFilesIsReadOrRefused) {
 }
 
 TEST_F(Structure, OfWhatIsNoTiffIsRefused) {
-  const std::vector<std::string> texts = {"", "II*", "PNG....8888", std::string("II*\0\0\0\0\0", 8),
+  const std::vector<std::string> texts = {"",
+                                          "II*",
+                                          "PNG....8888",
+                                          std::string("II*\0\0\0\0\0", 8),
                                           std::string("MM\0*\xFF\xFF\xFF\xFF", 8),
                                           std::string("II+\0\x04\0\0\0\x10\0\0\0\0\0\0\0", 16)};
   for (const std::string& text : texts)

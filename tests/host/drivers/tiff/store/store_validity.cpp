@@ -6,7 +6,8 @@
 namespace orin::tests {
 namespace {
 
-const Layout kImage{.width = 200, .height = 160, .samples = 3, .tile = 32, .photometric = PHOTOMETRIC_RGB};
+const Layout kImage{
+    .width = 200, .height = 160, .samples = 3, .tile = 32, .photometric = PHOTOMETRIC_RGB};
 
 class Validity : public TiffStore {
  protected:
@@ -19,8 +20,8 @@ TEST_F(Validity, IsInTheMetadataThatOtherProgramsRead) {
   Build(file_, kImage, {.level = 2, .method = "BICUBIC"});
   const std::string text = DirectoriesOf(file_).at(1).metadata;
   for (const char* item : {">BICUBIC<", "name=\"RESAMPLING\"", "name=\"ORIN_FACTOR\"", ">2<",
-                           "name=\"ORIN_SOURCE_LEVEL\"", ">1<", "name=\"ORIN_PROGRAM\"", ">Orin Overviews ",
-                           "name=\"ORIN_VALID\"", ">111<"})
+                           "name=\"ORIN_SOURCE_LEVEL\"", ">1<", "name=\"ORIN_PROGRAM\"",
+                           ">Orin Overviews ", "name=\"ORIN_VALID\"", ">111<"})
     EXPECT_NE(text.npos, text.find(item)) << item << " in " << text;
 }
 
@@ -109,7 +110,8 @@ TEST_F(Validity, IsRefusedToALevelWithMissingTiles) {
       accessor.SetLevelValid(2, true);
       ADD_FAILURE() << "an incomplete level was marked valid";
     } catch (const Exception& refused) {
-      EXPECT_EQ(file_ + ": level 2 is not complete and cannot be marked valid.", refused.GetMessage());
+      EXPECT_EQ(file_ + ": level 2 is not complete and cannot be marked valid.",
+                refused.GetMessage());
     }
   }
   EXPECT_EQ(before, BytesOf(file_));

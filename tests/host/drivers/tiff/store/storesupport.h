@@ -46,7 +46,8 @@ inline std::unique_ptr<IRasterDataset> Open(const std::string& file, datasources
   return Opened(datasources::DatasetManager::GetInstance()->Open(file, mode));
 }
 inline std::unique_ptr<IRasterDataset> OpenGeneric(const std::string& file) {
-  return Opened(datasources::DatasetManager::GetInstance()->OpenFormat("ZMBALL", file, datasources::kReadOnly));
+  return Opened(datasources::DatasetManager::GetInstance()->OpenFormat("ZMBALL", file,
+                                                                       datasources::kReadOnly));
 }
 
 inline std::vector<unsigned> ChannelsOf(const IRasterDataset& dataset) {
@@ -87,8 +88,9 @@ inline Layout LevelLayout(Layout image, unsigned level) {
 using BeforeBlock = std::function<bool(unsigned)>;
 
 /// Writes the pattern of `layout` in blocks of that edge.
-inline void WriteBlocks(IRasterWriter& writer, const Layout& layout, unsigned edge,
-                        const BeforeBlock& goesOn = [](unsigned) { return true; }) {
+inline void WriteBlocks(
+    IRasterWriter& writer, const Layout& layout, unsigned edge,
+    const BeforeBlock& goesOn = [](unsigned) { return true; }) {
   unsigned number = 0;
   const std::vector<unsigned> channels = writer.GetChannelsInfo();
   for (uint32_t y = 0; y < writer.GetHeight(); y += edge)
@@ -111,7 +113,7 @@ inline void WriteBlocks(IRasterWriter& writer, const Layout& layout, unsigned ed
 
 struct LevelBuilding {
   unsigned level = 2;
-  unsigned edge = 100;         ///< of the blocks
+  unsigned edge = 100;  ///< of the blocks
   std::string method = "NEAREST";
   std::vector<unsigned> channels = {};  ///< none: all
   BeforeBlock goesOn = [](unsigned) { return true; };
@@ -156,7 +158,8 @@ inline std::vector<Seen> DirectoriesOf(const std::string& file) {
     TIFFGetField(tiff, TIFFTAG_PREDICTOR, &seen.predictor);
     TIFFGetField(tiff, TIFFTAG_PHOTOMETRIC, &seen.photometric);
     TIFFGetFieldDefaulted(tiff, TIFFTAG_PLANARCONFIG, &seen.planar);
-    if (TIFFGetField(tiff, 42112, &count, &metadata) && metadata) seen.metadata = std::string(metadata);
+    if (TIFFGetField(tiff, 42112, &count, &metadata) && metadata)
+      seen.metadata = std::string(metadata);
     seen.offset = TIFFCurrentDirOffset(tiff);
     all.push_back(seen);
   } while (TIFFReadDirectory(tiff));
@@ -168,13 +171,15 @@ inline std::vector<Seen> DirectoriesOf(const std::string& file) {
 inline std::string SizesOf(const std::string& file) {
   std::string sizes;
   for (const Seen& seen : DirectoriesOf(file))
-    sizes += (sizes.empty() ? "" : " ") + std::to_string(seen.width) + "x" + std::to_string(seen.height);
+    sizes +=
+        (sizes.empty() ? "" : " ") + std::to_string(seen.width) + "x" + std::to_string(seen.height);
   return sizes;
 }
 
 /// Compares every tile of directory `index`, decoded by libtiff, with the pattern of `layout`.
 /// \param tolerance  of a byte; for lossy codecs. \returns what differs first; empty when nothing does
-inline std::string WrongTile(const std::string& file, uint16_t index, const Layout& layout, int tolerance = 0) {
+inline std::string WrongTile(const std::string& file, uint16_t index, const Layout& layout,
+                             int tolerance = 0) {
   TIFF* tiff = TIFFOpen(file.c_str(), "rm");
   if (!tiff || !TIFFSetDirectory(tiff, index)) return "no directory " + std::to_string(index);
   const std::unique_ptr<TIFF, void (*)(TIFF*)> closer(tiff, &TIFFClose);
@@ -207,16 +212,20 @@ inline size_t LinkOfFirst(const std::string& file) {
   const bool isBig = bytes[2] == 43 || bytes[3] == 43;
   const size_t offset = DirectoriesOf(file).at(0).offset;
   const size_t at = offset + (bytes[0] == 'M' ? (isBig ? 7 : 1) : 0);  // directories here are small
-  return offset + (isBig ? 8 + 20 * size_t(uint8_t(bytes[at])) : 2 + 12 * size_t(uint8_t(bytes[at])));
+  return offset +
+         (isBig ? 8 + 20 * size_t(uint8_t(bytes[at])) : 2 + 12 * size_t(uint8_t(bytes[at])));
 }
 
-/// Reads a level through the accessor, as a source of a smaller level. \returns the first difference
+/// Reads a level through the accessor, as a source of a smaller level. \returns the first
+/// difference
 inline std::string WrongPixels(const std::string& file, const Layout& image, unsigned level) {
   const auto dataset = Open(file, datasources::kReadOnly);
   datasources::BasicOverviewWriterAccessor accessor(dataset.get(), ChannelsOf(*dataset));
   const std::unique_ptr<IRasterWriter> writer(accessor.CreateRasterWriter(level));
   const Layout layout = LevelLayout(image, level);
-  gobs::Raster block({writer->GetWidth(), writer->GetHeight(), writer->GetChannelCount(), writer->GetDataType()}, {});
+  gobs::Raster block(
+      {writer->GetWidth(), writer->GetHeight(), writer->GetChannelCount(), writer->GetDataType()},
+      {});
   writer->Read(block);
   const uint8_t* at = block.data;
   for (uint32_t y = 0; y < layout.height; ++y)
@@ -230,9 +239,10 @@ inline std::string WrongPixels(const std::string& file, const Layout& image, uns
   return "";
 }
 
-/// True when `now` starts with the bytes of `before`, but for the `width` bytes of a link at `link`.
-inline bool StartsWith(const std::vector<char>& now, const std::vector<char>& before, size_t link = 0,
-                       size_t width = 0) {
+/// True when `now` starts with the bytes of `before`, but for the `width` bytes of a link at
+/// `link`.
+inline bool StartsWith(const std::vector<char>& now, const std::vector<char>& before,
+                       size_t link = 0, size_t width = 0) {
   if (now.size() < before.size()) return false;
   for (size_t i = 0; i < before.size(); ++i)
     if (now[i] != before[i] && !(i >= link && i < link + width)) return false;
