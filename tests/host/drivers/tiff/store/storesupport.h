@@ -177,7 +177,8 @@ inline std::string SizesOf(const std::string& file) {
 }
 
 /// Compares every tile of directory `index`, decoded by libtiff, with the pattern of `layout`.
-/// \param tolerance  of a byte; for lossy codecs. \returns what differs first; empty when nothing does
+/// \param tolerance  of a byte; for lossy codecs
+/// \returns what differs first; empty when nothing does
 inline std::string WrongTile(const std::string& file, uint16_t index, const Layout& layout,
                              int tolerance = 0) {
   TIFF* tiff = TIFFOpen(file.c_str(), "rm");
