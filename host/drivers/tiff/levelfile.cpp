@@ -95,14 +95,18 @@ void LevelFile::Link(const Place& place, uint64_t directory) {
   OpenForChange();
   file_->Sync();
   if (isMade_) DeclareEdited();
+  Keep();  // first: a link that fails half-way may point there already
   appender_->Link(place.linkPosition, directory);
   file_->Sync();
-  ++links_;
   if (!isMade_) {
     file_->Rename(path_);
     isMade_ = true;
   }
   structure_ = ParseStructure(*file_);
+}
+
+void LevelFile::Keep() {
+  if (appender_) appender_->Keep();
 }
 
 void LevelFile::CutBackTo(uint64_t end) {

@@ -71,6 +71,7 @@ void TiffLevelStore::Patch(const StoredLevel& stored, const LevelMetadata& metad
   const uint64_t tiles = build.TilesPerPlane();
   file_->Overwrite(stored.validityPosition, metadata.validity);
   file_->Sync();
+  file_->Keep();
   for (const TileTable& table : kTables) {
     const TiffEntry* entry = structure.directories[stored.index].Find(table.tag);
     for (const uint32_t plane : planes) {

@@ -208,8 +208,7 @@ std::shared_ptr<LevelBuild> TiffLevelStore::BeginWriting(unsigned level,
     if (ours && ours->metadata.validity[channel - 1] == kValid) valid.push_back(channel);
   if (!valid.empty()) Mark(*ours, valid, kInvalid);
   if (!pending.build)
-    pending.build =
-        std::make_shared<LevelBuild>(pending.coding, file_->ToAppend().End(), file_->Links());
+    pending.build = std::make_shared<LevelBuild>(pending.coding, file_->ToAppend().End());
   ++pending.build->writers;
   return pending.build;
 }
@@ -228,7 +227,7 @@ void TiffLevelStore::GiveUp(unsigned level, LevelBuild& build) {
   pending_.erase(level);
   const bool isLast = std::none_of(pending_.begin(), pending_.end(),
                                    [](const auto& entry) { return entry.second.build != nullptr; });
-  if (isLast && build.Links() == file_->Links()) file_->CutBackTo(build.FirstEnd());
+  if (isLast) file_->CutBackTo(build.FirstEnd());
 }
 
 void TiffLevelStore::EndWriting(unsigned level, LevelBuild& build) noexcept {

@@ -110,6 +110,20 @@ TEST_F(Interrupted, KilledRebuildIsNotValidAndStillHoldsTheOldPixels) {
   EXPECT_EQ("111", ValidityOf(LevelsOf(file_).at(0)));
 }
 
+TEST_F(Interrupted, BuildTakesNoTileOfALevelThatIsRebuiltMeanwhile) {
+  Build(file_, kImage, {.level = 2});
+  const auto dataset = Open(file_, datasources::kUpdate);
+  datasources::BasicOverviewWriterAccessor accessor(dataset.get(), {1, 2, 3});
+  accessor.CreateLevel(4);
+  {
+    const std::unique_ptr<IRasterWriter> writer(accessor.CreateRasterWriter(4));
+    WriteBlocks(*writer, LevelLayout(kImage, 4), 32, [](unsigned block) { return block < 1; });
+    Build(*dataset, kImage, {.level = 2});
+  }
+  EXPECT_EQ("111", ValidityOf(LevelsOf(file_).at(0)));
+  EXPECT_EQ("", WrongTile(file_, 1, LevelLayout(kImage, 2)));
+}
+
 TEST_F(Interrupted, SomeChannelsOfAPlanarLevelAreKeptWhenOthersAreGivenUp) {
   Layout planar = kImage;
   planar.planar = true;

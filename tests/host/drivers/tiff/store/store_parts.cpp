@@ -132,6 +132,33 @@ TEST_F(Parts, BytesOfAnotherProgramAreNeverCutOff) {
   EXPECT_EQ(14u, file.Size());
 }
 
+TEST_F(Parts, BytesOfAnotherProgramAreNeverWrittenOver) {
+  const std::string name = folder_.File("bytes");
+  std::ofstream(name) << "before";
+  PositionedFile file(name, PositionedFile::Mode::kUpdate);
+  Appender appender(file, false, {});
+  std::ofstream(name, std::ios::app) << "others";
+  EXPECT_EQ(12u, appender.Append({1, 2}));
+  const std::vector<char> bytes = BytesOf(name);
+  EXPECT_EQ("beforeothers", std::string(bytes.begin(), bytes.begin() + 12));
+  appender.CutBackTo(6);
+  EXPECT_EQ(14u, file.Size());
+}
+
+TEST_F(Parts, KeptBytesAreNotGivenUp) {
+  const std::string name = folder_.File("bytes");
+  std::ofstream(name) << "before";
+  PositionedFile file(name, PositionedFile::Mode::kUpdate);
+  Appender appender(file, false, {});
+  appender.Append({1, 2});
+  appender.Keep();
+  appender.Append({3, 4});
+  appender.CutBackTo(6);
+  EXPECT_EQ(10u, file.Size());
+  appender.CutBackTo(8);
+  EXPECT_EQ(8u, file.Size());
+}
+
 TEST_F(Parts, DirectoryIsReadByLibtiffAsItWasComposed) {
   for (const bool isBig : {false, true})
     for (const std::endian order : {std::endian::little, std::endian::big}) {
