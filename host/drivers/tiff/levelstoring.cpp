@@ -49,13 +49,16 @@ LevelMetadata TiffLevelStore::MetadataFor(unsigned level, const Pending& pending
   return metadata;
 }
 
-/// What is in the directory already stays there: size of numbers, texts, and all but validity.
+/// What is in the directory already stays there: size of numbers, texts, and all but validity. No
+/// channel that stays valid has its tiles in the part that changes: that takes several writes.
 bool TiffLevelStore::CanPatch(const StoredLevel& stored, const LevelMetadata& metadata,
                               const LevelBuild& build) const {
   const LevelMetadata& old = stored.metadata;
   if (old.method != metadata.method || old.sourceLevel != metadata.sourceLevel ||
       old.program != metadata.program)
     return false;
+  const bool sharesTiles = !build.Coding().format.planar;
+  if (sharesTiles && metadata.validity.find(kValid) != std::string::npos) return false;
   const TiffStructure& structure = file_->Structure();
   return std::all_of(std::begin(kTables), std::end(kTables), [&](const TileTable& table) {
     const TiffEntry* entry = structure.directories[stored.index].Find(table.tag);

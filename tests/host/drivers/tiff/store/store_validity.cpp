@@ -82,6 +82,23 @@ TEST_F(Validity, OfARebuildByTheSameMethodIsAllThatChangesBesideTheTileTable) {
   EXPECT_EQ("", WrongTile(file_, 1, LevelLayout(kImage, 2)));
 }
 
+TEST_F(Validity, OfChannelsThatShareTheRebuiltOnesTilesStandsOverAWholeTileTable) {
+  Build(file_, kImage, {.level = 2});
+  const auto before = DirectoriesOf(file_);
+  const auto table = BytesOf(file_);
+  Build(file_, kImage, {.level = 2, .channels = {1}});
+  const auto after = DirectoriesOf(file_);
+  EXPECT_NE(before.at(1).offset, after.at(1).offset);  // linked in by one write
+  EXPECT_EQ("111", Valid());
+  EXPECT_EQ("", WrongTile(file_, 1, LevelLayout(kImage, 2)));
+  const auto now = BytesOf(file_);
+  const auto end = static_cast<ptrdiff_t>(table.size());
+  const auto first = static_cast<ptrdiff_t>(before.at(1).offset);
+  unsigned changed = 0;  // of the old directory: one character, for the channel
+  for (ptrdiff_t at = first; at < end; ++at) changed += table.at(at) != now.at(at);
+  EXPECT_EQ(1u, changed);
+}
+
 TEST_F(Validity, IsSwitchedInPlace) {
   Build(file_, kImage, {.level = 2});
   const auto size = BytesOf(file_).size();
