@@ -132,6 +132,17 @@ TEST_F(Parts, BytesOfAnotherProgramAreNeverCutOff) {
   EXPECT_EQ(14u, file.Size());
 }
 
+TEST(Coding, OfLevelsWithVeryManyChannelsHasSmallerTiles) {
+  const auto edge = [](uint32_t channels) {
+    const auto image = drivers::PlainCoding(5000, 5000, channels, gobs::eDT_8U, "");
+    return drivers::CodingOfLevel(image, 2, "image").format.tileWidth;
+  };
+  EXPECT_EQ(256u, edge(3));
+  EXPECT_EQ(256u, edge(1024));  // 64 MiB
+  EXPECT_EQ(128u, edge(1025));
+  EXPECT_EQ(32u, edge(65535));  // 64 MiB less 1 KiB
+}
+
 TEST_F(Parts, BytesOfAnotherProgramAreNeverWrittenOver) {
   const std::string name = folder_.File("bytes");
   std::ofstream(name) << "before";
