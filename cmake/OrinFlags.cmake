@@ -10,7 +10,7 @@ target_compile_features(orin_flags INTERFACE cxx_std_20)
 target_compile_options(orin_flags INTERFACE
   -ffp-contract=off   # pixels are the same bits on every compiler and processor
   -Wall -Wextra -Wpedantic -Wshadow -Wnon-virtual-dtor -Woverloaded-virtual
-  $<$<CONFIG:RelWithDebInfo>:-UNDEBUG>                      # people develop in it: assertions stay on
+  $<$<CONFIG:RelWithDebInfo>:-UNDEBUG>   # people develop in it: assertions stay on
   $<$<CONFIG:RelWithDebInfo>:-D_GLIBCXX_ASSERTIONS>)
 
 if(ORIN_SANITIZE STREQUAL "address")

@@ -57,13 +57,14 @@ orin_require() {
   rm -f "$log"
 }
 
-# orin_run_logged WHAT LOG COMMAND...: runs a step in silence, shows its output only when it fails.
+# orin_run_logged WHAT LOG COMMAND...: runs a step in silence; shows the end of its output when it
+# fails.
 orin_run_logged() {
   local what=$1 log=$2
   shift 2
   if ! "$@" </dev/null >"$log" 2>&1; then
-    cat "$log" >&2
-    orin_fail "$what failed; the output is above and in $log."
+    tail -n 60 "$log" >&2
+    orin_fail "$what failed; the end of its output is above, all of it in $log."
   fi
 }
 

@@ -20,8 +20,7 @@ namespace {
 
 CreateFileOverviews MakeJob(const BuildOptions& options, const std::string& file) {
   CreateFileOverviews job(file, options.channels);
-  if (!options.levels.empty())
-    job.SetPyramidLevels(options.levels, options.force);
+  if (!options.levels.empty()) job.SetPyramidLevels(options.levels, options.force);
   else
     job.SetPyramidFactor(options.factor ? options.factor : GetDefaultDecimationLevels(),
                          options.force);
@@ -118,7 +117,10 @@ ExitCode BuildFile(const BuildOptions& options, const std::string& file,
   const Outcome outcome = RunJob(job, plan, options, file, interruption, console);
   if (!outcome.built)
     return ReportFailure(outcome, plan, options, file, interruption.Requested(), console);
-  console.Result(file + ": " + SummaryText(plan, LookAtLevels(plan, options, file)));
+  const LevelState state = LookAtLevels(plan, options, file);
+  console.Result(file + ": " + SummaryText(plan, state));
+  if (const std::string hidden = HiddenLevelsText(state); !hidden.empty())
+    console.Notice(AfterFileName(file, hidden));
   return kDone;
 }
 

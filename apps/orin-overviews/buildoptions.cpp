@@ -56,9 +56,9 @@ CLI::App* AddBuildCommand(CLI::App& app, BuildOptions& options) {
   const auto* levels =
       AddText(*command, "--levels", _("LIST"), _("Levels to build, such as 2,4,8"),
               [&](const std::string& text) { return ReadList(ParseLevels(text), options.levels); });
-  const auto* factor =
-      AddText(*command, "--factor", "2|3", _("Build the whole pyramid, each level this much smaller"),
-              [&](const std::string& text) { return ReadFactor(text, options.factor); });
+  const auto* factor = AddText(
+      *command, "--factor", "2|3", _("Build the whole pyramid, each level this much smaller"),
+      [&](const std::string& text) { return ReadFactor(text, options.factor); });
   AddText(*command, "--method", _("METHOD"), _("nearest, average, mode, bilinear or bicubic"),
           [&](const std::string& text) { return ReadMethod(text, options.method); });
   AddText(*command, "--channels", _("LIST"), _("Channels to treat, such as 1,3-5"),

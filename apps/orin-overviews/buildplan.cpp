@@ -54,7 +54,8 @@ std::vector<unsigned> RequestedLevels(const BuildOptions& options, const IRaster
 
 std::vector<LevelDescription> DescribeLevels(IDataset& dataset) {
   auto* raster = dynamic_cast<IRasterDataset*>(&dataset);
-  const std::unique_ptr<datasources::IOverviewInfo> info(raster ? raster->GetOverviewInfo() : nullptr);
+  const std::unique_ptr<datasources::IOverviewInfo> info(raster ? raster->GetOverviewInfo()
+                                                                : nullptr);
   return info ? info->Describe() : std::vector<LevelDescription>();
 }
 
@@ -82,9 +83,10 @@ std::unique_ptr<IDataset> OpenForBuild(const std::string& file, Placement placem
     mode = AccessMode::kReadOnly;
     dataset = Open(file, mode);
   }
-  const bool beside = placement == Placement::kExternal ||
-                      (placement == Placement::kAutomatic &&
-                       (mode == AccessMode::kReadOnly || !SupportsInternalOverviews(dataset.get())));
+  const bool beside =
+      placement == Placement::kExternal ||
+      (placement == Placement::kAutomatic &&
+       (mode == AccessMode::kReadOnly || !SupportsInternalOverviews(dataset.get())));
   if (!beside) return dataset;
   dataset.reset();
   return std::unique_ptr<IDataset>(DatasetManager::GetInstance()->OpenFormat("ZMBALL", file, mode));
@@ -108,8 +110,7 @@ BuildPlan PlanBuild(const BuildOptions& options, const std::string& file) {
     if (level < 2) continue;  // the library refuses the request
     if (options.force || !IsValid(existing, level, plan.channels))
       plan.building.push_back({level, plan.IsEmpty(level)});
-    else if (plan.kept.empty() || plan.kept.back() != level)
-      plan.kept.push_back(level);
+    else if (plan.kept.empty() || plan.kept.back() != level) plan.kept.push_back(level);
   }
   return plan;
 }

@@ -12,19 +12,20 @@
 
 namespace orin::app {
 
-/// A file opened as a job with this placement opens it: for update where that is possible, through the
-/// generic layer where levels belong into the side-car.
+/// A file opened as a job with this placement opens it: for update where that is possible, through
+/// the generic layer where levels belong into the side-car.
 /// \throws orin::Exception  it cannot be opened; the text names the file and the reason
 std::unique_ptr<datasources::IDataset> OpenForBuild(const std::string& file, Placement placement);
 
 struct BuildPlan {
-  unsigned width = 0;              ///< pixels
-  unsigned height = 0;             ///< pixels
+  unsigned width = 0;   ///< pixels
+  unsigned height = 0;  ///< pixels
   unsigned channelCount = 0;
-  std::vector<unsigned> channels;  ///< to be treated; those of the user, or all wider than one bit
-  std::vector<unsigned> requested; ///< levels, ascending, each once
-  std::vector<unsigned> kept;      ///< of these: present, valid and not to be forced
-  std::vector<PlannedLevel> building;  ///< the others in the order of building, repeated ones repeated
+  std::vector<unsigned> channels;   ///< to be treated; those of the user, or all wider than one bit
+  std::vector<unsigned> requested;  ///< levels, ascending, each once
+  std::vector<unsigned> kept;       ///< of these: present, valid and not to be forced
+  std::vector<PlannedLevel>
+      building;  ///< the others in the order of building, repeated ones repeated
   LevelReport report = LevelReport::kWithinShare;
 
   bool IsEmpty(unsigned level) const { return width / level == 0 || height / level == 0; }
@@ -37,10 +38,12 @@ BuildPlan PlanBuild(const BuildOptions& options, const std::string& file);
 struct LevelState {
   std::vector<unsigned> valid;
   std::vector<unsigned> unfinished;  ///< requested, not empty, and not valid
-  std::vector<datasources::LevelDescription> descriptions;  ///< of all levels that the build can see
+  std::vector<datasources::LevelDescription>
+      descriptions;  ///< of all levels that the build can see
 };
 
 /// Looks at the file again. \throws orin::Exception  the file cannot be opened
-LevelState LookAtLevels(const BuildPlan& plan, const BuildOptions& options, const std::string& file);
+LevelState LookAtLevels(const BuildPlan& plan, const BuildOptions& options,
+                        const std::string& file);
 
 }  // namespace orin::app

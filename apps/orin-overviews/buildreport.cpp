@@ -36,13 +36,13 @@ std::string PlaceText(const datasources::LevelDescription& level) {
 }
 
 std::string KeptText(const BuildPlan& plan) {
-  return FormatString(_("levels %s exist and are up to date"), JoinNumbers(plan.kept).c_str());
+  return FormatString(_("already up to date: %s"), JoinNumbers(plan.kept).c_str());
 }
 
-/// "Levels 2, 4 are finished; 8 is not." as far as there are such levels.
+/// "Levels finished: 2, 4; still to do: 8." as far as there are such levels.
 std::string StateText(const LevelState& state) {
   if (state.valid.empty())
-    return FormatString(_("No level is finished, %s still to do."),
+    return FormatString(_("Levels finished: none; still to do: %s."),
                         JoinNumbers(state.unfinished).c_str());
   if (state.unfinished.empty())
     return FormatString(_("Levels finished: %s."), JoinNumbers(state.valid).c_str());
@@ -53,6 +53,13 @@ std::string StateText(const LevelState& state) {
 std::string ContinueText(const BuildOptions& options) {
   return options.force ? _("The same command without --force continues there.")
                        : _("The same command continues there.");
+}
+
+/// After a failure, which comes back unless its cause goes.
+std::string RetryText(const BuildOptions& options) {
+  return options.force
+             ? _("When the cause is removed, the same command without --force continues there.")
+             : _("When the cause is removed, the same command continues there.");
 }
 
 }  // namespace
@@ -76,7 +83,7 @@ std::string SummaryText(const BuildPlan& plan, const LevelState& state) {
   if (built.empty()) return NothingToDoText(plan);
   const auto level = std::find_if(state.descriptions.begin(), state.descriptions.end(),
                                   [&](const auto& l) { return l.level == built.front(); });
-  std::string text = FormatString(_("levels %s built (%s) %s"), JoinNumbers(built).c_str(),
+  std::string text = FormatString(_("levels built: %s (%s, %s)"), JoinNumbers(built).c_str(),
                                   level->method.c_str(), PlaceText(*level).c_str());
   if (!plan.kept.empty()) text += "; " + KeptText(plan);
   return text;
@@ -85,13 +92,25 @@ std::string SummaryText(const BuildPlan& plan, const LevelState& state) {
 std::string NothingToDoText(const BuildPlan& plan) {
   if (plan.channels.empty())
     return _("nothing to do: all channels are masks of one bit, which have no levels");
-  if (!plan.kept.empty()) return FormatString(_("nothing to do: %s"), KeptText(plan).c_str());
+  if (!plan.kept.empty()) return FormatString(_("nothing to do; %s"), KeptText(plan).c_str());
+  if (!plan.building.empty())
+    return _("nothing to do: every level asked for is larger than the image");
   return FormatString(_("nothing to do: %u x %u pixels need no levels"), plan.width, plan.height);
 }
 
 std::string LeftOutText(const BuildPlan& plan, unsigned level) {
   return FormatString(_("level %u is left out: of %u x %u pixels nothing would remain."), level,
                       plan.width, plan.height);
+}
+
+std::string HiddenLevelsText(const LevelState& state) {
+  const auto stands = [&](datasources::LevelPlace place) {
+    return std::any_of(state.descriptions.begin(), state.descriptions.end(),
+                       [&](const auto& level) { return level.place == place; });
+  };
+  if (!stands(datasources::LevelPlace::kInternal) || !stands(datasources::LevelPlace::kSideCar))
+    return "";
+  return _("many programs see only the levels inside the file when there are some beside it too.");
 }
 
 std::string InterruptedText(const LevelState& state, const BuildOptions& options) {
@@ -110,7 +129,7 @@ std::string AdviceAfterFailure(unsigned line, const LevelState& state,
     case kComplexNotSupported:
       return _("Use --method nearest or --method average.");
     case kRunFailed:
-      return state.unfinished.empty() ? "" : StateText(state) + " " + ContinueText(options);
+      return state.unfinished.empty() ? "" : StateText(state) + " " + RetryText(options);
     default:
       return "";
   }

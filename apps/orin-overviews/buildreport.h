@@ -16,9 +16,12 @@ std::string SummaryText(const BuildPlan& plan, const LevelState& state);
 std::string NothingToDoText(const BuildPlan& plan);
 /// Why a level larger than the image is not built.
 std::string LeftOutText(const BuildPlan& plan, unsigned level);
+/// What to know of levels in both places; empty when they stand in one.
+std::string HiddenLevelsText(const LevelState& state);
 std::string InterruptedText(const LevelState& state, const BuildOptions& options);
 
-/// What to do after the run warned at `line` of its source; 0: it did not. Empty when the warning says all.
+/// What to do after the run warned at `line` of its source; 0: it did not. Empty when the warning
+/// says all.
 std::string AdviceAfterFailure(unsigned line, const LevelState& state, const BuildOptions& options);
 ExitCode CodeOfWarning(unsigned line);
 

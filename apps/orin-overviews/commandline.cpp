@@ -1,9 +1,9 @@
 // SPDX-License-Identifier: MIT
 #include "apps/orin-overviews/commandline.h"
 
+#include <fmt/core.h>
 #include <CLI/Config.hpp>
 #include <CLI/Formatter.hpp>
-#include <fmt/core.h>
 
 #include "apps/orin-overviews/exitcode.h"
 #include "host/services/text.h"
@@ -62,7 +62,8 @@ std::optional<int> ParseCommandLine(int argc, const char* const* argv, Invocatio
   app.require_subcommand(1);
   app.fallthrough();  // the program's own options may follow the sub-command's name
   app.add_flag("--verbose", invocation.verbose, _("Report events too"));
-  app.add_option("--log-file", invocation.logFile, _("Append every message, with its time, to a file"))
+  app.add_option("--log-file", invocation.logFile,
+                 _("Append every message, with its time, to a file"))
       ->type_name(_("FILE"));
   CLI::App* build = AddBuildCommand(app, invocation.build);
   CLI::App* info = AddInfoCommand(app, invocation.info);

@@ -21,8 +21,8 @@ struct Invocation {
   InfoOptions info;
 };
 
-/// Reads the command line into `invocation`. Help and version go to standard output, a wrong usage to
-/// standard error. \returns the exit status when the program ends here
+/// Reads the command line into `invocation`. Help and version go to standard output, a wrong usage
+/// to standard error. \returns the exit status when the program ends here
 std::optional<int> ParseCommandLine(int argc, const char* const* argv, Invocation& invocation);
 
 }  // namespace orin::app

@@ -17,8 +17,8 @@ namespace orin::app {
 namespace {
 
 std::shared_ptr<spdlog::logger> Terminal() {
-  auto logger = std::make_shared<spdlog::logger>(
-      "terminal", std::make_shared<spdlog::sinks::stderr_sink_mt>());
+  auto logger = std::make_shared<spdlog::logger>("terminal",
+                                                 std::make_shared<spdlog::sinks::stderr_sink_mt>());
   logger->set_pattern("orin-overviews: %v");
   logger->set_level(spdlog::level::trace);
   return logger;
@@ -27,15 +27,16 @@ std::shared_ptr<spdlog::logger> Terminal() {
 std::shared_ptr<spdlog::logger> LogFile(const std::string& path) {
   if (path.empty()) return nullptr;
   try {
-    auto logger =
-        std::make_shared<spdlog::logger>("log", std::make_shared<spdlog::sinks::basic_file_sink_mt>(path));
+    auto logger = std::make_shared<spdlog::logger>(
+        "log", std::make_shared<spdlog::sinks::basic_file_sink_mt>(path));
     logger->set_pattern("%Y-%m-%dT%H:%M:%S.%e%z %l: %v");
     logger->set_level(spdlog::level::trace);
     logger->flush_on(spdlog::level::trace);
     return logger;
   } catch (const spdlog::spdlog_ex& error) {
-    throw Exception(FormatString(_("%s: the log file cannot be written: %s."), path.c_str(), error.what()),
-                    "apps/orin-overviews/console", "orin::app::Console::Console(const Settings&)", 0);
+    throw Exception(
+        FormatString(_("%s: the log file cannot be written: %s."), path.c_str(), error.what()),
+        "apps/orin-overviews/console", "orin::app::Console::Console(const Settings&)", 0);
   }
 }
 
@@ -71,17 +72,13 @@ void Console::Result(const std::string& text) {
   Say(spdlog::level::info, false, text);
 }
 
-void Console::Notice(const std::string& text) {
-  Say(spdlog::level::info, !settings_.quiet, text);
-}
+void Console::Notice(const std::string& text) { Say(spdlog::level::info, !settings_.quiet, text); }
 
 void Console::Warning(const std::string& text) { Say(spdlog::level::warn, true, text); }
 
 void Console::Error(const std::string& text) { Say(spdlog::level::err, true, text); }
 
-void Console::Event(const std::string& text) {
-  Say(spdlog::level::debug, settings_.verbose, text);
-}
+void Console::Event(const std::string& text) { Say(spdlog::level::debug, settings_.verbose, text); }
 
 LibraryReports::LibraryReports(Console& console) {
   tarn::Warning::SetSink([&](const tarn::Report& report) { console.Warning(report.message); });

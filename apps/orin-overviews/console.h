@@ -1,4 +1,5 @@
-/// What the tool says: results to standard output, everything else to standard error, all to a log file.
+/// What the tool says: results to standard output, everything else to standard error, all to a log
+/// file.
 // SPDX-License-Identifier: MIT
 #pragma once
 

@@ -22,16 +22,15 @@ size_t LengthOf(const std::string& text) {
       std::count_if(text.begin(), text.end(), [](char c) { return (c & 0xC0) != 0x80; }));
 }
 
+/// "uint8", or all types in order when they differ.
 std::string TypesText(const std::vector<gobs::DataType>& channels) {
+  const bool same = std::all_of(channels.begin(), channels.end(), [&](const gobs::DataType& type) {
+    return type == channels.front();
+  });
+  if (same) return channels.empty() ? "-" : TypeName(channels.front());
   std::string text;
-  for (const gobs::DataType& type : channels) {
-    const std::string name = TypeName(type);
-    if (text == name) continue;
-    text += (text.empty() ? "" : ", ") + name;
-  }
-  const bool same = std::all_of(channels.begin(), channels.end(),
-                                [&](const gobs::DataType& type) { return type == channels.front(); });
-  return same && !channels.empty() ? TypeName(channels.front()) : text;
+  for (const gobs::DataType& type : channels) text += (text.empty() ? "" : ", ") + TypeName(type);
+  return text;
 }
 
 std::string PlaceText(const LevelDescription& level) {
@@ -79,9 +78,9 @@ std::string TextOf(const std::vector<Row>& rows) {
 }  // namespace
 
 std::string TableOf(const RasterInfo& info) {
-  std::string text = FormatString(
-      _("%s: %u x %u pixels, %zu channels of %s, %s\n"), info.file.c_str(), info.width, info.height,
-      info.channels.size(), TypesText(info.channels).c_str(), info.formatDescription.c_str());
+  std::string text = FormatString(_("%s: %u x %u pixels, channels: %zu (%s), %s\n"),
+                                  info.file.c_str(), info.width, info.height, info.channels.size(),
+                                  TypesText(info.channels).c_str(), info.formatDescription.c_str());
   if (info.levels.empty()) return text + _("no overview levels\n");
   std::vector<Row> rows = {
       {_("level"), _("size"), _("place"), _("method"), _("from"), _("valid"), _("program")}};

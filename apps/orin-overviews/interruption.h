@@ -7,8 +7,8 @@
 
 namespace orin::app {
 
-/// While it lives, SIGINT, SIGTERM and SIGHUP are noted instead of ending the process, however often they
-/// come. A signal that was ignored before stays ignored. One object at a time.
+/// While it lives, SIGINT, SIGTERM and SIGHUP are noted instead of ending the process, however
+/// often they come. A signal that was ignored before stays ignored. One object at a time.
 class Interruption {
  public:
   Interruption();

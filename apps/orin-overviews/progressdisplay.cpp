@@ -42,7 +42,8 @@ std::string ShortName(const std::string& file) {
 
 unsigned TerminalColumns() {
   winsize size = {};
-  return ioctl(STDERR_FILENO, TIOCGWINSZ, &size) == 0 && size.ws_col > 0 ? size.ws_col : kUsualColumns;
+  return ioctl(STDERR_FILENO, TIOCGWINSZ, &size) == 0 && size.ws_col > 0 ? size.ws_col
+                                                                         : kUsualColumns;
 }
 
 class Bar final : public ProgressDisplay {
@@ -112,7 +113,8 @@ std::unique_ptr<ProgressDisplay> MakeProgressDisplay(Console& console, const std
   return std::make_unique<Lines>(console, file);
 }
 
-std::string ProgressLine(const std::string& file, unsigned level, double overall, unsigned columns) {
+std::string ProgressLine(const std::string& file, unsigned level, double overall,
+                         unsigned columns) {
   constexpr size_t kLeastBar = 5;
   const std::string percent = FormatString("%3d%%", static_cast<int>(overall * 100));
   const std::string label = FormatString(_("%s: level %u"), ShortName(file).c_str(), level);

@@ -38,8 +38,7 @@ double ProgressModel::Overall(double fraction) {
   if (!HasLevel()) return overall_;
   const double part = LevelFraction(fraction);
   const bool complete = started_ == levels_.size() && part == 1.0;
-  const double now =
-      complete ? 1.0 : (costBefore_ + CostOf(CurrentLevel()) * part) / costOfBuilt_;
+  const double now = complete ? 1.0 : (costBefore_ + CostOf(CurrentLevel()) * part) / costOfBuilt_;
   overall_ = std::clamp(now, overall_, 1.0);
   return overall_;
 }

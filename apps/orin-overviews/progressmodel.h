@@ -27,8 +27,8 @@ class ProgressModel {
   /// The next level begins. \param done  the fraction that the run reports with it
   void StartLevel(double done);
 
-  /// The fraction of the whole run, 0.0 to 1.0, that `fraction` means: never less than the one before,
-  /// and 1.0 only when the last level is complete.
+  /// The fraction of the whole run, 0.0 to 1.0, that `fraction` means: never less than the one
+  /// before, and 1.0 only when the last level is complete.
   double Overall(double fraction);
 
   bool HasLevel() const { return started_ > 0; }
@@ -40,11 +40,11 @@ class ProgressModel {
 
   std::vector<PlannedLevel> levels_;  ///< those that are built
   LevelReport report_;
-  double costOfAll_ = 0;    ///< as the run counts it: what it leaves out included
+  double costOfAll_ = 0;  ///< as the run counts it: what it leaves out included
   double costOfBuilt_ = 0;
-  double costBefore_ = 0;   ///< of the levels before the current one
+  double costBefore_ = 0;  ///< of the levels before the current one
   size_t started_ = 0;
-  double done_ = 0;         ///< where the current level began, as the run counts
+  double done_ = 0;  ///< where the current level began, as the run counts
   double overall_ = 0;
 };
 

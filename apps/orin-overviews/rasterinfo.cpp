@@ -18,7 +18,8 @@ RasterInfo CollectInfo(const std::string& file) {
   auto* raster = dynamic_cast<datasources::IRasterDataset*>(dataset.get());
   if (!raster)
     throw Exception(FormatString(_("%s: holds no raster."), file.c_str()),
-                    "apps/orin-overviews/rasterinfo", "orin::app::CollectInfo(const std::string&)", 0);
+                    "apps/orin-overviews/rasterinfo", "orin::app::CollectInfo(const std::string&)",
+                    0);
   RasterInfo info;
   info.file = file;
   if (const ZMBInfo_s* format = ZMBGetFormatInfo(raster->GetFileFormatCode())) {

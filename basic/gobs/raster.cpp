@@ -2,14 +2,12 @@
 #include "basic/gobs/raster.h"
 
 #include <limits>
-#include <new>
 
+#include "basic/gobs/blockmemory.h"
 #include "host/services/exception.h"
 
 namespace orin::gobs {
 namespace {
-
-constexpr std::align_val_t kAlignment{64};  // one cache line, the widest vector load
 
 RasterContext ContextOf(const RasterInfo& info, const parallelio::ProcessWindow& window) {
   const uint64_t stride = uint64_t{info.width} + 2 * uint64_t{window.marginX};
@@ -39,7 +37,7 @@ RasterContext ContextOf(const RasterInfo& info, const parallelio::ProcessWindow&
 
 Raster::Raster(const RasterInfo& info, const parallelio::ProcessWindow& window)
     : RasterInfo(info), RasterContext(ContextOf(info, window)) {
-  data = static_cast<uint8_t*>(::operator new(byteSize, kAlignment));
+  data = static_cast<uint8_t*>(AllocateBlock(byteSize));
   ownsData = true;
 }
 
@@ -49,7 +47,7 @@ Raster::Raster(const RasterInfo& info, const parallelio::ProcessWindow& window, 
 }
 
 Raster::~Raster() {
-  if (ownsData) ::operator delete(data, kAlignment);
+  if (ownsData) ReleaseBlock(data, byteSize);
 }
 
 }  // namespace orin::gobs

@@ -42,40 +42,52 @@ uint64_t FixedEdge(const Scale& scale) {
   return RoundUp(edge, scale.Step());
 }
 
-/// Output pixels of a block whose input and output together hold `budget` pixels.
-uint64_t OutputPixels(const Scale& scale, const IRasterReader& reader, unsigned budget) {
-  const double area = scale.Ratio() * scale.Ratio();
-  // The budget counts components; a complex sample holds two.
-  const double pixels = double(budget) / ComponentsPerSample(reader.GetDataType());
-  return std::max<uint64_t>(1, uint64_t(pixels * area / (area + 1)));
-}
-
-/// The largest size of at most `limit`, in tiles when it reaches one, else in steps; never 0.
-uint64_t Fit(uint64_t limit, uint64_t tile, uint64_t step) {
-  const uint64_t unit = std::lcm(tile, step);
-  return limit >= unit ? RoundDown(limit, unit) : std::max(RoundDown(limit, step), step);
-}
-
 struct Size {
   uint64_t width;
   uint64_t height;
 };
 
-Size FitBlock(const IRasterReader& reader, const IRasterReader& writer, const Scale& scale,
-              uint64_t pixels) {
-  const uint64_t step = scale.Step();
-  const uint64_t wholeWidth = RoundUp(writer.GetWidth(), step);
-  const uint64_t wholeHeight = RoundUp(writer.GetHeight(), step);
+/// The largest size of at most `limit`: whole tiles when it reaches one; never 0.
+uint64_t Fit(uint64_t limit, uint64_t tile) {
+  return limit >= tile ? RoundDown(limit, tile) : std::max<uint64_t>(limit, 1);
+}
+
+/// A block of at most `pixels` output pixels that suits the tiles.
+Size FitBlock(const IRasterReader& reader, const IRasterReader& writer, uint64_t pixels) {
+  const uint64_t width = std::max(writer.GetWidth(), 1u);
+  const uint64_t height = std::max(writer.GetHeight(), 1u);
   const uint64_t tileWidth = std::max(writer.GetTileWidth(), 1u);
   const uint64_t tileHeight = std::max(writer.GetTileHeight(), 1u);
   const bool strips = reader.GetTileWidth() >= reader.GetWidth();
-  const bool rowOfTilesFits = wholeWidth * std::min(tileHeight, wholeHeight) <= pixels;
-  const bool rowFits = wholeWidth * step <= pixels;
-  if (rowOfTilesFits || (strips && rowFits))
-    return {wholeWidth, std::min(wholeHeight, Fit(pixels / wholeWidth, tileHeight, step))};
-  const uint64_t height =
-      std::min(wholeHeight, Fit(std::min(tileHeight, uint64_t(std::sqrt(double(pixels)))), tileHeight, step));
-  return {std::min(wholeWidth, Fit(pixels / height, tileWidth, step)), height};
+  const bool rowOfTilesFits = width * std::min(tileHeight, height) <= pixels;
+  if (rowOfTilesFits || (strips && width <= pixels))
+    return {width, std::min(height, Fit(pixels / width, tileHeight))};
+  const bool tileFits = std::min(tileWidth, width) * std::min(tileHeight, height) <= pixels;
+  const uint64_t edge = tileFits ? tileHeight : std::max<uint64_t>(1, uint64_t(std::sqrt(double(pixels))));
+  const uint64_t blockHeight = std::min({edge, tileHeight, height});
+  return {std::min(width, Fit(pixels / blockHeight, tileWidth)), blockHeight};
+}
+
+/// Pixels that one step takes: an output block, and its input block with the margins.
+double StepPixels(const IRasterReader& reader, const Scale& scale, const Size& block) {
+  const double inputWidth = double(block.width) / scale.Ratio() + 2.0 * reader.GetMarginX();
+  const double inputHeight = double(block.height) / scale.Ratio() + 2.0 * reader.GetMarginY();
+  return double(block.width) * double(block.height) + inputWidth * inputHeight;
+}
+
+/// The block whose step stays within `budget` pixels; a single pixel when nothing does.
+Size BlockWithin(unsigned budget, const IRasterReader& reader, const IRasterReader& writer,
+                 const Scale& scale) {
+  // The budget counts components; a complex sample holds two.
+  const double limit = double(budget) / ComponentsPerSample(reader.GetDataType());
+  const double area = scale.Ratio() * scale.Ratio();
+  auto pixels = std::max<uint64_t>(1, uint64_t(limit * area / (area + 1)));
+  Size block = FitBlock(reader, writer, pixels);
+  while (pixels > 1 && StepPixels(reader, scale, block) > limit) {
+    pixels = std::max<uint64_t>(1, pixels * 7 / 8);
+    block = FitBlock(reader, writer, pixels);
+  }
+  return block;
 }
 
 }  // namespace
@@ -86,7 +98,7 @@ void FindOptimalRasterSize(orin::datasources::IRasterReader* reader,
                            const orin::parallelio::ProcessWindow& /*window*/) {
   const Scale scale{std::max(reader->GetLevel(), 1u), std::max(writer->GetLevel(), 1u)};
   const bool exact = IsExact(scale, std::max(writer->GetWidth(), writer->GetHeight()));
-  const Size block = exact ? FitBlock(*reader, *writer, scale, OutputPixels(scale, *reader, pixelBudget))
+  const Size block = exact ? BlockWithin(pixelBudget, *reader, *writer, scale)
                            : Size{FixedEdge(scale), FixedEdge(scale)};
   width = static_cast<unsigned>(std::max<uint64_t>(1, block.width));
   height = static_cast<unsigned>(std::max<uint64_t>(1, block.height));

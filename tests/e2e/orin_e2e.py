@@ -72,7 +72,8 @@ def read_pixels(path, level_index=None):
 
 def overview_sizes(path):
     """(columns, rows) of the overviews that GDAL lists."""
-    band = gdal.Open(str(path)).GetRasterBand(1)
+    dataset = gdal.Open(str(path))  # has to outlive its bands
+    band = dataset.GetRasterBand(1)
     return [(band.GetOverview(i).XSize, band.GetOverview(i).YSize)
             for i in range(band.GetOverviewCount())]
 

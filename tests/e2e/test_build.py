@@ -3,7 +3,7 @@
 
 import itertools
 import os
-import stat
+import pathlib
 import subprocess
 import unittest
 
@@ -137,8 +137,8 @@ class NoData(Case):
         write_tiff(file, pixels, "Int16", no_data=-9999)
         self.assertRan(run("build", file, "--levels", "2"))
         self.assertSamePixels(nearest(pixels, 1, 2, (420, 300)), read_pixels(file, 0))
-        band = gdal.Open(file).GetRasterBand(1).GetOverview(0)
-        self.assertEqual(-9999, band.GetNoDataValue())
+        dataset = gdal.Open(file)
+        self.assertEqual(-9999, dataset.GetRasterBand(1).GetOverview(0).GetNoDataValue())
 
 
 class Placement(Case):
@@ -146,13 +146,11 @@ class Placement(Case):
         file = self.path("locked.tif")
         pixels = random_pixels((1, 600, 600), numpy.uint8, 3)
         write_tiff(file, pixels, "Byte")
-        os.chmod(file, stat.S_IRUSR)
-        if os.access(file, os.W_OK):
-            # The superuser writes to anything: make the open itself fail instead.
-            if subprocess.run(["chattr", "+i", file], capture_output=True).returncode != 0:
-                self.skipTest("running as superuser on a file system without immutable files")
-            self.addCleanup(subprocess.run, ["chattr", "-i", file])
-        self.assertRan(run("build", file, "--levels", "2"))
+        os.chmod(file, 0o444)
+        os.chmod(self.folder, 0o777)
+        # The superuser may write to anything, so the tool runs as somebody else then.
+        somebody = {"user": 65534} if os.geteuid() == 0 else {}
+        self.assertRan(run("build", file, "--levels", "2", **somebody))
         self.assertTrue(os.path.exists(file + ".ovr"))
         self.assertSamePixels(nearest(pixels, 1, 2, (600, 600)), read_pixels(file, 0))
 
@@ -160,10 +158,10 @@ class Placement(Case):
         file = self.path("again.tif")
         write_tiff(file, random_pixels((1, 600, 600), numpy.uint8, 3), "Byte")
         self.assertRan(run("build", file))
-        before = open(file, "rb").read()
+        before = pathlib.Path(file).read_bytes()
         stamp = os.stat(file).st_mtime_ns
         self.assertRan(run("build", file))
-        self.assertEqual(before, open(file, "rb").read())
+        self.assertEqual(before, pathlib.Path(file).read_bytes())
         self.assertEqual(stamp, os.stat(file).st_mtime_ns)
 
 

@@ -1,4 +1,4 @@
-/// One fault of each kind that the sanitizers must find, chosen by name; `none` does the same soundly.
+/// One fault of each kind that the sanitizers must find, by name; `none` does the same soundly.
 // SPDX-License-Identifier: MIT
 #include <cstdio>
 #include <limits>

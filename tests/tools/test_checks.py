@@ -16,7 +16,8 @@ class Tree(unittest.TestCase):
         self.addCleanup(folder.cleanup)
         self.root = pathlib.Path(folder.name)
         self.write("host/services/text.h", HEAD)
-        self.write("basic/gobs/raster.h", HEAD + '#include "host/services/text.h"\n#include <vector>\n')
+        self.write("basic/gobs/raster.h",
+                   HEAD + '#include "host/services/text.h"\n#include <vector>\n')
 
     def write(self, name, text):
         path = self.root / name
@@ -24,7 +25,8 @@ class Tree(unittest.TestCase):
         path.write_text(text)
 
     def run_check(self, script):
-        done = subprocess.run([SCRIPTS / script, self.root], capture_output=True, text=True, check=False)
+        done = subprocess.run([SCRIPTS / script, self.root],
+                              capture_output=True, text=True, check=False)
         self.assertEqual("", done.stderr)
         return done.returncode, done.stdout
 

@@ -18,15 +18,20 @@ constexpr Table kLuminance = {16,  11, 12, 14,  12,  10,  16,  14,  13, 14,  18,
                               68,  87, 69, 55,  56,  80,  109, 81,  87, 95,  98,  103, 104,
                               103, 62, 77, 113, 121, 112, 100, 120, 92, 101, 103, 99};
 
-/// The quantisation table 0 of the segment's payload, when it holds it in 8 bits.
+constexpr int kMostStep = 255;  // of tables in bytes; wider ones are compared as if cut off there
+
+/// The quantisation table 0 of the segment's payload, when it holds it.
 std::optional<Table> TableZero(const uint8_t* payload, size_t bytes) {
   for (size_t at = 0; at < bytes;) {
     const bool isWide = payload[at] >> 4 != 0;
     const size_t length = 1 + (isWide ? 128 : 64);
     if (bytes - at < length) return std::nullopt;
-    if (payload[at] == 0) {
+    if ((payload[at] & 0x0F) == 0) {
       Table table;
-      std::copy(payload + at + 1, payload + at + length, table.begin());
+      for (size_t i = 0; i < table.size(); ++i) {
+        const uint8_t* step = payload + at + 1 + (isWide ? 2 * i : i);
+        table[i] = std::min(isWide ? step[0] << 8 | step[1] : int{step[0]}, kMostStep);
+      }
       return table;
     }
     at += length;
@@ -50,7 +55,7 @@ long DistanceAt(int quality, const Table& table) {
   const int scale = quality < 50 ? 5000 / quality : 200 - 2 * quality;
   long distance = 0;
   for (size_t i = 0; i < table.size(); ++i)
-    distance += std::abs(table[i] - std::clamp((kLuminance[i] * scale + 50) / 100, 1, 255));
+    distance += std::abs(table[i] - std::clamp((kLuminance[i] * scale + 50) / 100, 1, kMostStep));
   return distance;
 }
 

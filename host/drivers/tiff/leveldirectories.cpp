@@ -3,6 +3,7 @@
 
 #include <algorithm>
 #include <cmath>
+#include <limits>
 
 #include "host/services/exception.h"
 
@@ -18,7 +19,7 @@ struct Range {
 Range FactorsOf(uint32_t size, uint32_t levelSize) {
   const uint64_t low =
       uint64_t{size} / (uint64_t{levelSize} + 1) + 1;  // rounding down gives levelSize
-  if (levelSize <= 1) return {low, std::max<uint64_t>(low, size)};
+  if (levelSize <= 1) return {low, std::numeric_limits<uint32_t>::max()};
   const uint64_t below = levelSize - 1;
   return {low, (size + below - 1) / below - 1};  // rounding up still gives levelSize
 }

@@ -80,7 +80,8 @@ void ReadGrid(const TiffHandle& tiff, PixelFormat& format) {
   }
   if (format.tileWidth == 0 || format.tileHeight == 0)
     RefuseLayout(tiff, _("tiles without pixels"));
-  if (format.TilesPerPlane() > std::numeric_limits<uint32_t>::max() / format.samplesPerPixel)
+  if (format.TilesPerPlane() >
+      std::numeric_limits<uint32_t>::max() / (format.planar ? format.samplesPerPixel : 1))
     RefuseLayout(tiff, _("images of more than 4294967295 tiles"));
 }
 

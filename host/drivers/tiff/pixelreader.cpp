@@ -12,11 +12,12 @@
 namespace orin::drivers {
 namespace {
 
-constexpr uint64_t kLongStrip = uint64_t{16} << 20;    // bytes; a longer one is decoded in bands
-constexpr uint64_t kBand = uint64_t{2} << 20;          // bytes
-constexpr uint64_t kRawChunk = uint64_t{1} << 20;      // bytes of one positioned read
-constexpr uint64_t kSmallCache = uint64_t{32} << 20;   // bytes that are always granted
-constexpr uint64_t kLargeCache = uint64_t{256} << 20;  // bytes that strips may take
+constexpr uint64_t kLongStrip = uint64_t{16} << 20;   // bytes; a longer one is decoded in bands
+constexpr uint64_t kBand = uint64_t{2} << 20;         // bytes
+constexpr uint64_t kRawChunk = uint64_t{1} << 20;     // bytes of one positioned read
+constexpr uint64_t kSmallCache = uint64_t{32} << 20;  // bytes that are always granted
+constexpr double kStripCache = 256 << 20;             // bytes that strips may take
+constexpr double kTileCache = 1 << 30;                // bytes that tiles may take
 
 uint32_t BandRows(const TileDecoder& decoder) {
   const PixelFormat& format = decoder.Format();
@@ -32,6 +33,20 @@ gobs::RasterInfo ByteInfo(const gobs::Raster& block) {
   return {block.width, block.height, block.channelCount, bits ? gobs::eDT_8U : block.dataType};
 }
 
+/// Bytes of what is decoded together; a hostile product stands as more than can be decoded.
+uint64_t UnitBytes(const PixelFormat& format, uint32_t rows) {
+  constexpr uint64_t kTooMany = uint64_t{1} << 40;
+  return format.TileRowBytes() > kTooMany / rows ? kTooMany : format.TileRowBytes() * rows;
+}
+
+/// Along one axis: the unit lies inside the block and no neighbouring block's margin reaches it.
+bool IsInner(int64_t first, int64_t count, int64_t blockFirst, int64_t blockCount, int64_t margin,
+             int64_t size) {
+  const int64_t low = blockFirst == 0 ? 0 : blockFirst + margin;
+  const int64_t high = blockFirst + blockCount >= size ? size : blockFirst + blockCount - margin;
+  return first >= low && first + count <= high;
+}
+
 }  // namespace
 
 PixelReader::PixelReader(const std::string& path, uint64_t directoryOffset,
@@ -39,7 +54,7 @@ PixelReader::PixelReader(const std::string& path, uint64_t directoryOffset,
     : decoder_(path, directoryOffset),
       bandRows_(BandRows(decoder_)),
       copy_(CopierOf(Format().SampleBytes())),
-      cache_(bandRows_ * Format().TileRowBytes()) {
+      cache_(UnitBytes(Format(), bandRows_)) {
   for (const unsigned channel : channels)
     if (channel < 1 || channel > Format().samplesPerPixel)
       FailToRead(path, FormatString(_("there is no channel %u, the file has %u"), channel,
@@ -107,27 +122,19 @@ void PixelReader::LimitCache(const datasources::InsideWindow& window) {
   if (window.width <= 0 || window.height <= 0) return;
   const PixelFormat& format = Format();
   const auto touched = [](int64_t first, int64_t count, int64_t size) {
-    return uint64_t((first + count - 1) / size - first / size + 1);
+    return double((first + count - 1) / size - first / size + 1);
   };
-  const uint64_t unitRowBytes = touched(window.x, window.width, format.tileWidth) * planes_.size() *
-                                format.TileRowBytes() * bandRows_;
-  const uint64_t rows = format.tiled ? 2 : touched(window.y, window.height, bandRows_) + 1;
-  const uint64_t wanted =
-      format.tiled ? rows * unitRowBytes : std::min(rows * unitRowBytes, kLargeCache);
-  cache_.SetLimit(std::max(kSmallCache, wanted));
+  const double unitRowBytes = touched(window.x, window.width, format.tileWidth) *
+                              double(planes_.size()) * double(UnitBytes(format, bandRows_));
+  const double rows = format.tiled ? 2 : touched(window.y, window.height, bandRows_) + 1;
+  const double most = format.tiled ? kTileCache : kStripCache;
+  cache_.SetLimit(std::max(kSmallCache, uint64_t(std::min(rows * unitRowBytes, most))));
 }
 
 void PixelReader::ReadUnit(const Unit& unit, const Piece& piece, gobs::Raster& block) {
-  // Neighbouring blocks ask again for what lies within a margin of the block's border.
-  const auto isInner = [](int64_t first, int64_t count, int64_t blockFirst, int64_t blockCount,
-                          int64_t margin, int64_t size) {
-    const int64_t low = blockFirst == 0 ? 0 : blockFirst + margin;
-    const int64_t high = blockFirst + blockCount >= size ? size : blockFirst + blockCount - margin;
-    return first >= low && first + count <= high;
-  };
   const bool keep =
-      !isInner(unit.x, unit.width, block.x, block.width, block.marginX, Format().width) ||
-      !isInner(unit.y, unit.rows, block.y, block.height, block.marginY, Format().height);
+      !IsInner(unit.x, unit.width, block.x, block.width, block.marginX, Format().width) ||
+      !IsInner(unit.y, unit.rows, block.y, block.height, block.marginY, Format().height);
   const uint64_t pixelBytes = uint64_t{Format().TileSamples()} * Format().SampleBytes();
   for (size_t i = 0; i < planes_.size(); ++i) {
     const Plane& plane = planes_[i];

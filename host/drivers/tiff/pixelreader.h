@@ -35,7 +35,7 @@ class PixelReader {
   void Read(gobs::Raster& block);
 
   /// One tile or strip with all samples that it interleaves, whatever the channels.
-  /// \param samples  receives tileHeight x Format().TileRowBytes() bytes; rows below the image are 0
+  /// \param samples  receives tileHeight x TileRowBytes() bytes; rows below the image are 0
   /// \throws orin::Exception  it cannot be read
   void ReadTile(uint32_t tile, uint8_t* samples) { decoder_.Decode(tile, samples); }
 

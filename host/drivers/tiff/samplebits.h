@@ -7,8 +7,9 @@
 namespace orin::drivers {
 
 /// Spreads `count` packed samples. One call a row: packed rows start at a byte boundary.
-/// \param packed          most significant bit first; 24-bit samples are three bytes in the machine's
-///                        order, because libtiff treats them as numbers, not as a string of bits
+/// \param packed          most significant bit first; 24-bit samples are three bytes in the
+///                        machine's order, because libtiff treats them as numbers, not as a string
+///                        of bits
 /// \param bits            of a packed sample, 1 to 31
 /// \param isSigned        the samples are in two's complement: the sign is extended
 /// \param bytesPerSample  of `samples`: 1, 2 or 4, and at least `bits` wide

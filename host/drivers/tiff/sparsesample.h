@@ -11,7 +11,7 @@
 namespace orin::drivers {
 
 /// The bytes of one sample, imaginary part 0.
-/// \param noData  decimal text, "nan" and "inf" included; a number that the type cannot hold counts as 0
+/// \param noData  decimal text, "nan" and "inf" included; what the type cannot hold counts as 0
 std::vector<uint8_t> SparseSample(const std::string& noData, const gobs::DataType& type);
 
 }  // namespace orin::drivers

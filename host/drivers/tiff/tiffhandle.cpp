@@ -47,6 +47,7 @@ bool IsText(TIFFDataType type) {
 }  // namespace
 
 void FailToRead(const std::string& path, std::string reason) {
+  if (reason.starts_with(path + ": ")) reason.erase(0, path.size() + 2);  // libtiff names it too
   while (!reason.empty() && (reason.back() == '.' || reason.back() == '\n')) reason.pop_back();
   throw Exception(FormatString(_("%s: cannot be read: %s."), path.c_str(),
                                reason.empty() ? _("the file is damaged") : reason.c_str()),

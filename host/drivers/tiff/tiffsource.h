@@ -15,8 +15,8 @@ namespace orin::drivers {
 
 class TiffSource final : public datasources::IRasterSource {
  public:
-  /// \throws orin::Exception  not a TIFF file, its layout is not supported, or for kUpdate: it cannot be
-  ///                          opened for writing
+  /// \throws orin::Exception  not a TIFF file, its layout is not supported, or for kUpdate: it
+  ///                          cannot be opened for writing
   TiffSource(std::string file, datasources::AccessMode access);
   ~TiffSource() override;
 

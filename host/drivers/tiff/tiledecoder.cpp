@@ -131,16 +131,27 @@ void TileDecoder::DecodeStored(uint32_t tile, uint32_t rows, uint8_t* samples) {
 
 void TileDecoder::DecodeRows(uint32_t strip, uint32_t firstRow, uint32_t count, uint8_t* samples) {
   RequireDecodable(strip, count);
-  const auto plane = static_cast<uint16_t>(strip / format_.TilesPerPlane());
-  const uint64_t stripRow = strip % format_.TilesPerPlane() * format_.tileHeight;
-  tiff_.ClearErrors();
+  if (strip != openStrip_ || firstRow < nextRow_) nextRow_ = 0;
+  openStrip_ = strip;
+  while (nextRow_ < firstRow) DecodeRow(samples);  // no codec skips rows; this one is overwritten
   for (uint32_t row = 0; row < count; ++row, samples += format_.TileRowBytes()) {
-    uint8_t* target = StoredRows(storedRowBytes_, samples);
-    const auto imageRow = static_cast<uint32_t>(stripRow + firstRow + row);
-    if (TIFFReadScanline(tiff_.Get(), target, imageRow, plane) != 1 || !tiff_.FirstError().empty())
-      Fail(strip, tiff_.FirstError());
-    Deliver(target, 1, samples);
+    const uint8_t* stored = DecodeRow(samples);
+    Deliver(stored, 1, samples);
   }
+}
+
+/// Decodes the open strip's next row. \returns where libtiff put it, which is `samples` if it can
+/// be
+const uint8_t* TileDecoder::DecodeRow(uint8_t* samples) {
+  const auto plane = static_cast<uint16_t>(openStrip_ / format_.TilesPerPlane());
+  const uint64_t stripRow = openStrip_ % format_.TilesPerPlane() * format_.tileHeight;
+  uint8_t* target = StoredRows(storedRowBytes_, samples);
+  const auto row = static_cast<uint32_t>(stripRow + nextRow_++);
+  tiff_.ClearErrors();
+  const bool decoded = TIFFReadScanline(tiff_.Get(), target, row, plane) == 1;
+  if (decoded && tiff_.FirstError().empty()) return target;
+  nextRow_ = UINT32_MAX;  // start afresh
+  Fail(openStrip_, tiff_.FirstError());
 }
 
 void TileDecoder::Deliver(const uint8_t* stored, uint64_t rows, uint8_t* samples) const {

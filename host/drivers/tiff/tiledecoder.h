@@ -50,6 +50,7 @@ class TileDecoder {
 
  private:
   void DecodeStored(uint32_t tile, uint32_t rows, uint8_t* samples);
+  const uint8_t* DecodeRow(uint8_t* samples);
   uint8_t* StoredRows(uint64_t bytes, uint8_t* samples);
   void Deliver(const uint8_t* stored, uint64_t rows, uint8_t* samples) const;
   [[noreturn]] void Fail(uint32_t tile, const std::string& reason) const;
@@ -61,6 +62,8 @@ class TileDecoder {
   std::vector<uint8_t> sparseSample_;
   std::unique_ptr<uint8_t[]> stored_;  ///< libtiff's rows, where they are not delivered rows
   uint64_t storedCapacity_ = 0;
+  uint32_t openStrip_ = UINT32_MAX;  ///< the strip that is decoded row by row
+  uint32_t nextRow_ = 0;             ///< its row that follows
 };
 
 }  // namespace orin::drivers

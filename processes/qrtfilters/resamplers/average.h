@@ -7,8 +7,8 @@
 namespace orin::resamplers {
 
 /// Takes real and complex data; a complex mean points along the samples' sum and has their mean
-/// magnitude. T is one of the pixel types. The destination's channel count decides how many channels are
-/// written; it is not compared with the source's.
+/// magnitude. T is one of the pixel types. The destination's channel count decides how many
+/// channels are written; it is not compared with the source's.
 template <class T>
 class Average final : public Resampler {
  public:
@@ -19,10 +19,10 @@ class Average final : public Resampler {
   void Resample(gobs::Raster* src, gobs::Mask* srcMask, gobs::Raster* dst) override;
 
   /// Any ratio and any number of channels. Where `srcMask` has the footprint's centre clear, or the
-  /// footprint is empty, the pixel gets the no-data value; for another pixel that is clear, the centre
-  /// stands in.
+  /// footprint is empty, the pixel gets the no-data value; for another pixel that is clear, the
+  /// centre stands in.
   /// \param ratioX, ratioY    destination size / source size; not read when georeferenced
-  /// \param offsetX, offsetY  destination origin - source origin, ground units; read when georeferenced
+  /// \param offsetX, offsetY  destination origin - source origin, ground units; only then read
   /// \throws orin::Exception  `src` has no margin
   void ResampleGeneral(gobs::Raster* src, gobs::Mask* srcMask, gobs::Raster* dst, double ratioX,
                        double ratioY, double offsetX, double offsetY);

@@ -15,8 +15,9 @@ struct Powers {
   double t3;
 };
 
-/// The cubic through q0 .. q3, which stand at -1, 0, 1 and 2, at the position `at`. Differences are taken
-/// in the samples' own precision, all else in double. The order of the operations decides the last bit.
+/// The cubic through q0 .. q3, which stand at -1, 0, 1 and 2, at the position `at`. Differences are
+/// taken in the samples' own precision, all else in double. The order of the operations decides the
+/// last bit.
 template <class Real>
 double Cubic(Real q0, Real q1, Real q2, Real q3, const Powers& at) {
   const double d0 = static_cast<Real>(q0 - q1);

@@ -1,4 +1,4 @@
-/// Bicubic: every destination pixel lies on the cubics through the sixteen source pixels around its centre.
+/// Bicubic: every destination pixel lies on cubics through the 16 source pixels around its centre.
 // SPDX-License-Identifier: MIT
 #pragma once
 
@@ -6,8 +6,8 @@
 
 namespace orin::resamplers {
 
-/// The cubic goes through four equally spaced samples; it may overshoot them. Samples are narrowed to
-/// single precision, whatever T. Refuses complex data. T is one of the pixel types.
+/// The cubic goes through four equally spaced samples; it may overshoot them. Samples are narrowed
+/// to single precision, whatever T. Refuses complex data. T is one of the pixel types.
 template <class T>
 class Bicubic final : public Resampler {
  public:

@@ -23,7 +23,8 @@ struct BilinearMethod {
     return {place.at, {1 - place.fraction, place.fraction}};
   }
 
-  /// The order of the operations decides the last bit: products go left to right, and so does the sum.
+  /// The order of the operations decides the last bit: products go left to right, and so does the
+  /// sum.
   static T Blend(const std::array<double, 4>& samples, const Weights& x, const Weights& y) {
     const auto& [upperLeft, lowerLeft, upperRight, lowerRight] = samples;
     return detail::Saturate<T>(upperLeft * x.before * y.before + upperRight * x.after * y.before +

@@ -1,4 +1,4 @@
-/// Bilinear: every destination pixel is interpolated between the four source pixels around its centre.
+/// Bilinear: every destination pixel is interpolated between the four source pixels at its centre.
 // SPDX-License-Identifier: MIT
 #pragma once
 
@@ -10,8 +10,8 @@ namespace orin::resamplers {
 template <class T>
 class Bilinear final : public Resampler {
  public:
-  /// Where `srcMask` has the upper left of the four clear, every channel gets the no-data value; for
-  /// another one that is clear, the upper left stands in.
+  /// Where `srcMask` has the upper left of the four clear, every channel gets the no-data value;
+  /// for another one that is clear, the upper left stands in.
   /// \throws orin::Exception  a margin of `src` is below 1, then the channel counts differ
   void Resample(gobs::Raster* src, gobs::Mask* srcMask, gobs::Raster* dst) override;
   uint32_t GetMargin() const override { return 1; }

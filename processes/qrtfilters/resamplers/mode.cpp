@@ -12,15 +12,14 @@
 namespace orin::resamplers {
 namespace {
 
-/// Deliberate: floats are equal within one fixed tolerance whatever their size, and NaN and infinities
-/// equal nothing, themselves included.
+/// Deliberate: floats are equal within one fixed tolerance whatever their size, and NaN and
+/// infinities equal nothing, themselves included.
 template <class T>
 bool SameValue(T a, T b) {
   if constexpr (std::is_floating_point_v<T>)
     return std::abs(static_cast<double>(a) - static_cast<double>(b)) <
            std::numeric_limits<double>::epsilon();
-  else
-    return a == b;
+  else return a == b;
 }
 
 template <class T>

@@ -1,4 +1,4 @@
-/// Mode: every destination pixel is the most frequent of the nine source pixels around its position.
+/// Mode: every destination pixel is the most frequent of nine source pixels around its position.
 // SPDX-License-Identifier: MIT
 #pragma once
 
@@ -10,8 +10,8 @@ namespace orin::resamplers {
 template <class T>
 class Mode final : public Resampler {
  public:
-  /// Where `srcMask` has the centre clear, every channel gets the no-data value; a clear neighbour votes
-  /// for the centre's value.
+  /// Where `srcMask` has the centre clear, every channel gets the no-data value; a clear neighbour
+  /// votes for the centre's value.
   /// \throws orin::Exception  a margin of `src` is below 1, then the channel counts differ
   void Resample(gobs::Raster* src, gobs::Mask* srcMask, gobs::Raster* dst) override;
   uint32_t GetMargin() const override { return 1; }

@@ -14,8 +14,8 @@ namespace orin::resamplers {
 namespace {
 
 /// The source pixel of a mapped coordinate, 0 .. size - 1. Deliberate: the whole part is read as an
-/// unsigned 32-bit number, so -1 and below end at the last pixel and 2^32 starts again at the first.
-/// What no 64-bit integer holds reads the first pixel.
+/// unsigned 32-bit number, so -1 and below end at the last pixel and 2^32 starts again at the
+/// first. What no 64-bit integer holds reads the first pixel.
 uint32_t SourceIndex(double coordinate, uint32_t size) {
   constexpr double kLimit = 9223372036854775808.0;
   const bool isWhole = coordinate > -kLimit && coordinate < kLimit;

@@ -47,8 +47,8 @@ class AverageExactPass {
   static constexpr uint32_t kComponents = Mean<T>::kComponents;
 
   template <class Valid, class Clamp>
-  void WritePixel(T* out, int64_t column, const std::array<int64_t, kFactor>& rows, const Valid& valid,
-                  const Clamp& clamp) const {
+  void WritePixel(T* out, int64_t column, const std::array<int64_t, kFactor>& rows,
+                  const Valid& valid, const Clamp& clamp) const {
     Mean<T> mean;
     uint64_t count = 0;
     for (int j = 0; j < kFactor; ++j)
@@ -58,10 +58,8 @@ class AverageExactPass {
         mean.Add(src_.At(x, rows[j]));
         ++count;
       }
-    if (count < RequiredSamples(kFactor))
-      std::copy(noData_.begin(), noData_.end(), out);
-    else
-      mean.Store(out, count);
+    if (count < RequiredSamples(kFactor)) std::copy(noData_.begin(), noData_.end(), out);
+    else mean.Store(out, count);
   }
 
   gobs::PixelView<const T> src_;
@@ -72,8 +70,8 @@ class AverageExactPass {
   std::array<T, kComponents> noData_;  ///< deliberate: the imaginary component of no data is 0
 };
 
-/// Reduces channel 0 of `src` into the one channel of `dst`. Rows past the last one repeat it; columns
-/// past the last one read the margin. \param srcMask  null: every pixel is valid
+/// Reduces channel 0 of `src` into the one channel of `dst`. Rows past the last one repeat it;
+/// columns past the last one read the margin. \param srcMask  null: every pixel is valid
 template <template <class> class Mean, int kFactor, class T>
 void AverageExact(const gobs::Raster& src, const gobs::Mask* srcMask, const gobs::Raster& dst,
                   double noData) {

@@ -15,8 +15,8 @@
 
 namespace orin::resamplers::detail {
 
-/// The footprints of all destination columns or rows, cut to what the source's buffer holds. The last
-/// buffer line is never read.
+/// The footprints of all destination columns or rows, cut to what the source's buffer holds. The
+/// last buffer line is never read.
 inline std::vector<Footprint> FootprintsOf(const AxisMapping& mapping, uint32_t dstSize,
                                            const BufferRange& range) {
   std::vector<Footprint> footprints(dstSize);
@@ -28,8 +28,8 @@ inline std::vector<Footprint> FootprintsOf(const AxisMapping& mapping, uint32_t 
   return footprints;
 }
 
-/// The pixel that is written for no data. Deliberate: the value goes to as many components as there are
-/// channels; the rest are 0.
+/// The pixel that is written for no data. Deliberate: the value goes to as many components as there
+/// are channels; the rest are 0.
 template <class T>
 std::vector<T> NoDataPixel(uint64_t channels, uint32_t componentsPerSample, double noData) {
   std::vector<T> pixel(channels * componentsPerSample);
@@ -41,8 +41,8 @@ std::vector<T> NoDataPixel(uint64_t channels, uint32_t componentsPerSample, doub
 template <template <class> class Mean, class T>
 class AverageFootprintsPass {
  public:
-  AverageFootprintsPass(const SourceMapping& mapping, const gobs::Raster& src, const gobs::Raster& dst,
-                        double noData)
+  AverageFootprintsPass(const SourceMapping& mapping, const gobs::Raster& src,
+                        const gobs::Raster& dst, double noData)
       : src_(gobs::ViewOf<const T>(src, kComponents)),
         dst_(gobs::ViewOf<T>(dst, kComponents)),
         channels_(dst.channelCount),
@@ -80,7 +80,8 @@ class AverageFootprintsPass {
 
   /// Deliberate: a pixel without data is not dropped, the centre takes its place.
   template <class Valid>
-  Mean<T> MeanOf(uint64_t channel, const Footprint& x, const Footprint& y, const Valid& valid) const {
+  Mean<T> MeanOf(uint64_t channel, const Footprint& x, const Footprint& y,
+                 const Valid& valid) const {
     const T* const centre = SampleAt(x.centre, y.centre, channel);
     Mean<T> mean;
     for (int64_t row = y.start; row < y.end; ++row)
@@ -106,8 +107,8 @@ class AverageFootprintsPass {
 /// Fills `dst`. \param srcMask  null: every pixel is valid
 /// \pre  `src` has a margin
 template <template <class> class Mean, class T>
-void AverageFootprints(const SourceMapping& mapping, const gobs::Raster& src, const gobs::Mask* srcMask,
-                       const gobs::Raster& dst, double noData) {
+void AverageFootprints(const SourceMapping& mapping, const gobs::Raster& src,
+                       const gobs::Mask* srcMask, const gobs::Raster& dst, double noData) {
   constexpr uint32_t kComponents = Mean<T>::kComponents;
   if (!HasSamples(src))
     return FillBlock(dst, gobs::ViewOf<T>(dst, kComponents),

@@ -35,7 +35,8 @@ struct BufferRange {
   int64_t Clamp(int64_t at) const { return std::clamp(at, first, last); }
 };
 
-/// \param size    of the useful area, \param margin  on either side of it; not both 0
+/// \param size    of the useful area; 0 only with a margin
+/// \param margin  on either side of it
 inline BufferRange RangeOf(uint32_t size, uint32_t margin) {
   return {-int64_t{margin}, int64_t{size} + int64_t{margin} - 1};
 }
@@ -78,11 +79,13 @@ struct SourceMapping {
   AxisMapping y;
 };
 
-/// Ground coordinates when the state has them, else the given ratio, else that of the blocks' sizes.
+/// Ground coordinates when the state has them, else the given ratio, else that of the blocks'
+/// sizes.
 inline SourceMapping MappingOf(const ResamplerState& state, const gobs::RasterInfo& src,
                                const gobs::RasterInfo& dst) {
-  SourceMapping mapping{{state.georeferenced, state.ratioX, 0, state.dstPixelSizeX, state.srcPixelSizeX},
-                        {state.georeferenced, state.ratioY, 0, state.dstPixelSizeY, state.srcPixelSizeY}};
+  SourceMapping mapping{
+      {state.georeferenced, state.ratioX, 0, state.dstPixelSizeX, state.srcPixelSizeX},
+      {state.georeferenced, state.ratioY, 0, state.dstPixelSizeY, state.srcPixelSizeY}};
   if (state.georeferenced) {
     mapping.x.ratio = state.dstPixelSizeX / state.srcPixelSizeX;
     mapping.y.ratio = state.dstPixelSizeY / state.srcPixelSizeY;

@@ -40,17 +40,28 @@ void CopyPixelsOf(const PixelCopy& job, Size pixelBytes) {
 
 void CopyPixels(const PixelCopy& job) {
   switch (job.src.components) {
-    case 1: return CopyPixelsOf(job, FixedSize<1>{});
-    case 2: return CopyPixelsOf(job, FixedSize<2>{});
-    case 3: return CopyPixelsOf(job, FixedSize<3>{});
-    case 4: return CopyPixelsOf(job, FixedSize<4>{});
-    case 6: return CopyPixelsOf(job, FixedSize<6>{});
-    case 8: return CopyPixelsOf(job, FixedSize<8>{});
-    case 12: return CopyPixelsOf(job, FixedSize<12>{});
-    case 16: return CopyPixelsOf(job, FixedSize<16>{});
-    case 24: return CopyPixelsOf(job, FixedSize<24>{});
-    case 32: return CopyPixelsOf(job, FixedSize<32>{});
-    default: return CopyPixelsOf(job, job.src.components);
+    case 1:
+      return CopyPixelsOf(job, FixedSize<1>{});
+    case 2:
+      return CopyPixelsOf(job, FixedSize<2>{});
+    case 3:
+      return CopyPixelsOf(job, FixedSize<3>{});
+    case 4:
+      return CopyPixelsOf(job, FixedSize<4>{});
+    case 6:
+      return CopyPixelsOf(job, FixedSize<6>{});
+    case 8:
+      return CopyPixelsOf(job, FixedSize<8>{});
+    case 12:
+      return CopyPixelsOf(job, FixedSize<12>{});
+    case 16:
+      return CopyPixelsOf(job, FixedSize<16>{});
+    case 24:
+      return CopyPixelsOf(job, FixedSize<24>{});
+    case 32:
+      return CopyPixelsOf(job, FixedSize<32>{});
+    default:
+      return CopyPixelsOf(job, job.src.components);
   }
 }
 

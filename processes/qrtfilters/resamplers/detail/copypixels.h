@@ -12,12 +12,14 @@ namespace orin::resamplers::detail {
 
 /// One block to fill: destination pixel (i, j) is a copy of source pixel (columns[i], rows[j]).
 struct PixelCopy {
-  gobs::PixelView<const uint8_t> src;  ///< `components` is the size of a pixel in bytes, as in `dst`
+  gobs::PixelView<const uint8_t>
+      src;  ///< `components` is the size of a pixel in bytes, as in `dst`
   gobs::PixelView<uint8_t> dst;
-  const gobs::Mask* srcMask;     ///< null: every pixel is valid
-  const uint8_t* noData;         ///< the pixel that is written where `srcMask` is clear
-  std::vector<uint32_t> columns; ///< inside the source's useful area, one for each destination column
-  std::vector<uint32_t> rows;    ///< likewise
+  const gobs::Mask* srcMask;  ///< null: every pixel is valid
+  const uint8_t* noData;      ///< the pixel that is written where `srcMask` is clear
+  std::vector<uint32_t>
+      columns;                 ///< inside the source's useful area, one for each destination column
+  std::vector<uint32_t> rows;  ///< likewise
 };
 
 void CopyPixels(const PixelCopy& job);

@@ -17,7 +17,8 @@ inline bool HasSamples(const gobs::RasterInfo& src) {
 
 /// Fills the useful area of `dst` with copies of `pixel`.
 template <class T>
-void FillBlock(const gobs::Raster& dst, const gobs::PixelView<T>& out, const std::vector<T>& pixel) {
+void FillBlock(const gobs::Raster& dst, const gobs::PixelView<T>& out,
+               const std::vector<T>& pixel) {
   ParallelRows(dst.height, [&](uint32_t row) {
     T* at = out.At(0, row);
     for (uint32_t column = 0; column < dst.width; ++column)

@@ -7,7 +7,8 @@
 
 #include "basic/core/typedispatch/pixeltypes.h"
 
-// A macro because an explicit instantiation cannot walk a type list; the check below keeps it the same.
+// A macro because an explicit instantiation cannot walk a type list; the check below keeps it the
+// same.
 #define ORIN_INSTANTIATE_KERNEL(Kernel)  \
   template class Kernel<signed char>;    \
   template class Kernel<unsigned char>;  \

@@ -10,8 +10,8 @@
 
 namespace orin::resamplers::detail {
 
-/// Samples of up to 16 bits are summed as integers: the sums of a whole block stay below 2^53, so that
-/// they are the same as in double. All others are rounded to double one by one.
+/// Samples of up to 16 bits are summed as integers: the sums of a whole block stay below 2^53, so
+/// that they are the same as in double. All others are rounded to double one by one.
 template <class T>
 using SumOf = std::conditional_t<std::is_integral_v<T> && sizeof(T) <= 2, int64_t, double>;
 
@@ -28,8 +28,9 @@ struct RealMean {
   }
 };
 
-/// re * re + im * im in the sample's own arithmetic. Deliberate: integers of up to 32 bits wrap round in
-/// 32 bits, the others in 64, and only unsigned 32- and 64-bit samples read the sum as unsigned.
+/// re * re + im * im in the sample's own arithmetic. Deliberate: integers of up to 32 bits wrap
+/// round in 32 bits, the others in 64, and only unsigned 32- and 64-bit samples read the sum as
+/// unsigned.
 template <class T>
 double SquaredMagnitude(T re, T im) {
   if constexpr (std::is_floating_point_v<T>) {
@@ -45,8 +46,8 @@ double SquaredMagnitude(T re, T im) {
   }
 }
 
-/// The mean of real and imaginary pairs: along their sum, with their mean magnitude. A sum of zero has no
-/// direction and gives (0, 0) in integer types, NaN in floating ones.
+/// The mean of real and imaginary pairs: along their sum, with their mean magnitude. A sum of zero
+/// has no direction and gives (0, 0) in integer types, NaN in floating ones.
 template <class T>
 struct ComplexMean {
   static constexpr uint32_t kComponents = 2;

@@ -16,7 +16,8 @@
 
 namespace orin::resamplers::detail {
 
-/// Where a destination column or row lands: the centre's source coordinate, and what blending needs.
+/// Where a destination column or row lands: the centre's source coordinate, and what blending
+/// needs.
 template <class Weights>
 struct Place {
   int32_t at;
@@ -44,7 +45,8 @@ inline Between LocateBetween(const AxisMapping& mapping, uint32_t i) {
 ///   `Sample`             what blending computes with; every sample is converted to it
 ///   `Weights`            what blending needs to know of a column or row
 ///   `Locate(mapping, i)` the `Place<Weights>` of the destination column or row i
-///   `Blend(samples, x, y)`  the pixel's value of one channel; samples[i * kSpan + j] is column i of the
+///   `Blend(samples, x, y)`  the pixel's value of one channel; samples[i * kSpan + j] is column i
+///   of the
 ///                           square, row j
 /// Pixels of the square that the buffer does not hold are read at its nearest edge.
 template <class Method, class T>
@@ -83,12 +85,12 @@ class NeighbourhoodPass {
     typename Method::Weights weights;
   };
 
-  static std::vector<Line> LinesOf(const AxisMapping& mapping, uint32_t size, const BufferRange& range) {
+  static std::vector<Line> LinesOf(const AxisMapping& mapping, uint32_t size,
+                                   const BufferRange& range) {
     std::vector<Line> lines(size);
     for (uint32_t i = 0; i < size; ++i) {
       const auto place = Method::Locate(mapping, i);
-      for (int k = 0; k < kSpan; ++k)
-        lines[i].at[k] = range.Clamp(int64_t{place.at} + k - kCentre);
+      for (int k = 0; k < kSpan; ++k) lines[i].at[k] = range.Clamp(int64_t{place.at} + k - kCentre);
       lines[i].weights = place.weights;
     }
     return lines;
@@ -109,8 +111,8 @@ class NeighbourhoodPass {
     }
   }
 
-  /// Column by column, top to bottom. Deliberate: a pixel without data is not dropped, the centre takes
-  /// its place.
+  /// Column by column, top to bottom. Deliberate: a pixel without data is not dropped, the centre
+  /// takes its place.
   template <class Valid>
   Pixels Gather(const Line& column, const Line& row, const Valid& valid) const {
     const T* const centre = src_.At(column.at[kCentre], row.at[kCentre]);

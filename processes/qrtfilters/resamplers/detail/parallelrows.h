@@ -6,8 +6,8 @@
 
 namespace orin::resamplers::detail {
 
-/// Calls `body(row)` for the rows 0 .. height - 1, split over the threads of the team into contiguous
-/// runs. Nothing happens for a height of 0.
+/// Calls `body(row)` for the rows 0 .. height - 1, split over the threads of the team into
+/// contiguous runs. Nothing happens for a height of 0.
 /// \pre  `body` throws nothing and writes its own row only
 template <class Body>
 void ParallelRows(uint32_t height, const Body& body) {

@@ -25,10 +25,13 @@ struct Shape {
 };
 
 /// Values of T that a pixel of this shape takes.
-inline uint32_t Components(const Shape& shape) { return shape.channels * (shape.isComplex ? 2 : 1); }
+inline uint32_t Components(const Shape& shape) {
+  return shape.channels * (shape.isComplex ? 2 : 1);
+}
 
 template <class T>
-std::unique_ptr<gobs::Raster> EmptyBlock(uint32_t width, uint32_t height, const Shape& shape, T fill) {
+std::unique_ptr<gobs::Raster> EmptyBlock(uint32_t width, uint32_t height, const Shape& shape,
+                                         T fill) {
   const gobs::RasterInfo info(width, height, shape.channels, gobs::DataTypeOf<T>(shape.isComplex));
   auto block = std::make_unique<gobs::Raster>(
       info, parallelio::ProcessWindow{shape.marginX, shape.marginY, 0, 0});
@@ -42,7 +45,8 @@ std::unique_ptr<gobs::Raster> BlockOf(const Picture<T>& picture, const Shape& sh
   const int64_t n = Components(shape);
   const auto height = static_cast<int64_t>(picture.size());
   const auto width = static_cast<int64_t>(picture.front().size()) / n;
-  auto block = EmptyBlock<T>(static_cast<uint32_t>(width), static_cast<uint32_t>(height), shape, T{});
+  auto block =
+      EmptyBlock<T>(static_cast<uint32_t>(width), static_cast<uint32_t>(height), shape, T{});
   const auto view = gobs::ViewOf<T>(*block, shape.isComplex ? 2 : 1);
   for (int64_t y = -int64_t{shape.marginY}; y < height + shape.marginY; ++y)
     for (int64_t x = -int64_t{shape.marginX}; x < width + shape.marginX; ++x)
@@ -66,8 +70,8 @@ Picture<T> PictureOf(const gobs::Raster& block) {
   return picture;
 }
 
-/// A mask of the geometry of `block`, drawn over the useful area: 'x' is no data, all else is valid.
-/// The margin is valid.
+/// A mask of the geometry of `block`, drawn over the useful area: 'x' is no data, all else is
+/// valid. The margin is valid.
 inline std::unique_ptr<gobs::Mask> MaskOf(const gobs::Raster& block,
                                           const std::vector<const char*>& picture) {
   auto mask = std::make_unique<gobs::Mask>(block.width, block.height, block.Window());

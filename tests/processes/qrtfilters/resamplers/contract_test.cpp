@@ -47,11 +47,11 @@ struct Method {
 
 template <class M>
 class EveryMethod : public ::testing::Test {};
-using Methods = ::testing::Types<Method<NearestNeighbour, NearestNeighbourResamplerFactory>,
-                                 Method<Average, AverageResamplerFactory>,
-                                 Method<Mode, ModeResamplerFactory>,
-                                 Method<Bilinear, BilinearResamplerFactory>,
-                                 Method<Bicubic, BicubicResamplerFactory>>;
+using Methods =
+    ::testing::Types<Method<NearestNeighbour, NearestNeighbourResamplerFactory>,
+                     Method<Average, AverageResamplerFactory>, Method<Mode, ModeResamplerFactory>,
+                     Method<Bilinear, BilinearResamplerFactory>,
+                     Method<Bicubic, BicubicResamplerFactory>>;
 TYPED_TEST_SUITE(EveryMethod, Methods);
 
 template <class M, class... Ts>
@@ -82,8 +82,8 @@ TYPED_TEST(EveryMethod, StartsWithoutRatioAndWithUnitPixels) {
   for (const double value : {state.ratioX, state.ratioY, state.noDataValue, state.srcOriginX,
                              state.srcOriginY, state.dstOriginX, state.dstOriginY})
     EXPECT_EQ(0.0, value);
-  for (const double value : {state.srcPixelSizeX, state.srcPixelSizeY, state.dstPixelSizeX,
-                             state.dstPixelSizeY})
+  for (const double value :
+       {state.srcPixelSizeX, state.srcPixelSizeY, state.dstPixelSizeX, state.dstPixelSizeY})
     EXPECT_EQ(1.0, value);
 }
 
@@ -100,8 +100,8 @@ TYPED_TEST(EveryMethod, KeepsTheRatioUntilItIsClearedAndGroundCoordinatesForGood
   EXPECT_FALSE(state.ratioGiven);
   EXPECT_TRUE(state.georeferenced);
   EXPECT_EQ(-7.5, state.noDataValue);
-  const double ground[] = {state.srcOriginX,    state.srcOriginY,    state.srcPixelSizeX,
-                           state.srcPixelSizeY, state.dstOriginX,    state.dstOriginY,
+  const double ground[] = {state.srcOriginX,    state.srcOriginY,   state.srcPixelSizeX,
+                           state.srcPixelSizeY, state.dstOriginX,   state.dstOriginY,
                            state.dstPixelSizeX, state.dstPixelSizeY};
   for (int i = 0; i < 8; ++i) EXPECT_EQ(i + 1.0, ground[i]);
 }
@@ -111,8 +111,8 @@ TYPED_TEST(EveryMethod, ServesNoTypeOutsideTheList) {
   odd.mantissaBits = 7;
   for (const gobs::DataType& type : {gobs::eDT_BIT, gobs::DataType{}, odd})
     ExpectRefusal("Invalid type to dispatch.", "basic/core/typedispatch/dispatchtype",
-                  "static orin::typedispatch::DispatchType::Dispatch(const orin::gobs::DataType&)", 316,
-                  [&] { Made<typename TypeParam::FactoryType>(type); });
+                  "static orin::typedispatch::DispatchType::Dispatch(const orin::gobs::DataType&)",
+                  316, [&] { Made<typename TypeParam::FactoryType>(type); });
 }
 
 TYPED_TEST(EveryMethod, RunsOnTheCpuInAnyLetterCase) {
@@ -155,14 +155,17 @@ TYPED_TEST(EveryMethod, ReadsOnlyInsideTheBufferWhereverGroundCoordinatesPoint) 
   const double inf = std::numeric_limits<double>::infinity();
   const auto src = EmptyBlock<short>(5, 4, {2, 3, 3, false}, 6);
   gobs::Mask mask(5, 4, src->Window());
-  for (const double origin : {-1e300, -5e9, -3e9, -20., -4., 3., 20., 3e9, 5e9, 1e300, inf, -inf, inf - inf})
-    for (const double pixel : {1.0, 0.0, -1.0, 1e-9, 1e9, inf - inf})
+  const double nan = inf - inf;
+  const double origins[] = {-1e300, -5e9, -3e9,  -20., -4.,  3., 20.,
+                            3e9,    5e9,  1e300, inf,  -inf, nan};
+  for (const double origin : origins)
+    for (const double pixel : {1.0, 0.0, -1.0, 1e-9, 1e9, nan})
       for (gobs::Mask* srcMask : {static_cast<gobs::Mask*>(nullptr), &mask}) {
         typename TypeParam::template KernelOf<short> kernel;
         kernel.SetGeoReference(0, 0, pixel, 1, origin, origin, 1, pixel);
         kernel.SetNoDataValue(6);
         const auto dst = EmptyBlock<short>(3, 3, {2, 0, 0, false}, 77);
-        kernel.Resample(src.get(), srcMask, dst.get());   // the address sanitizer watches
+        kernel.Resample(src.get(), srcMask, dst.get());  // the address sanitizer watches
         for (const auto& line : testing::PictureOf<short>(*dst))
           for (const short value : line) EXPECT_NE(77, value) << origin << " " << pixel;
       }
@@ -263,9 +266,9 @@ TYPED_TEST(EveryType, IsTakenAsComplexDataByNearestNeighbourAndAverage) {
 }
 
 TEST(PixelTypeNames, AreThoseOfTheSignatures) {
-  const std::vector<std::string> expected = {"char",  "unsigned char", "short", "unsigned short",
-                                             "int",   "unsigned int",  "float", "double",
-                                             "__int64", "unsigned __int64"};
+  const std::vector<std::string> expected = {
+      "char",         "unsigned char", "short",  "unsigned short", "int",
+      "unsigned int", "float",         "double", "__int64",        "unsigned __int64"};
   std::vector<std::string> names;
   [&]<class... Ts>(typedispatch::TypeList<Ts...>) {
     (names.emplace_back(typedispatch::PixelTypeName<Ts>()), ...);
@@ -307,13 +310,13 @@ TYPED_TEST(EveryType, IsRefusedWithoutAMarginByTheGeneralAverage) {
     const auto src = EmptyBlock<TypeParam>(4, 4, {2, marginX, marginY, false}, 5);
     const auto dst = EmptyBlock<TypeParam>(2, 2, {2, 1, 1, false}, 77);
     const auto before = BytesOf(*dst);
-    ExpectRefusal("You need a 1 pixel margin to process average resampling.",
-                  "processes/qrtfilters/resamplers/average",
-                  std::string("void orin::resamplers::Average<") +
-                      typedispatch::PixelTypeName<TypeParam>() +
-                      ">::ResampleGeneral(orin::gobs::Raster*, orin::gobs::Mask*, orin::gobs::Raster*, "
-                      "double, double, double, double)",
-                  133, [&] { kernel.Resample(src.get(), nullptr, dst.get()); });
+    ExpectRefusal(
+        "You need a 1 pixel margin to process average resampling.",
+        "processes/qrtfilters/resamplers/average",
+        std::string("void orin::resamplers::Average<") + typedispatch::PixelTypeName<TypeParam>() +
+            ">::ResampleGeneral(orin::gobs::Raster*, orin::gobs::Mask*, orin::gobs::Raster*, "
+            "double, double, double, double)",
+        133, [&] { kernel.Resample(src.get(), nullptr, dst.get()); });
     EXPECT_EQ(before, BytesOf(*dst));
   }
 }

@@ -8,6 +8,9 @@
 #include "processes/qrtfilters/resamplers/nearestneighbour.h"
 #include "tests/processes/qrtfilters/resamplers/blocks.h"
 
+// Pictures keep their lines.
+// clang-format off
+
 namespace orin::resamplers {
 namespace {
 
@@ -81,7 +84,8 @@ TEST(NearestNeighbour, CoordinatesThatNoIntegerHoldsReadInsideTheBlock) {
                               std::numeric_limits<double>::infinity(), 9223372036854775808.0}) {
     NearestNeighbour<uint8_t> kernel;
     kernel.SetGeoReference(0, 0, 1, 1, origin, origin, 1, 1);
-    EXPECT_EQ((Picture<uint8_t>{{1, 1}}), Resampled<uint8_t>(kernel, *src, nullptr, 2, 1)) << origin;
+    const auto read = Resampled<uint8_t>(kernel, *src, nullptr, 2, 1);
+    EXPECT_EQ((Picture<uint8_t>{{1, 1}}), read) << origin;
   }
 }
 

@@ -1,0 +1,179 @@
+// SPDX-License-Identifier: MIT
+#include "host/datasources/nodatamask.h"
+
+#include <gmock/gmock.h>
+
+#include <cmath>
+#include <cstring>
+#include <limits>
+#include <memory>
+#include <vector>
+
+#include "tests/testing/fakeraster.h"
+
+namespace {
+
+using orin::datasources::AuxiliaryData;
+using orin::gobs::DataTypeOf;
+using orin::gobs::IMaskDecision;
+using orin::gobs::Mask;
+using orin::gobs::Raster;
+using orin::testing::FakeRaster;
+using ::testing::ElementsAre;
+using ::testing::Each;
+
+/// The decision of a raster whose file declares `file` and whose channels declare `channels`.
+std::unique_ptr<IMaskDecision> DecisionOf(const orin::gobs::DataType& type, const std::string& file,
+                                          const std::vector<std::string>& channels) {
+  FakeRaster raster;
+  raster.type = type;
+  raster.channels = static_cast<unsigned>(channels.size());
+  AuxiliaryData::Items items;
+  if (!file.empty()) items["NO_DATA_VALUE"] = file;
+  std::vector<AuxiliaryData::Items> own(channels.size());
+  for (size_t i = 0; i < channels.size(); ++i)
+    if (!channels[i].empty()) own[i]["NO_DATA_VALUE"] = channels[i];
+  raster.metadata = AuxiliaryData(items, own);
+  return std::unique_ptr<IMaskDecision>(GetFileMetadataSrcMask(&raster));
+}
+
+/// Validity of each pixel of a row, given all its values one after another.
+template <class T>
+std::vector<bool> ValidityOf(const IMaskDecision& decision, const std::vector<T>& values,
+                             unsigned channels = 1, bool isComplex = false) {
+  const unsigned perPixel = channels * (isComplex ? 2 : 1);
+  const auto width = static_cast<unsigned>(values.size() / perPixel);
+  Raster block({width, 1, channels, DataTypeOf<T>(isComplex)}, {});
+  std::memcpy(block.data, values.data(), block.byteSize);
+  Mask mask(width, 1, {});
+  decision.Decide(block, mask);
+  std::vector<bool> valid;
+  for (unsigned x = 0; x < width; ++x) valid.push_back(mask.IsValid(x, 0));
+  return valid;
+}
+
+template <class T>
+std::vector<bool> ValidityOf(const std::string& noData, const std::vector<T>& values) {
+  const auto decision = DecisionOf(DataTypeOf<T>(), noData, {""});
+  if (!decision) throw std::runtime_error("there is no decision for " + noData);
+  return ValidityOf(*decision, values);
+}
+
+TEST(NoDataMask, ThereIsNoDecisionWithoutAFiniteNumber) {
+  for (const char* text : {"", "nan", "-nan", "inf", "-inf", "none", "12abc", "1,5", " "})
+    EXPECT_EQ(nullptr, DecisionOf(DataTypeOf<float>(), text, {""})) << text;
+  EXPECT_EQ(nullptr, DecisionOf(orin::gobs::eDT_BIT, "0", {""}));
+}
+
+template <class T>
+class NoDataMaskOfType : public ::testing::Test {};
+using PixelTypes = ::testing::Types<signed char, unsigned char, short, unsigned short, int,
+                                    unsigned int, float, double, int64_t, uint64_t>;
+TYPED_TEST_SUITE(NoDataMaskOfType, PixelTypes);
+
+TYPED_TEST(NoDataMaskOfType, ThePixelThatEqualsTheValueIsNoDataInEveryWayOfWritingIt) {
+  using T = TypeParam;
+  for (const char* text : {"7", "7.0", "7e0", "0.7e1", "7.000000000"})
+    EXPECT_THAT(ValidityOf<T>(text, {T(6), T(7), T(8)}), ElementsAre(true, false, true)) << text;
+}
+
+TYPED_TEST(NoDataMaskOfType, TheLimitsOfTheTypeAreExact) {
+  using T = TypeParam;
+  if constexpr (std::is_integral_v<T>) {
+    constexpr T kMin = std::numeric_limits<T>::min();
+    constexpr T kMax = std::numeric_limits<T>::max();
+    EXPECT_THAT(ValidityOf<T>(std::to_string(kMax), {kMax, T(kMax - 1), kMin}),
+                ElementsAre(false, true, true));
+    EXPECT_THAT(ValidityOf<T>(std::to_string(kMin), {kMin, T(kMin + 1), kMax}),
+                ElementsAre(false, true, true));
+  } else {
+    constexpr T kLowest = std::numeric_limits<T>::lowest();
+    EXPECT_THAT(ValidityOf<T>("-3.4028234663852886e+38", {T(-3.4028234663852886e+38), T(0)}),
+                ElementsAre(false, true));
+    EXPECT_THAT(ValidityOf<T>(std::is_same_v<T, float> ? "-3.40282346638529e+38" : "-1.7976931348623157e308",
+                              {kLowest, T(0)}),
+                ElementsAre(false, true));
+  }
+}
+
+TYPED_TEST(NoDataMaskOfType, AValueThatTheTypeCannotHoldMatchesNoPixel) {
+  using T = TypeParam;
+  const std::vector<T> values{std::numeric_limits<T>::lowest(), T(0), T(1),
+                              std::numeric_limits<T>::max()};
+  EXPECT_THAT(ValidityOf<T>("1e400", values), Each(true));
+  if constexpr (std::is_integral_v<T>) {
+    for (const char* text : {"0.5", "1.25", "1e30", "-1e30", "18446744073709551616"})
+      EXPECT_THAT(ValidityOf<T>(text, values), Each(true)) << text;
+    if (std::is_unsigned_v<T>) {
+      EXPECT_THAT(ValidityOf<T>("-1", values), Each(true));
+    }
+  }
+}
+
+TEST(NoDataMask, ValuesBesideTheRangeOfSmallTypesDoNotWrap) {
+  EXPECT_THAT(ValidityOf<unsigned char>("256", {0, 255}), Each(true));
+  EXPECT_THAT(ValidityOf<unsigned char>("-1", {0, 255}), Each(true));
+  EXPECT_THAT(ValidityOf<signed char>("128", {-128, 127}), Each(true));
+  EXPECT_THAT(ValidityOf<short>("-9999", {-9999, 9999}), ElementsAre(false, true));
+  EXPECT_THAT(ValidityOf<unsigned short>("-9999", {55537, 9999}), Each(true));
+  EXPECT_THAT(ValidityOf<int64_t>("9223372036854775808", {INT64_MIN, INT64_MAX}), Each(true));
+  EXPECT_THAT(ValidityOf<float>("1e300", {HUGE_VALF, 3.4e38f}), Each(true));
+}
+
+TEST(NoDataMask, SixtyFourBitIntegersAreComparedExactly) {
+  EXPECT_THAT(ValidityOf<int64_t>("9007199254740993",
+                                  {9007199254740992, 9007199254740993, 9007199254740994}),
+              ElementsAre(true, false, true));
+  EXPECT_THAT(ValidityOf<uint64_t>("18446744073709551615", {UINT64_MAX, UINT64_MAX - 1}),
+              ElementsAre(false, true));
+}
+
+TEST(NoDataMask, AFloatIsComparedAfterTheTextWasRoundedToFloat) {
+  EXPECT_THAT(ValidityOf<float>("0.1", {0.1f, std::nextafter(0.1f, 1.0f)}), ElementsAre(false, true));
+  EXPECT_THAT(ValidityOf<double>("0.1", {0.1, double(0.1f)}), ElementsAre(false, true));
+  EXPECT_THAT(ValidityOf<float>("0", {0.0f, -0.0f, NAN, 1.0f}), ElementsAre(false, false, true, true));
+}
+
+TEST(NoDataMask, OfSeveralChannelsAllMustEqualTheirValue) {
+  const auto same = DecisionOf(orin::gobs::eDT_8U, "0", {"", "", ""});
+  EXPECT_THAT(ValidityOf<unsigned char>(*same, {0, 0, 0, 0, 0, 1, 5, 5, 5}, 3),
+              ElementsAre(false, true, true));
+  const auto each = DecisionOf(orin::gobs::eDT_8U, "0", {"1", "", "3"});
+  EXPECT_THAT(ValidityOf<unsigned char>(*each, {1, 0, 3, 0, 0, 0, 1, 2, 3}, 3),
+              ElementsAre(false, true, true));
+}
+
+TEST(NoDataMask, AChannelWithoutAPossibleValueKeepsEveryPixelValid) {
+  const auto missing = DecisionOf(orin::gobs::eDT_8U, "", {"0", ""});
+  ASSERT_NE(nullptr, missing);
+  EXPECT_THAT(ValidityOf<unsigned char>(*missing, {0, 0, 0, 1}, 2), Each(true));
+  const auto outside = DecisionOf(orin::gobs::eDT_8U, "", {"0", "300"});
+  EXPECT_THAT(ValidityOf<unsigned char>(*outside, {0, 44, 0, 0}, 2), Each(true));
+}
+
+TEST(NoDataMask, TheChannelsOwnValueGoesBeforeTheFiles) {
+  const auto decision = DecisionOf(orin::gobs::eDT_8U, "9", {"4"});
+  EXPECT_THAT(ValidityOf<unsigned char>(*decision, {9, 4}), ElementsAre(true, false));
+}
+
+TEST(NoDataMask, OfAComplexSampleTheRealPartCountsAndTheImaginaryPartMustBeZero) {
+  const auto decision = DecisionOf(DataTypeOf<short>(true), "-1", {""});
+  EXPECT_THAT(ValidityOf<short>(*decision, {-1, 0, -1, 5, 0, -1, 0, 0}, 1, true),
+              ElementsAre(false, true, true, true));
+}
+
+TEST(NoDataMask, MarginsAreDecidedToo) {
+  const auto decision = DecisionOf(orin::gobs::eDT_8U, "0", {""});
+  Raster block({1, 1, 1, orin::gobs::eDT_8U}, {1, 1, 0, 0});
+  const uint8_t pixels[] = {0, 1, 1,  //
+                            1, 1, 1,  //
+                            1, 1, 0};
+  std::copy_n(pixels, 9, block.data);
+  Mask mask(1, 1, {1, 1, 0, 0});
+  decision->Decide(block, mask);
+  EXPECT_FALSE(mask.IsValid(-1, -1));
+  EXPECT_FALSE(mask.IsValid(1, 1));
+  EXPECT_TRUE(mask.IsValid(0, 0));
+}
+
+}  // namespace

@@ -1,0 +1,200 @@
+/// The small parts of the level store, each by itself.
+// SPDX-License-Identifier: MIT
+#include <random>
+
+#include "host/drivers/tiff/appender.h"
+#include "host/drivers/tiff/jpegquality.h"
+#include "host/drivers/tiff/leveldirectories.h"
+#include "host/drivers/tiff/levelmetadata.h"
+#include "host/drivers/tiff/tileencoder.h"
+#include "host/services/exception.h"
+#include "tests/host/drivers/tiff/store/storesupport.h"
+
+namespace orin::tests {
+namespace {
+
+using drivers::Appender;
+using drivers::FactorOf;
+using drivers::LevelMetadata;
+using drivers::PositionedFile;
+
+TEST(Factor, OfASizeIsTheOneThatMadeIt) {
+  struct Case {
+    uint32_t width, height, levelWidth, levelHeight;
+    unsigned factor;
+  };
+  for (const Case& c :
+       std::vector<Case>{{1001, 777, 500, 388, 2},
+                         {1001, 777, 501, 389, 2},  // rounded up
+                         {1001, 777, 501, 388, 2},  // each axis its own way
+                         {1000, 1000, 333, 333, 3},
+                         {1000, 1000, 334, 334, 3},
+                         {20000, 20000, 78, 78, 256},  // 254 to 259: the power of two
+                         {20000, 20000, 79, 79, 256},
+                         {20000, 20000, 30, 30, 667},
+                         {1000, 1, 500, 1, 2},
+                         {1000, 1, 250, 1, 4},
+                         {3000, 3000, 1, 1, 2048}})
+    EXPECT_EQ(c.factor, FactorOf(c.width, c.height, c.levelWidth, c.levelHeight))
+        << c.width << "x" << c.height << " to " << c.levelWidth << "x" << c.levelHeight;
+}
+
+TEST(Factor, IsNoneWhereTheAxesDisagreeOrNothingIsReduced) {
+  EXPECT_FALSE(FactorOf(1000, 1000, 500, 250));
+  EXPECT_FALSE(FactorOf(1000, 1000, 1000, 1000));
+  EXPECT_FALSE(FactorOf(1000, 1000, 999, 999));
+  EXPECT_FALSE(FactorOf(1000, 1000, 2000, 2000));
+  EXPECT_FALSE(FactorOf(1000, 1000, 0, 0));
+}
+
+TEST(Factor, OfAnySizeLeadsBackToThatSize) {
+  std::mt19937 random(5);
+  for (int i = 0; i < 20000; ++i) {
+    const uint32_t width = 2 + random() % 50000, height = 2 + random() % 50000;
+    const uint32_t level = 2 + random() % std::min(std::min(width, height) - 1, 600u);
+    const bool up = random() % 2 != 0;
+    const auto reduced = [&](uint32_t size, uint32_t by) {
+      return (size + (up ? by - 1 : 0)) / by;
+    };
+    const auto factor = FactorOf(width, height, reduced(width, level), reduced(height, level));
+    ASSERT_TRUE(factor) << width << "x" << height << " by " << level;
+    for (const auto& [size, by] : {std::pair{width, level}, std::pair{height, level}}) {
+      const uint32_t stored = reduced(size, by);
+      EXPECT_TRUE(size / *factor == stored || (size + *factor - 1) / *factor == stored)
+          << width << "x" << height << " by " << level << ": " << *factor;
+    }
+  }
+}
+
+TEST(Metadata, OfALevelIsReadBackAndItsValidityIsFound) {
+  const LevelMetadata written{
+      .method = "A<&>B", .level = 8, .sourceLevel = 4, .program = "Orin \"x\"", .validity = "10-1"};
+  const std::string text = ComposeLevelMetadata(written);
+  const LevelMetadata read = drivers::ParseLevelMetadata(text);
+  EXPECT_EQ(written.method, read.method);
+  EXPECT_EQ(8u, read.level);
+  EXPECT_EQ(4u, read.sourceLevel);
+  EXPECT_EQ(written.program, read.program);
+  EXPECT_EQ("10-1", read.validity);
+  EXPECT_EQ("10-1", text.substr(read.validityAt, 4));
+}
+
+TEST(Metadata, WithoutAWholeValidityHasNone) {
+  for (const char* text :
+       {"", "<GDALMetadata>", "<GDALMetadata><Item name=\"ORIN_VALID\">12</Item></GDALMetadata>",
+        "<GDALMetadata><Item name=\"ORIN_VALID\">&#49;</Item></GDALMetadata>",
+        "<Item name=\"ORIN_VALID\""})
+    EXPECT_EQ("", drivers::ParseLevelMetadata(text).validity) << text;
+}
+
+class Parts : public TiffStore {};
+
+TEST_F(Parts, JpegQualityIsFoundInTheTablesOfAFile) {
+  for (const int quality : {10, 35, 50, 75, 90, 100}) {
+    const std::string file = folder_.File("quality.tif");
+    TIFF* tiff = TIFFOpen(file.c_str(), "w");
+    const Layout layout{.width = 64, .height = 64, .tile = 64, .compression = COMPRESSION_JPEG};
+    SetTags(tiff, layout);
+    TIFFSetField(tiff, TIFFTAG_JPEGQUALITY, quality);
+    auto bytes = TileBytes(layout, 0, 0, 64, 0);
+    TIFFWriteEncodedTile(tiff, 0, bytes.data(), tmsize_t(bytes.size()));
+    uint32_t count = 0;
+    uint8_t* tables = nullptr;
+    ASSERT_EQ(1, TIFFGetField(tiff, TIFFTAG_JPEGTABLES, &count, &tables));
+    EXPECT_EQ(quality, drivers::JpegQualityOf({tables, tables + count}));
+    TIFFClose(tiff);
+  }
+  EXPECT_EQ(std::nullopt, drivers::JpegQualityOf({}));
+  EXPECT_EQ(std::nullopt, drivers::JpegQualityOf({0xFF, 0xD8, 0xFF, 0xDB, 0x00, 0x43, 0x00, 0x01}));
+}
+
+TEST_F(Parts, AppendedBytesStartAtEvenPositionsAndCanBeGivenUp) {
+  const std::string name = folder_.File("bytes");
+  std::ofstream(name) << "odd";
+  PositionedFile file(name, PositionedFile::Mode::kUpdate);
+  Appender appender(file, false, {});
+  EXPECT_EQ(3u, appender.End());
+  EXPECT_EQ(4u, appender.Append({1, 2, 3}));
+  EXPECT_EQ(8u, appender.Append({4}));
+  appender.CutBackTo(3);
+  EXPECT_EQ(3u, file.Size());
+  EXPECT_EQ(4u, appender.Append({9}));
+}
+
+TEST_F(Parts, BytesOfAnotherProgramAreNeverCutOff) {
+  const std::string name = folder_.File("bytes");
+  std::ofstream(name) << "before";
+  PositionedFile file(name, PositionedFile::Mode::kUpdate);
+  Appender appender(file, false, {});
+  appender.Append({1, 2});
+  std::ofstream(name, std::ios::app) << "others";
+  appender.CutBackTo(6);
+  EXPECT_EQ(14u, file.Size());
+}
+
+TEST_F(Parts, DirectoryIsReadByLibtiffAsItWasComposed) {
+  for (const bool isBig : {false, true})
+    for (const std::endian order : {std::endian::little, std::endian::big}) {
+      const std::string name = folder_.File("composed.tif");
+      const std::string mode =
+          std::string("w") + (isBig ? "8" : "") + (order == std::endian::little ? "l" : "b");
+      WriteImage(name, {.width = 5, .height = 5, .mode = mode.c_str()});
+      const size_t link = LinkOfFirst(name);
+      PositionedFile file(name, PositionedFile::Mode::kUpdate);
+      Appender appender(file, isBig, {order});
+      const uint64_t at = appender.AppendDirectory(
+          {drivers::TextEntry(TIFFTAG_SOFTWARE, "a longer text"),
+           drivers::NumbersEntry(TIFFTAG_IMAGEWIDTH, TIFF_LONG, {70000}),
+           drivers::NumbersEntry(TIFFTAG_IMAGELENGTH, TIFF_SHORT, {300}),
+           drivers::NumbersEntry(TIFFTAG_BITSPERSAMPLE, TIFF_SHORT, {8, 8, 8}),
+           drivers::NumbersEntry(TIFFTAG_SAMPLESPERPIXEL, TIFF_SHORT, {3}),
+           drivers::NumbersEntry(TIFFTAG_PHOTOMETRIC, TIFF_SHORT, {2}),
+           drivers::NumbersEntry(TIFFTAG_STRIPOFFSETS, TIFF_LONG, {8}),
+           drivers::NumbersEntry(TIFFTAG_STRIPBYTECOUNTS, TIFF_LONG, {25})},
+          0);
+      EXPECT_EQ(0u, at % 2);
+      appender.Link(link, at);
+      TIFF* tiff = TIFFOpen(name.c_str(), "rm");
+      ASSERT_TRUE(TIFFSetDirectory(tiff, 1));
+      uint32_t width = 0, height = 0;
+      uint16_t bits = 0;
+      char* text = nullptr;
+      EXPECT_TRUE(TIFFGetField(tiff, TIFFTAG_IMAGEWIDTH, &width) &&
+                  TIFFGetField(tiff, TIFFTAG_IMAGELENGTH, &height) &&
+                  TIFFGetField(tiff, TIFFTAG_BITSPERSAMPLE, &bits) &&
+                  TIFFGetField(tiff, TIFFTAG_SOFTWARE, &text));
+      EXPECT_EQ(70000u, width);
+      EXPECT_EQ(300u, height);
+      EXPECT_EQ(8u, bits);
+      EXPECT_STREQ("a longer text", text);
+      TIFFClose(tiff);
+    }
+}
+
+TEST_F(Parts, EncoderNamesTheFileAndTheCodecsReason) {
+  drivers::LevelCoding coding = drivers::PlainCoding(16, 16, 1, gobs::DataTypeOf<float>(), "");
+  coding.format.tileWidth = coding.format.tileHeight = 16;
+  coding.format.compression = COMPRESSION_JPEG;
+  EXPECT_FALSE(drivers::TileEncoder::CanEncode(coding));
+  try {
+    drivers::TileEncoder(coding, "scene.tif").Encode(std::vector<uint8_t>(1024), 0);
+    ADD_FAILURE() << "JPEG took floats";
+  } catch (const Exception& refused) {
+    EXPECT_EQ(0u, refused.GetMessage().find("scene.tif: a tile cannot be encoded: "))
+        << refused.GetMessage();
+  }
+}
+
+TEST_F(Parts, LevelWithTooManyTilesIsRefusedBeforeAnythingIsReserved) {
+  const auto image = drivers::PlainCoding(4294967295u, 4294967295u, 1, gobs::eDT_8U, "");
+  EXPECT_NO_THROW(drivers::CodingOfLevel(image, 4000, "scene.tif"));
+  try {
+    drivers::CodingOfLevel(image, 2, "scene.tif");
+    ADD_FAILURE() << "a level of 2^46 tiles was begun";
+  } catch (const Exception& refused) {
+    EXPECT_EQ("scene.tif: level 2 would have too many tiles.", refused.GetMessage());
+  }
+}
+
+}  // namespace
+}  // namespace orin::tests

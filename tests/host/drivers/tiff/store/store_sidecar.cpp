@@ -1,0 +1,231 @@
+/// Levels beside an image: written channel by channel, without a trace in the image.
+// SPDX-License-Identifier: MIT
+#include <fcntl.h>
+#include <sys/stat.h>
+
+#include <filesystem>
+
+#include "host/drivers/tiff/sidecar.h"
+#include "host/services/exception.h"
+#include "tests/host/drivers/tiff/store/storesupport.h"
+
+namespace orin::tests {
+namespace {
+
+const Layout kImage{
+    .width = 200, .height = 160, .samples = 3, .tile = 32, .photometric = PHOTOMETRIC_RGB};
+
+Layout InPlanes(Layout layout) {
+  layout.planar = layout.samples > 1;
+  return layout;
+}
+
+/// A level as a run builds it beside an image: one pass a channel.
+void BuildBeside(const std::string& file, const Layout& image, unsigned level,
+                 const std::vector<unsigned>& channels = {1, 2, 3}) {
+  const auto dataset = OpenGeneric(file);
+  for (const unsigned channel : channels)
+    Build(*dataset, image, {.level = level, .channels = {channel}});
+}
+
+/// An image of no TIFF file, as far as its levels are concerned.
+class PlainImage final : public datasources::IRasterSource {
+ public:
+  PlainImage(unsigned width, unsigned height, std::vector<gobs::DataType> types)
+      : width_(width), height_(height), types_(std::move(types)) {}
+  unsigned Width() const override { return width_; }
+  unsigned Height() const override { return height_; }
+  unsigned ChannelCount() const override { return static_cast<unsigned>(types_.size()); }
+  gobs::DataType TypeOf(unsigned channel) const override { return types_.at(channel - 1); }
+  datasources::AuxiliaryData MetadataOf(const std::vector<unsigned>&) const override {
+    return {{{datasources::kNoDataKey, "-9999"}}, {}};
+  }
+  std::unique_ptr<datasources::IRasterReader> OpenReader(const std::vector<unsigned>&) override {
+    return nullptr;
+  }
+  datasources::ILevelStore* Levels() override { return nullptr; }
+
+ private:
+  unsigned width_, height_;
+  std::vector<gobs::DataType> types_;
+};
+
+class SideCar : public TiffStore {
+ protected:
+  SideCar()
+      : file_(folder_.File("image.tif")),
+        sideCar_(file_ + ".ovr"),
+        partial_(sideCar_ + ".partial") {
+    WriteImage(file_, kImage);
+  }
+  bool Exists(const std::string& name) const { return std::filesystem::exists(name); }
+  std::string file_, sideCar_, partial_;
+};
+
+TEST_F(SideCar, HoldsPlanesAndLeavesTheImageUntouched) {
+  const auto before = BytesOf(file_);
+  const timespec longAgo[2] = {{1000, 5}, {1000, 5}};
+  ASSERT_EQ(0, utimensat(AT_FDCWD, file_.c_str(), longAgo, 0));
+  chmod(file_.c_str(), 0444);
+  BuildBeside(file_, kImage, 4);
+  BuildBeside(file_, kImage, 2);
+  struct stat status;
+  ASSERT_EQ(0, stat(file_.c_str(), &status));
+  EXPECT_EQ(1000, status.st_mtim.tv_sec);
+  EXPECT_EQ(before, BytesOf(file_));
+  EXPECT_EQ("100x80 50x40", SizesOf(sideCar_));
+  for (const Seen& seen : DirectoriesOf(sideCar_)) {
+    EXPECT_EQ(PLANARCONFIG_SEPARATE, seen.planar);
+    EXPECT_EQ(uint32_t{FILETYPE_REDUCEDIMAGE}, seen.subfile);
+  }
+  EXPECT_EQ("", WrongTile(sideCar_, 0, LevelLayout(InPlanes(kImage), 2)));
+  EXPECT_EQ("", WrongTile(sideCar_, 1, LevelLayout(InPlanes(kImage), 4)));
+  EXPECT_FALSE(Exists(partial_));
+}
+
+TEST_F(SideCar, GetsItsNameWithItsFirstChannelAndValidityChannelByChannel) {
+  const auto dataset = OpenGeneric(file_);
+  const std::vector<std::string> validity = {"1--", "11-", "111"};
+  for (unsigned channel = 1; channel <= 3; ++channel) {
+    Build(*dataset, kImage, {.level = 2, .channels = {channel}, .goesOn = [&](unsigned) {
+                               EXPECT_EQ(channel > 1, Exists(sideCar_));
+                               return true;
+                             }});
+    EXPECT_TRUE(Exists(sideCar_));
+    EXPECT_EQ(validity[channel - 1], ValidityOf(LevelsOf(*dataset).at(0)));
+    EXPECT_EQ(validity[channel - 1], ValidityOf(LevelsOf(*OpenGeneric(file_)).at(0)));
+  }
+  const auto level = LevelsOf(*dataset).at(0);
+  EXPECT_EQ(datasources::LevelPlace::kSideCar, level.place);
+  EXPECT_EQ(sideCar_, level.file);
+  EXPECT_EQ(1u, level.sourceLevel);
+}
+
+TEST_F(SideCar, LeavesNothingBehindWhenItsFirstLevelIsGivenUp) {
+  std::ofstream(partial_) << "left by a killed run";
+  {
+    const auto dataset = OpenGeneric(file_);
+    Build(*dataset, kImage,
+          {.level = 2,
+           .edge = 40,
+           .channels = {1},
+           .goesOn = [](unsigned block) { return block < 3; },
+           .marksValid = false});
+  }
+  EXPECT_FALSE(Exists(sideCar_));
+  EXPECT_FALSE(Exists(partial_));
+}
+
+TEST_F(SideCar, StartsAnewOverTheRestsOfAKilledRun) {
+  std::ofstream(partial_) << std::string(100000, 'x');
+  BuildBeside(file_, kImage, 2);
+  EXPECT_EQ("", WrongTile(sideCar_, 0, LevelLayout(InPlanes(kImage), 2)));
+  EXPECT_GT(100000u, std::filesystem::file_size(sideCar_));
+  EXPECT_FALSE(Exists(partial_));
+}
+
+TEST_F(SideCar, CanStartAgainAfterBeingGivenUpInTheSameRun) {
+  const auto dataset = OpenGeneric(file_);
+  Build(*dataset, kImage,
+        {.level = 2,
+         .edge = 40,
+         .channels = {1},
+         .goesOn = [](unsigned block) { return block < 5; },
+         .marksValid = false});
+  Build(*dataset, kImage, {.level = 2, .channels = {1}});
+  EXPECT_EQ("1--", ValidityOf(LevelsOf(*dataset).at(0)));
+}
+
+TEST_F(SideCar, OfAnotherProgramIsListedAndAddedTo) {
+  Layout ceil = kImage;
+  ceil.width = 67;  // level 3 rounded up
+  ceil.height = 54;
+  WriteImage(sideCar_, ceil);
+  TIFF* tiff = TIFFOpen(sideCar_.c_str(), "r+");
+  TIFFSetField(tiff, TIFFTAG_SUBFILETYPE, FILETYPE_REDUCEDIMAGE);
+  TIFFRewriteDirectory(tiff);
+  TIFFClose(tiff);
+  const auto levels = LevelsOf(*OpenGeneric(file_));
+  ASSERT_EQ(1u, levels.size());
+  EXPECT_EQ(3u, levels[0].level);
+  EXPECT_EQ("111", ValidityOf(levels[0]));
+  BuildBeside(file_, kImage, 2);
+  BuildBeside(file_, kImage, 3);
+  EXPECT_EQ("100x80 66x53", SizesOf(sideCar_));
+  EXPECT_EQ("", WrongTile(sideCar_, 1, LevelLayout(InPlanes(kImage), 3)));
+}
+
+TEST_F(SideCar, ThatCannotBeReadIsNeverOverwritten) {
+  std::ofstream(sideCar_) << "no TIFF file";
+  try {
+    OpenGeneric(file_);
+    ADD_FAILURE() << "an unreadable side-car was taken";
+  } catch (const Exception& refused) {
+    EXPECT_EQ(0u, refused.GetMessage().find(sideCar_ + ": cannot be read: "))
+        << refused.GetMessage();
+    EXPECT_NE(std::string::npos, refused.GetMessage().find("Delete the side-car"));
+  }
+  EXPECT_EQ("no TIFF file", std::string(BytesOf(sideCar_).data(), 12));
+}
+
+TEST_F(SideCar, OfAJpegYCbCrImageIsDeflatedRgb) {
+  Layout jpeg = kImage;
+  jpeg.compression = COMPRESSION_JPEG;
+  jpeg.photometric = PHOTOMETRIC_YCBCR;
+  WriteImage(file_, jpeg);
+  BuildBeside(file_, kImage, 2);
+  const Seen seen = DirectoriesOf(sideCar_).at(0);
+  EXPECT_EQ(COMPRESSION_ADOBE_DEFLATE, seen.compression);
+  EXPECT_EQ(PHOTOMETRIC_RGB, seen.photometric);
+  EXPECT_EQ("", WrongTile(sideCar_, 0, LevelLayout(InPlanes(kImage), 2)));
+}
+
+TEST_F(SideCar, OfABigEndianImageIsInTheMachinesOrder) {
+  Layout big = kImage;
+  big.mode = "wb";
+  big.bits = 16;
+  big.compression = COMPRESSION_LZW;
+  big.predictor = 2;
+  WriteImage(file_, big);
+  BuildBeside(file_, big, 2);
+  EXPECT_EQ('I', BytesOf(sideCar_)[0]);
+  EXPECT_EQ(COMPRESSION_LZW, DirectoriesOf(sideCar_).at(0).compression);
+  EXPECT_EQ("", WrongTile(sideCar_, 0, LevelLayout(InPlanes(big), 2)));
+}
+
+/// Makes one level of an image of no TIFF file and returns its directory.
+Seen PlainLevel(const std::string& name, PlainImage& image, unsigned level) {
+  const auto store = drivers::TiffSideCar().Open(name, image);
+  store->Create(level, {1}, "NEAREST");
+  const auto writer = store->OpenWriter(level, {1});
+  gobs::Raster block({image.Width() / level, image.Height() / level, 1, image.TypeOf(1)}, {});
+  std::fill(block.data, block.data + block.byteSize, uint8_t{0});
+  writer->Write(block);
+  store->SetValid(level, {1}, true);
+  return DirectoriesOf(name + ".ovr").at(0);
+}
+
+TEST_F(SideCar, OfAnyOtherImageIsDeflatedWithAPredictorForIntegers) {
+  PlainImage integers(300, 200, {gobs::DataTypeOf<int16_t>(), gobs::DataTypeOf<int16_t>()});
+  const Seen ofIntegers = PlainLevel(folder_.File("a.png"), integers, 2);
+  EXPECT_EQ(COMPRESSION_ADOBE_DEFLATE, ofIntegers.compression);
+  EXPECT_EQ(2, ofIntegers.predictor);
+  EXPECT_EQ(150u, ofIntegers.width);
+  EXPECT_EQ(PLANARCONFIG_SEPARATE, ofIntegers.planar);
+  PlainImage floats(300, 200, {gobs::DataTypeOf<float>()});
+  const Seen ofFloats = PlainLevel(folder_.File("b.png"), floats, 2);
+  EXPECT_EQ(COMPRESSION_ADOBE_DEFLATE, ofFloats.compression);
+  EXPECT_EQ(1, ofFloats.predictor);
+}
+
+TEST_F(SideCar, OfAnImageOfFourGiBIsABigTiff) {
+  PlainImage below(65535, 65537, {gobs::eDT_8U});
+  PlainLevel(folder_.File("below.jp2"), below, 1024);
+  EXPECT_EQ(42, BytesOf(folder_.File("below.jp2.ovr"))[2]);
+  PlainImage above(65536, 65536, {gobs::eDT_8U});
+  PlainLevel(folder_.File("above.jp2"), above, 1024);
+  EXPECT_EQ(43, BytesOf(folder_.File("above.jp2.ovr"))[2]);
+}
+
+}  // namespace
+}  // namespace orin::tests
