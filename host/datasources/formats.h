@@ -46,7 +46,7 @@ class IFormatDriver {
   virtual std::vector<ZMBInfo_s> Formats() const = 0;
   /// Code of the file's format, 0 when it is none of this driver's. Reads a few bytes at most.
   virtual ZMBFormatType Identify(const std::string& file) const = 0;
-  /// \throws orin::Exception  the file cannot be opened in that mode; the text names it and the reason
+  /// \throws orin::Exception  the file cannot be opened in that mode; the text says why
   virtual std::unique_ptr<IRasterSource> Open(const std::string& file, AccessMode access) = 0;
 };
 
@@ -67,6 +67,7 @@ class FormatRegistry {
   static FormatRegistry& Instance();
 
   /// Adds a driver and its formats to the table. Drivers are asked in the order of registration.
+  /// \throws orin::Exception  a format's code lies outside the table
   void Register(std::shared_ptr<IFormatDriver> driver);
   void SetSideCarFormat(std::shared_ptr<ISideCarFormat> format);
   /// Forgets all drivers; for tests.

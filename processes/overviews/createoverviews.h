@@ -24,8 +24,8 @@ class CreateFileOverviews {
 
   /// Builds what is missing of the job's own file. Failures are reported through the host's
   /// warnings.
-  /// \returns true when all requested levels exist and are valid; false after a failure, a cancellation
-  ///          or when there is no level to build for a file of this size
+  /// \returns true when all requested levels exist and are valid; false after a failure, a
+  ///          cancellation or when there is no level to build for a file of this size
   bool Generate();
   /// Builds what is missing of several files in turn and stops at the first failure. Files that
   /// cannot be opened, and read-only ones that already have levels, are skipped. The job's file

@@ -14,7 +14,8 @@ namespace orin {
 class IRasterResampler {
  public:
   /// Resamples `src` into `dst`.
-  /// \param srcMask  validity of `src`, same geometry and margins; null: every pixel is valid. Not kept.
+  /// \param srcMask  validity of `src`, same geometry and margins; null: every pixel is valid.
+  ///                 Not kept.
   /// \throws orin::Exception  what the method cannot take; `dst` is untouched
   virtual void Resample(gobs::Raster* src, gobs::Mask* srcMask, gobs::Raster* dst) = 0;
   /// Pixels that the method reads around the source block, on every side.

@@ -20,8 +20,8 @@ class ResamplerManager {
 
   /// Resamples `in`, which carries the margin that the kernel needs, into `out`; both stay the
   /// caller's.
-  /// \throws orin::Exception  there is no factory, or it gives no kernel; what the factory, the kernel
-  ///                          and the mask builder throw passes through
+  /// \throws orin::Exception  there is no factory, or it gives no kernel; what the factory,
+  ///                          the kernel and the mask builder throw passes through
   void ProcessBlock(gobs::Raster* in, gobs::Raster* out);
 
   IResamplerFactory* factory = nullptr;   ///< not owned
