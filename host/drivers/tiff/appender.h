@@ -24,8 +24,8 @@ NewEntry NumbersEntry(uint16_t tag, uint16_t type, const std::vector<uint64_t>& 
 /// An entry of text, with its closing zero.
 NewEntry TextEntry(uint16_t tag, const std::string& text);
 
-/// Nothing that the file holds is changed, but for `Link`: bytes that another program adds meanwhile
-/// are left alone too. Appending is safe from several threads.
+/// Nothing that the file holds is changed, but for `Link`: bytes that another program adds
+/// meanwhile are left alone too. Appending is safe from several threads.
 class Appender {
  public:
   /// \param file  open for update; outlives the appender
