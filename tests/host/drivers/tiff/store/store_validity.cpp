@@ -99,6 +99,21 @@ TEST_F(Validity, OfChannelsThatShareTheRebuiltOnesTilesStandsOverAWholeTileTable
   EXPECT_EQ(1u, changed);
 }
 
+TEST_F(Validity, OfAChannelThatIsNamedTwiceIsNotAnotherChannels) {
+  Layout pair = kImage;
+  pair.samples = 2;
+  pair.photometric = PHOTOMETRIC_MINISBLACK;
+  WriteImage(file_, pair);
+  Build(file_, pair, {.level = 2, .channels = {1, 1}});
+  EXPECT_EQ("1-", Valid());
+  const auto dataset = Open(file_, datasources::kReadOnly);
+  datasources::BasicOverviewWriterAccessor second(dataset.get(), {2});
+  const std::unique_ptr<IRasterWriter> reader(second.CreateRasterWriter(2));
+  gobs::Raster block({100, 80, 1, gobs::eDT_8U}, {});
+  reader->Read(block);
+  EXPECT_EQ(100 * 80, std::count(block.data, block.data + block.byteSize, 0));
+}
+
 TEST_F(Validity, IsSwitchedInPlace) {
   Build(file_, kImage, {.level = 2});
   const auto size = BytesOf(file_).size();
