@@ -19,7 +19,8 @@ constexpr size_t kUnit = size_t{1} << 20;   // bytes; blocks of nearly one size 
 #if defined(__SANITIZE_ADDRESS__) || defined(__SANITIZE_THREAD__)
 constexpr bool kKeepsBuffers = false;
 #elif defined(__has_feature)
-constexpr bool kKeepsBuffers = !__has_feature(address_sanitizer) && !__has_feature(thread_sanitizer);
+constexpr bool kKeepsBuffers =
+    !__has_feature(address_sanitizer) && !__has_feature(thread_sanitizer);
 #else
 constexpr bool kKeepsBuffers = true;
 #endif
@@ -72,17 +73,16 @@ void* AllocateBlock(size_t bytes) {
   if (!kKeepsBuffers || bytes < kLarge) return ::operator new(bytes, kAlignment);
   const size_t capacity = CapacityFor(bytes);
   if (void* kept = Free().Take(capacity)) return kept;
-  void* memory = mmap(nullptr, capacity, PROT_READ | PROT_WRITE, MAP_PRIVATE | MAP_ANONYMOUS, -1, 0);
+  void* memory =
+      mmap(nullptr, capacity, PROT_READ | PROT_WRITE, MAP_PRIVATE | MAP_ANONYMOUS, -1, 0);
   if (memory == MAP_FAILED) throw std::bad_alloc();
   return memory;
 }
 
 void ReleaseBlock(void* memory, size_t bytes) noexcept {
   if (!memory) return;
-  if (!kKeepsBuffers || bytes < kLarge)
-    ::operator delete(memory, kAlignment);
-  else
-    Free().Put(memory, CapacityFor(bytes));
+  if (!kKeepsBuffers || bytes < kLarge) ::operator delete(memory, kAlignment);
+  else Free().Put(memory, CapacityFor(bytes));
 }
 
 }  // namespace orin::gobs

@@ -1,4 +1,5 @@
-/// Memory of raster blocks: large buffers are kept for the next block instead of going back to the system.
+/// Memory of raster blocks: large buffers are kept for the next block instead of going back to the
+/// system.
 // SPDX-License-Identifier: MIT
 #pragma once
 

@@ -12,7 +12,8 @@ struct BufferLayout {
   uint64_t marginY = 0;
   uint64_t stride = 0;  ///< pixels per buffer line, margins included
 
-  /// Index of the pixel (x, y) of the useful area; negative and overhanging coordinates reach the margin.
+  /// Index of the pixel (x, y) of the useful area; negative and overhanging coordinates reach the
+  /// margin.
   constexpr uint64_t Index(int64_t x, int64_t y) const {
     return (marginY + static_cast<uint64_t>(y)) * stride + marginX + static_cast<uint64_t>(x);
   }

@@ -10,8 +10,8 @@ namespace orin::gobs {
 
 /// Plain value; two descriptors are equal only when all six fields are.
 struct DataType {
-  uint32_t bits = 0;          ///< of one component: 1, 8, 16, 32 or 64
-  bool isSigned = false;      ///< signed integers and both floating types
+  uint32_t bits = 0;      ///< of one component: 1, 8, 16, 32 or 64
+  bool isSigned = false;  ///< signed integers and both floating types
   bool isFloat = false;
   uint32_t mantissaBits = 0;  ///< integers: equal to `bits`; 23 or 52 for floats
   uint32_t exponentBits = 0;  ///< integers: 0; 8 or 11 for floats

@@ -39,16 +39,16 @@ struct RasterContext {
   bool ownsData = false;
 };
 
-/// A block with its pixels: channel-interleaved, native byte order, a complex sample's real component
-/// before its imaginary one.
+/// A block with its pixels: channel-interleaved, native byte order, a complex sample's real
+/// component before its imaginary one.
 class Raster : public RasterInfo, public RasterContext {
  public:
   /// Allocates the buffer; its pixels are not initialised.
   /// \throws std::bad_alloc      out of memory
   /// \throws orin::DataException  the block would take 4 GiB or more
   Raster(const RasterInfo& info, const parallelio::ProcessWindow& window);
-  /// Looks at a buffer of the caller's, which must hold what the other constructor would allocate and
-  /// must outlive the block.
+  /// Looks at a buffer of the caller's, which must hold what the other constructor would allocate
+  /// and must outlive the block.
   /// \throws orin::DataException  the block would take 4 GiB or more
   Raster(const RasterInfo& info, const parallelio::ProcessWindow& window, uint8_t* buffer);
   ~Raster() override;
@@ -67,8 +67,8 @@ inline uint64_t PixelBytes(const RasterInfo& info) {
 
 /// Address of channel 0 of the pixel (x, y) of the useful area; the margin is in reach.
 inline uint8_t* PixelAddress(const Raster& raster, int64_t x, int64_t y) {
-  const uint64_t bits = uint64_t{ComponentsPerSample(raster.dataType)} * raster.dataType.bits *
-                        raster.channelCount;
+  const uint64_t bits =
+      uint64_t{ComponentsPerSample(raster.dataType)} * raster.dataType.bits * raster.channelCount;
   return raster.data + LayoutOf(raster).Index(x, y) * bits / 8;
 }
 

@@ -30,7 +30,9 @@ class BasicReader : public IRasterReader {
   unsigned GetLevel() const override { return reader_->GetLevel(); }
   unsigned GetTileWidth() const override { return reader_->GetTileWidth(); }
   unsigned GetTileHeight() const override { return reader_->GetTileHeight(); }
-  void SetTileSize(unsigned width, unsigned height) override { reader_->SetTileSize(width, height); }
+  void SetTileSize(unsigned width, unsigned height) override {
+    reader_->SetTileSize(width, height);
+  }
   void SetOptimalTileSize() override { reader_->SetOptimalTileSize(); }
   void Read(gobs::Raster& block) override { reader_->Read(block); }
   AuxiliaryData GetAuxiliaryData() const override { return reader_->GetAuxiliaryData(); }

@@ -34,8 +34,9 @@ bool IsExact(const Scale& scale, unsigned length) {
   return true;
 }
 
-/// Edge of the blocks of a scale without exact arithmetic: the largest power of two whose source edge
-/// stays within 1024 pixels, in whole steps. Deliberate: no other block size gives the same pixels.
+/// Edge of the blocks of a scale without exact arithmetic: the largest power of two whose source
+/// edge stays within 1024 pixels, in whole steps. Deliberate: no other block size gives the same
+/// pixels.
 uint64_t FixedEdge(const Scale& scale) {
   uint64_t edge = 256;
   while (edge > 1 && double(edge) / scale.Ratio() > 1024) edge /= 2;
@@ -63,7 +64,8 @@ Size FitBlock(const IRasterReader& reader, const IRasterReader& writer, uint64_t
   if (rowOfTilesFits || (strips && width <= pixels))
     return {width, std::min(height, Fit(pixels / width, tileHeight))};
   const bool tileFits = std::min(tileWidth, width) * std::min(tileHeight, height) <= pixels;
-  const uint64_t edge = tileFits ? tileHeight : std::max<uint64_t>(1, uint64_t(std::sqrt(double(pixels))));
+  const uint64_t edge =
+      tileFits ? tileHeight : std::max<uint64_t>(1, uint64_t(std::sqrt(double(pixels))));
   const uint64_t blockHeight = std::min({edge, tileHeight, height});
   return {std::min(width, Fit(pixels / blockHeight, tileWidth)), blockHeight};
 }

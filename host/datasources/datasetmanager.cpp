@@ -25,19 +25,22 @@ std::string UnrecognisedText(const std::string& file) {
   struct stat status;
   if (stat(file.c_str(), &status) != 0)
     return FormatString(_("%s: cannot be opened: %s."), file.c_str(), std::strerror(errno));
-  if (S_ISDIR(status.st_mode)) return FormatString(_("%s: is a directory, not a raster file."), file.c_str());
+  if (S_ISDIR(status.st_mode))
+    return FormatString(_("%s: is a directory, not a raster file."), file.c_str());
   return FormatString(_("%s: is not a raster file of a known format."), file.c_str());
 }
 
-IDataset* OpenThrough(int formatCode, const std::string& file, AccessMode mode, const char* function) {
+IDataset* OpenThrough(int formatCode, const std::string& file, AccessMode mode,
+                      const char* function) {
   ZMBFormatType fileCode = kFormatUnknown;
   IFormatDriver* driver = FormatRegistry::Instance().DriverOf(file, fileCode);
   if (!driver) Refuse(UnrecognisedText(file), function);
   if (formatCode == kFormatGeneric)
     return new SourceDataset(OpenGeneric(*driver, file), file, mode, kFormatGeneric, fileCode);
   if (formatCode != kFormatUnknown && formatCode != fileCode)
-    Refuse(FormatString(_("%s: is not a %s file."), file.c_str(), ZMBInfo[formatCode]->name.c_str()),
-           function);
+    Refuse(
+        FormatString(_("%s: is not a %s file."), file.c_str(), ZMBInfo[formatCode]->name.c_str()),
+        function);
   return new SourceDataset(driver->Open(file, mode), file, mode, fileCode, fileCode);
 }
 

@@ -14,7 +14,7 @@ class DatasetManager {
   static DatasetManager* GetInstance();
 
   /// Opens with the file's own format driver. \returns a new dataset, owned by the caller
-  /// \throws orin::Exception  the file cannot be opened in that mode; the text names it and the reason
+  /// \throws orin::Exception  the file cannot be opened in that mode; the text says why
   IDataset* Open(const std::string& file, AccessMode mode);
 
   /// Opens through a named format: "ZMBALL" is the generic layer, which keeps levels in a side-car;

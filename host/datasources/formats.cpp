@@ -4,6 +4,9 @@
 #include <map>
 #include <utility>
 
+#include "host/services/exception.h"
+#include "host/services/text.h"
+
 namespace {
 
 /// Owns the records that the table points to.
@@ -13,6 +16,10 @@ std::map<int, ZMBInfo_s>& Records() {
 }
 
 void AddRecord(const ZMBInfo_s& record) {
+  if (record.code < 0 || record.code >= kFormatTableSize)
+    throw orin::Exception(FormatString(_("The format %s has the code %d, outside the table of %d."),
+                                       record.name.c_str(), record.code, kFormatTableSize),
+                          "host/datasources/formats", "AddRecord(const ZMBInfo_s&)", 0);
   Records()[record.code] = record;
   ZMBInfo[record.code] = &Records()[record.code];
 }

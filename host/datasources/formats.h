@@ -6,8 +6,8 @@
 #include <string>
 #include <vector>
 
-#include "host/datasources/levelstore.h"
 #include "host/datasources/dataset.h"
+#include "host/datasources/levelstore.h"
 
 /// One format of the table.
 struct ZMBInfo_s {
@@ -21,10 +21,10 @@ struct ZMBInfo_s {
 using ZMBFormatType = int;
 
 inline constexpr int kFormatUnknown = 0;
-inline constexpr int kFormatMemory = 3;    ///< "TESSRA", the host's own
-inline constexpr int kFormatTiff = 58;     ///< "TIFF"
-inline constexpr int kFormatErdas = 272;   ///< "ZMBERDAS"
-inline constexpr int kFormatGeneric = 511; ///< "ZMBALL"
+inline constexpr int kFormatMemory = 3;     ///< "TESSRA", the host's own
+inline constexpr int kFormatTiff = 58;      ///< "TIFF"
+inline constexpr int kFormatErdas = 272;    ///< "ZMBERDAS"
+inline constexpr int kFormatGeneric = 511;  ///< "ZMBALL"
 inline constexpr int kFormatTableSize = 512;
 
 /// Records by code; null where no format has the code. Entry 0 describes an unrecognised file.
@@ -46,7 +46,7 @@ class IFormatDriver {
   virtual std::vector<ZMBInfo_s> Formats() const = 0;
   /// Code of the file's format, 0 when it is none of this driver's. Reads a few bytes at most.
   virtual ZMBFormatType Identify(const std::string& file) const = 0;
-  /// \throws orin::Exception  the file cannot be opened in that mode; the text names it and the reason
+  /// \throws orin::Exception  the file cannot be opened in that mode; the text says why
   virtual std::unique_ptr<IRasterSource> Open(const std::string& file, AccessMode access) = 0;
 };
 
@@ -54,8 +54,8 @@ class IFormatDriver {
 class ISideCarFormat {
  public:
   virtual ~ISideCarFormat() = default;
-  /// The side-car of `imageFile`; a file that does not exist yet is an empty store, and is made when the
-  /// first level is stored.
+  /// The side-car of `imageFile`; a file that does not exist yet is an empty store, and is made
+  /// when the first level is stored.
   /// \param image  the image; outlives the store
   /// \throws orin::Exception  a side-car exists and cannot be read
   virtual std::unique_ptr<ILevelStore> Open(const std::string& imageFile, IRasterSource& image) = 0;
@@ -67,6 +67,7 @@ class FormatRegistry {
   static FormatRegistry& Instance();
 
   /// Adds a driver and its formats to the table. Drivers are asked in the order of registration.
+  /// \throws orin::Exception  a format's code lies outside the table
   void Register(std::shared_ptr<IFormatDriver> driver);
   void SetSideCarFormat(std::shared_ptr<ISideCarFormat> format);
   /// Forgets all drivers; for tests.

@@ -27,8 +27,9 @@ class BothPlaces final : public ILevelStore {
     if (internal_)
       for (LevelDescription& entry : internal_->List())
         if (!Holds(levels, entry.level)) levels.push_back(std::move(entry));
-    std::sort(levels.begin(), levels.end(),
-              [](const LevelDescription& a, const LevelDescription& b) { return a.level < b.level; });
+    std::sort(
+        levels.begin(), levels.end(),
+        [](const LevelDescription& a, const LevelDescription& b) { return a.level < b.level; });
     return levels;
   }
   void Create(unsigned level, const std::vector<unsigned>& channels,

@@ -10,9 +10,9 @@
 
 namespace orin::datasources {
 
-/// Opens the image read-only and lists its levels inside the file and in the side-car together; what
-/// stands in both is taken from the side-car. New levels and all changes go to the side-car alone: the
-/// image is never opened for writing.
+/// Opens the image read-only and lists its levels inside the file and in the side-car together;
+/// what stands in both is taken from the side-car. New levels and all changes go to the side-car
+/// alone: the image is never opened for writing.
 /// \throws orin::Exception  the image or an existing side-car cannot be read
 std::unique_ptr<IRasterSource> OpenGeneric(IFormatDriver& driver, const std::string& file);
 

@@ -22,14 +22,15 @@ class ILevelStore {
   /// What is stored (created levels included), ascending by factor; one entry a factor.
   virtual std::vector<LevelDescription> List() const = 0;
 
-  /// Makes `level` (width / level by height / level pixels) exist for `channels`; a level that exists
-  /// is kept, one that another program made is replaced.
+  /// Makes `level` (width / level by height / level pixels) exist for `channels`; a level that
+  /// exists is kept, one that another program made is replaced.
   /// \param method  recorded with the level: "NEAREST" ...
   /// \throws orin::Exception  it cannot be made; the text names the file
   virtual void Create(unsigned level, const std::vector<unsigned>& channels,
                       const std::string& method) = 0;
 
-  /// Reader and writer of an existing level's `channels`. The returned object must not outlive the store.
+  /// Reader and writer of an existing level's `channels`. The returned object must not outlive the
+  /// store.
   /// \throws orin::Exception  no such level, or it cannot be opened
   virtual std::unique_ptr<IRasterWriter> OpenWriter(unsigned level,
                                                     const std::vector<unsigned>& channels) = 0;

@@ -29,14 +29,16 @@ bool IsFiniteNumber(const std::string& text) {
   double value = 0;
   const auto [end, error] = std::from_chars(text.data(), text.data() + text.size(), value);
   return end == text.data() + text.size() && !text.empty() &&
-         (error == std::errc::result_out_of_range || (error == std::errc() && std::isfinite(value)));
+         (error == std::errc::result_out_of_range ||
+          (error == std::errc() && std::isfinite(value)));
 }
 
 template <class T>
 Declared<T> Parse(const std::string& text) {
   Declared<T> declared;
   if constexpr (std::is_integral_v<T>) {  // digit by digit: a double cannot hold every 64-bit value
-    const auto [end, error] = std::from_chars(text.data(), text.data() + text.size(), declared.value);
+    const auto [end, error] =
+        std::from_chars(text.data(), text.data() + text.size(), declared.value);
     declared.comparable = error == std::errc() && end == text.data() + text.size();
     if (declared.comparable) return declared;
   }

@@ -5,8 +5,8 @@
 #include "basic/gobs/mask/maskdecision.h"
 #include "host/datasources/rasterreader.h"
 
-/// A new decision, owned by the caller: a pixel is no data when all of the reader's channels equal their
-/// no-data value (the channel's own, else the file's), compared in the channels' type; for complex
-/// samples the real component counts and the imaginary one must be 0. Null when none is declared as a
-/// finite number.
+/// A new decision, owned by the caller: a pixel is no data when all of the reader's channels equal
+/// their no-data value (the channel's own, else the file's), compared in the channels' type; for
+/// complex samples the real component counts and the imaginary one must be 0. Null when none is
+/// declared as a finite number.
 orin::gobs::IMaskDecision* GetFileMetadataSrcMask(orin::datasources::IRasterReader* reader);

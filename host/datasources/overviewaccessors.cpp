@@ -23,7 +23,9 @@ BasicOverviewReaderAccessor::BasicOverviewReaderAccessor(IRasterDataset* dataset
                                                          const std::vector<unsigned>& channels)
     : store_(dataset->GetSource()->Levels()), channels_(channels) {}
 
-std::vector<unsigned> BasicOverviewReaderAccessor::GetLevels() const { return LevelsOf(store_, channels_); }
+std::vector<unsigned> BasicOverviewReaderAccessor::GetLevels() const {
+  return LevelsOf(store_, channels_);
+}
 
 bool BasicOverviewReaderAccessor::IsLevelValid(unsigned level) const {
   if (!store_) return false;
@@ -53,7 +55,9 @@ IRasterWriter* BasicOverviewWriterAccessor::CreateRasterWriter(unsigned level) {
   return Store().OpenWriter(level, channels_).release();
 }
 
-std::vector<unsigned> BasicOverviewWriterAccessor::GetLevels() const { return LevelsOf(store_, channels_); }
+std::vector<unsigned> BasicOverviewWriterAccessor::GetLevels() const {
+  return LevelsOf(store_, channels_);
+}
 
 void BasicOverviewWriterAccessor::SetValid(unsigned channel, unsigned level, bool valid) {
   if (channel < 1 || channel > channels_.size())

@@ -13,16 +13,16 @@ enum class LevelPlace { kInternal, kSideCar };
 
 /// Everything that is known of one level.
 struct LevelDescription {
-  unsigned level = 0;                  ///< decimation factor, 2 or more
-  unsigned width = 0;                  ///< pixels, as stored
-  unsigned height = 0;                 ///< pixels, as stored
+  unsigned level = 0;   ///< decimation factor, 2 or more
+  unsigned width = 0;   ///< pixels, as stored
+  unsigned height = 0;  ///< pixels, as stored
   LevelPlace place = LevelPlace::kInternal;
-  std::string file;                    ///< the file that holds the pixels
-  std::string method;                  ///< "NEAREST" ...; empty when another program made the level
-  unsigned sourceLevel = 0;            ///< level it was computed from, 1 for full resolution; 0 unknown
-  std::string program;                 ///< program and version that made it; empty when unknown
-  std::vector<bool> presentChannels;   ///< one entry for each channel of the raster: created
-  std::vector<bool> validChannels;     ///< one entry for each channel of the raster: up to date
+  std::string file;          ///< the file that holds the pixels
+  std::string method;        ///< "NEAREST" ...; empty when another program made the level
+  unsigned sourceLevel = 0;  ///< level it was computed from, 1 for full resolution; 0 unknown
+  std::string program;       ///< program and version that made it; empty when unknown
+  std::vector<bool> presentChannels;  ///< one entry for each channel of the raster: created
+  std::vector<bool> validChannels;    ///< one entry for each channel of the raster: up to date
 };
 
 /// True when `entries` holds true for every one of `channels` (1-based).

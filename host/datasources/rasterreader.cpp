@@ -24,8 +24,9 @@ unsigned IRasterReader::GetTileCount() const { return TilesAcross() * TilesDown(
 
 std::unique_ptr<gobs::Raster> IRasterReader::GetRaster(unsigned index) {
   if (index >= GetTileCount())
-    throw DataException(FormatString(_("There is no tile %u; the raster has %u."), index, GetTileCount()),
-                        kSource, "IRasterReader::GetRaster(unsigned int)", 0);
+    throw DataException(
+        FormatString(_("There is no tile %u; the raster has %u."), index, GetTileCount()), kSource,
+        "IRasterReader::GetRaster(unsigned int)", 0);
   const unsigned x = index % TilesAcross() * GetTileWidth();
   const unsigned y = index / TilesAcross() * GetTileHeight();
   const gobs::RasterInfo info(std::min(GetTileWidth(), GetWidth() - x),
@@ -39,9 +40,10 @@ std::unique_ptr<gobs::Raster> IRasterReader::GetRaster(unsigned index) {
 
 unsigned IRasterReader::FindRaster(unsigned x, unsigned y) const {
   if (x >= GetWidth() || y >= GetHeight())
-    throw DataException(FormatString(_("The pixel (%u, %u) lies outside the raster of %u x %u pixels."),
-                                     x, y, GetWidth(), GetHeight()),
-                        kSource, "IRasterReader::FindRaster(unsigned int, unsigned int) const", 0);
+    throw DataException(
+        FormatString(_("The pixel (%u, %u) lies outside the raster of %u x %u pixels."), x, y,
+                     GetWidth(), GetHeight()),
+        kSource, "IRasterReader::FindRaster(unsigned int, unsigned int) const", 0);
   return y / GetTileHeight() * TilesAcross() + x / GetTileWidth();
 }
 
@@ -73,21 +75,25 @@ void RepeatEdges(gobs::Raster& block, const InsideWindow& inside) {
   const int64_t firstLine = -int64_t{block.marginY};
   for (int64_t y = firstLine; y < firstLine + int64_t{block.bufferLines}; ++y)
     if (y < top || y > bottom)
-      std::memcpy(PixelAddress(block, left, y), PixelAddress(block, left, y < top ? top : bottom), line);
+      std::memcpy(PixelAddress(block, left, y), PixelAddress(block, left, y < top ? top : bottom),
+                  line);
 }
 
 void RequireFittingBlock(const gobs::Raster& block, const IRasterReader& raster,
                          const std::string& file) {
-  const char* function = "RequireFittingBlock(const orin::gobs::Raster&, const IRasterReader&, "
-                         "const std::string&)";
+  const char* function =
+      "RequireFittingBlock(const orin::gobs::Raster&, const IRasterReader&, "
+      "const std::string&)";
   if (block.channelCount != raster.GetChannelCount() || !(block.dataType == raster.GetDataType()))
-    throw DataException(FormatString(_("%s: a block of another pixel type or channel count was asked for."),
-                                     file.c_str()),
-                        kSource, function, 0);
+    throw DataException(
+        FormatString(_("%s: a block of another pixel type or channel count was asked for."),
+                     file.c_str()),
+        kSource, function, 0);
   if (uint64_t{block.x} + block.width > raster.GetWidth() ||
       uint64_t{block.y} + block.height > raster.GetHeight())
-    throw DataException(FormatString(_("%s: a block outside the raster was asked for."), file.c_str()),
-                        kSource, function, 0);
+    throw DataException(
+        FormatString(_("%s: a block outside the raster was asked for."), file.c_str()), kSource,
+        function, 0);
 }
 
 }  // namespace orin::datasources

@@ -10,8 +10,8 @@
 
 namespace orin::datasources {
 
-/// The margin mode that a run sets: real neighbours inside the image, the edge pixels repeated outside.
-/// It is the only mode.
+/// The margin mode that a run sets: real neighbours inside the image, the edge pixels repeated
+/// outside. It is the only mode.
 inline constexpr int kMarginRepeatEdge = 2;
 
 class IRasterReader {
@@ -93,9 +93,9 @@ class ReaderState : public Interface {
 
 /// Pixels of a block's buffer that lie inside the raster: what a driver has to fetch.
 struct InsideWindow {
-  int64_t x;       ///< first column, in the raster
-  int64_t y;       ///< first row, in the raster
-  int64_t width;   ///< columns; 0 or less when the block lies outside
+  int64_t x;      ///< first column, in the raster
+  int64_t y;      ///< first row, in the raster
+  int64_t width;  ///< columns; 0 or less when the block lies outside
   int64_t height;
 };
 

@@ -6,7 +6,8 @@
 
 namespace orin::datasources {
 
-/// Its reading side delivers the level's own pixels, so that a level can be the source of a smaller one.
+/// Its reading side delivers the level's own pixels, so that a level can be the source of a smaller
+/// one.
 class IRasterWriter : public virtual IRasterReader {
  public:
   /// Stores the useful area of `block` at (block.x, block.y). The first call marks the level's

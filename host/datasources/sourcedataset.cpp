@@ -52,8 +52,9 @@ class ListedOverviews final : public IOverviewInfo {
 
  private:
   const LevelDescription* Find(unsigned level) const {
-    const auto found = std::find_if(levels_.begin(), levels_.end(),
-                                    [level](const LevelDescription& e) { return e.level == level; });
+    const auto found =
+        std::find_if(levels_.begin(), levels_.end(),
+                     [level](const LevelDescription& e) { return e.level == level; });
     return found == levels_.end() ? nullptr : &*found;
   }
 

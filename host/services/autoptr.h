@@ -10,7 +10,8 @@ namespace orin {
 template <class T>
 using DeletePolicy = std::default_delete<T>;
 
-/// Owns one host object; the contract's raw pointers are taken into it on the line that receives them.
+/// Owns one host object; the contract's raw pointers are taken into it on the line that receives
+/// them.
 template <class T, class Policy = DeletePolicy<T>>
 using HAutoPtr = std::unique_ptr<T, Policy>;
 

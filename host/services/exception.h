@@ -11,7 +11,8 @@ namespace orin {
 class Exception : public std::exception {
  public:
   /// \param message     what happened, for the user
-  /// \param sourceFile  path of the source without extension, such as `basic/gobs/mask/mask`; may be empty
+  /// \param sourceFile  path of the source without extension, such as `basic/gobs/mask/mask`; may
+  ///                    be empty
   /// \param function    signature text of the function that threw; may be empty
   /// \param line        source line; 0 when none is given
   Exception(const std::string& message, const std::string& sourceFile, const std::string& function,

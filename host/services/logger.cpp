@@ -52,9 +52,7 @@ ReportSink Warning::SetSink(ReportSink sink) {
   return std::exchange(WarningSink(), std::move(sink));
 }
 
-bool Counter::Update(float fraction) {
-  return !CounterSink() || CounterSink()(fraction, nullptr);
-}
+bool Counter::Update(float fraction) { return !CounterSink() || CounterSink()(fraction, nullptr); }
 
 bool Counter::Update(float fraction, const std::string& message, void* /*context*/) {
   return !CounterSink() || CounterSink()(fraction, &message);

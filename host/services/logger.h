@@ -10,7 +10,8 @@ namespace orin::tarn {
 /// One event or warning as the library reported it.
 struct Report {
   std::string message;
-  std::string sourceFile;  ///< path without extension, such as `processes/overviews/createoverviews`
+  std::string
+      sourceFile;  ///< path without extension, such as `processes/overviews/createoverviews`
   unsigned int line;
 };
 
@@ -20,7 +21,8 @@ using ReportSink = std::function<void(const Report&)>;
 class Logger {
  public:
   /// Hands an event to the sink. Never fails.
-  static void LogEvent(const std::string& message, const std::string& sourceFile, unsigned int line);
+  static void LogEvent(const std::string& message, const std::string& sourceFile,
+                       unsigned int line);
 
   /// Replaces the sink; call before work starts. \returns the one replaced
   static ReportSink SetSink(ReportSink sink);

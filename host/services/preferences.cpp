@@ -1,12 +1,12 @@
 // SPDX-License-Identifier: MIT
 #include "host/services/preferences.h"
 
+#include <toml++/toml.h>
 #include <filesystem>
 #include <fstream>
 #include <optional>
 #include <sstream>
 #include <string_view>
-#include <toml++/toml.h>
 
 #include "host/services/environment.h"
 #include "host/services/text.h"
@@ -25,8 +25,8 @@ std::unique_ptr<PreferenceRegistry>& Installed() {
 
 void WarnAt(const std::string& path, unsigned int line, const std::string& problem) {
   orin::tarn::Warning::Warn(
-      FormatString(_("%s:%u: %s The defaults apply."), path.c_str(), line, problem.c_str()), kSource,
-      line);
+      FormatString(_("%s:%u: %s The defaults apply."), path.c_str(), line, problem.c_str()),
+      kSource, line);
 }
 
 std::optional<int> MethodOf(const toml::node& node) {
@@ -100,9 +100,9 @@ std::unique_ptr<PreferenceRegistry> LoadPreferences(const std::string& path) {
   std::error_code ignored;
   if (!path.empty() && std::filesystem::exists(path, ignored)) {
     if (const auto file = Parse(path)) {
-      method = Entry(*file, "overview-method", method,
-                     _("overview-method must be \"nearest\", \"average\" or \"mode\"."), path,
-                     MethodOf);
+      method =
+          Entry(*file, "overview-method", method,
+                _("overview-method must be \"nearest\", \"average\" or \"mode\"."), path, MethodOf);
       factor = Entry(*file, "decimation-factor", factor, _("decimation-factor must be 2 or 3."),
                      path, FactorOf);
     }

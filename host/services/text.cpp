@@ -54,7 +54,8 @@ std::string MkString(const char* format, ...) {
 }
 
 char* _(const char* text) {
-  if (*text == '\0') return const_cast<char*>(text);  // gettext answers "" with the catalogue's header
+  if (*text == '\0')
+    return const_cast<char*>(text);  // gettext answers "" with the catalogue's header
   return dgettext(kDomain, text);
 }
 

@@ -8,8 +8,8 @@
 #include "host/datasources/dataset.h"
 #include "processes/overviews/resampletype.h"
 
-/// Holds a configuration only: every operation opens the file it needs and releases it before it returns.
-/// Copies are independent.
+/// Holds a configuration only: every operation opens the file it needs and releases it before it
+/// returns. Copies are independent.
 class CreateFileOverviews {
  public:
   /// No file, factor 2.
@@ -22,13 +22,14 @@ class CreateFileOverviews {
   CreateFileOverviews& operator=(const CreateFileOverviews&);
   ~CreateFileOverviews();
 
-  /// Builds what is missing of the job's own file. Failures are reported through the host's warnings.
-  /// \returns true when all requested levels exist and are valid; false after a failure, a cancellation
-  ///          or when there is no level to build for a file of this size
+  /// Builds what is missing of the job's own file. Failures are reported through the host's
+  /// warnings.
+  /// \returns true when all requested levels exist and are valid; false after a failure, a
+  ///          cancellation or when there is no level to build for a file of this size
   bool Generate();
-  /// Builds what is missing of several files in turn and stops at the first failure. Files that cannot
-  /// be opened, and read-only ones that already have levels, are skipped. The job's file name keeps the
-  /// last one.
+  /// Builds what is missing of several files in turn and stops at the first failure. Files that
+  /// cannot be opened, and read-only ones that already have levels, are skipped. The job's file
+  /// name keeps the last one.
   /// \returns false for an empty list
   bool Generate(std::vector<std::string>& files);
 
@@ -41,8 +42,8 @@ class CreateFileOverviews {
   /// True when a listed channel (none listed: any) is complex.
   bool HasComplex();
 
-  /// true: levels go to the side-car; false: into the file, and it is an error when they cannot. Not
-  /// called: into the file where that is possible.
+  /// true: levels go to the side-car; false: into the file, and it is an error when they cannot.
+  /// Not called: into the file where that is possible.
   void SaveToKvx(bool external);
   /// \param factor  between levels: 2 or 3, else the user's preference; forgets explicit levels
   /// \param force   rebuild levels that exist and are valid
@@ -57,7 +58,8 @@ class CreateFileOverviews {
 
  private:
   bool OpenDataset(const std::string& name, orin::datasources::IDataset** out) const;
-  bool GetLevelsToCompute(orin::datasources::IDataset* dataset, std::vector<unsigned int>& levels) const;
+  bool GetLevelsToCompute(orin::datasources::IDataset* dataset,
+                          std::vector<unsigned int>& levels) const;
   bool GenerateListed();
   bool CreateOverviews(orin::datasources::IDataset** dataset, bool readOnly, std::string fileName,
                        QRTOverviewResampleType type, std::vector<unsigned>& levels);

@@ -96,9 +96,10 @@ bool CheckInternalPlacement(IDataset* dataset, bool readOnly) {
                 658);
   }
   if (readOnly)
-    return Fail(_("Error. You have requested overviews be created internally (with KVX=NO) but that "
-                  "is not possible for a read-only file."),
-                670);
+    return Fail(
+        _("Error. You have requested overviews be created internally (with KVX=NO) but that "
+          "is not possible for a read-only file."),
+        670);
   return true;
 }
 
@@ -110,12 +111,18 @@ struct Method {
 Method MethodOf(QRTOverviewResampleType type) {
   using namespace orin::resamplers;
   switch (type) {
-    case ResampleNearest: return {std::make_unique<NearestNeighbourResamplerFactory>(), "NEAREST"};
-    case ResampleAverage: return {std::make_unique<AverageResamplerFactory>(), "AVERAGE"};
-    case ResampleMode: return {std::make_unique<ModeResamplerFactory>(), "MODE"};
-    case ResampleBilinear: return {std::make_unique<BilinearResamplerFactory>(), "BILINEAR"};
-    case ResampleBicubic: return {std::make_unique<BicubicResamplerFactory>(), "BICUBIC"};
-    default: return {nullptr, ""};
+    case ResampleNearest:
+      return {std::make_unique<NearestNeighbourResamplerFactory>(), "NEAREST"};
+    case ResampleAverage:
+      return {std::make_unique<AverageResamplerFactory>(), "AVERAGE"};
+    case ResampleMode:
+      return {std::make_unique<ModeResamplerFactory>(), "MODE"};
+    case ResampleBilinear:
+      return {std::make_unique<BilinearResamplerFactory>(), "BILINEAR"};
+    case ResampleBicubic:
+      return {std::make_unique<BicubicResamplerFactory>(), "BICUBIC"};
+    default:
+      return {nullptr, ""};
   }
 }
 
@@ -128,9 +135,8 @@ Levels MissingLevels(IRasterDataset& raster, const Levels& requested, const Chan
   for (const unsigned level : requested) {
     const bool exists = std::find(existing.begin(), existing.end(), level) != existing.end();
     const bool upToDate =
-        exists && std::all_of(channels.begin(), channels.end(), [&](unsigned channel) {
-          return info->IsLevelValid(channel, level);
-        });
+        exists && std::all_of(channels.begin(), channels.end(),
+                              [&](unsigned channel) { return info->IsLevelValid(channel, level); });
     if (!upToDate) missing.push_back(level);
   }
   std::sort(missing.begin(), missing.end());
@@ -200,10 +206,8 @@ bool CreateFileOverviews::CreateOverviews(IDataset** dataset, bool readOnly,
   auto* raster = dynamic_cast<IRasterDataset*>(*dataset);
   if (!raster) return false;
   const bool isTiff = FormatNameOf(**dataset).find("TIFF") != std::string::npos;
-  if (channels_.empty())
-    AppendDefaultChannels(*raster, channels_);
-  else if (!CheckChannels(channels_, raster->GetChannelCount()))
-    return false;
+  if (channels_.empty()) AppendDefaultChannels(*raster, channels_);
+  else if (!CheckChannels(channels_, raster->GetChannelCount())) return false;
   if (!CheckLevels(levels, *raster, force_)) return false;
   if (!external_ && !automatic_ && !CheckInternalPlacement(*dataset, readOnly)) return false;
   const bool hasComplex = HasComplex();

@@ -34,7 +34,6 @@ bool CreateFileOverviews::GetLevelsToCompute(orin::datasources::IDataset* datase
   if (levels_.empty())
     levels = ComputePyramidLevel(double(raster->GetWidth()), double(raster->GetHeight()),
                                  PyramidFactorOrDefault(factor_));
-  else
-    levels = levels_;  // as given: not sorted, repeated ones stay
+  else levels = levels_;  // as given: not sorted, repeated ones stay
   return true;
 }

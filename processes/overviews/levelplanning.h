@@ -2,7 +2,8 @@
 // SPDX-License-Identifier: MIT
 #pragma once
 
-/// The factor between the levels of a pyramid that the user prefers, 2 or 3; 2 without a preference.
+/// The factor between the levels of a pyramid that the user prefers, 2 or 3; 2 without a
+/// preference.
 unsigned int GetDefaultDecimationLevels();
 
 /// `factor` when it is 2 or 3, else the user's preference.

@@ -62,7 +62,8 @@ LevelRun::LevelRun(const LevelRequest& request) : request_(request) {
 
 bool LevelRun::Build() {
   for (const unsigned level : request_.levels) {
-    const bool empty = request_.raster->GetWidth() / level == 0 || request_.raster->GetHeight() / level == 0;
+    const bool empty =
+        request_.raster->GetWidth() / level == 0 || request_.raster->GetHeight() / level == 0;
     if (!empty && !BuildLevel(level)) return false;
   }
   return true;
@@ -88,7 +89,8 @@ bool LevelRun::BuildLevel(unsigned level) {
   return true;
 }
 
-bool LevelRun::BuildPass(unsigned level, const std::vector<unsigned>& channels, const Range& range) {
+bool LevelRun::BuildPass(unsigned level, const std::vector<unsigned>& channels,
+                         const Range& range) {
   BasicReader fullResolution(request_.raster, channels, false);
   NoData noData(fullResolution);
   BasicOverviewWriterAccessor accessor(request_.raster, channels);
@@ -97,10 +99,8 @@ bool LevelRun::BuildPass(unsigned level, const std::vector<unsigned>& channels, 
   std::unique_ptr<IRasterReader> source;
   const std::unique_ptr<IRasterWriter> target(accessor.CreateRasterWriter(level));
   const unsigned sourceLevel = SourceLevelOf(level, accessor.GetLevels());
-  if (sourceLevel == 1)
-    source = std::make_unique<BasicReader>(request_.raster, channels, false);
-  else
-    source.reset(accessor.CreateRasterWriter(sourceLevel));
+  if (sourceLevel == 1) source = std::make_unique<BasicReader>(request_.raster, channels, false);
+  else source.reset(accessor.CreateRasterWriter(sourceLevel));
   const unsigned margin = request_.factory ? request_.factory->GetMargin() : 0;
   source->SetMargin(margin, margin, orin::datasources::kMarginRepeatEdge);
 
@@ -111,10 +111,8 @@ bool LevelRun::BuildPass(unsigned level, const std::vector<unsigned>& channels, 
   driver.complex = fullResolution.GetDataType().isComplex;
   driver.Process(source.get(), target.get());
   if (!driver.HasWrittenAll()) return false;
-  if (request_.isTiff)
-    accessor.SetLevelValid(level, true);
-  else
-    accessor.SetValid(1, level, true);
+  if (request_.isTiff) accessor.SetLevelValid(level, true);
+  else accessor.SetValid(1, level, true);
   return !driver.IsCancelled();
 }
 

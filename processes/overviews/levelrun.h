@@ -13,14 +13,14 @@
 
 /// What a run builds, and with which method.
 struct LevelRequest {
-  orin::datasources::IRasterDataset* raster;  ///< outlives the run
-  std::vector<unsigned> channels;             ///< 1-based
-  std::vector<unsigned> levels;               ///< to build, in this order
+  orin::datasources::IRasterDataset* raster;     ///< outlives the run
+  std::vector<unsigned> channels;                ///< 1-based
+  std::vector<unsigned> levels;                  ///< to build, in this order
   orin::resamplers::IResamplerFactory* factory;  ///< null for a method that does not exist
-  std::string methodName;                     ///< recorded with the levels
-  bool isTiff;           ///< all channels in one pass
-  bool onlyFromDivisors; ///< a level's source must divide it
-  bool showProgress;     ///< a message at the start of each level
+  std::string methodName;                        ///< recorded with the levels
+  bool isTiff;                                   ///< all channels in one pass
+  bool onlyFromDivisors;                         ///< a level's source must divide it
+  bool showProgress;                             ///< a message at the start of each level
 };
 
 class LevelRun {

@@ -40,8 +40,11 @@ QRTOverviewResampleType GetDefaultPyramidType() {
   const auto* preference = registry ? registry->Find<RasterLayerPreference>("") : nullptr;
   if (!preference) return ResampleNearest;
   switch (preference->GetOverviewGenerationMethod()) {
-    case 1: return ResampleAverage;
-    case 2: return ResampleMode;
-    default: return ResampleNearest;  // deliberate: bilinear and bicubic are never a preference
+    case 1:
+      return ResampleAverage;
+    case 2:
+      return ResampleMode;
+    default:
+      return ResampleNearest;  // deliberate: bilinear and bicubic are never a preference
   }
 }

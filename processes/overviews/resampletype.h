@@ -13,8 +13,8 @@ enum QRTOverviewResampleType : int {
   ResampleBicubic = 4,
 };
 
-/// The method whose name starts like `name`: "near", "aver", "mode", "bili", "bicu" or "cubic" in any
-/// letter case, whatever follows; `ResampleInvalid` for any other text. Blanks are not trimmed.
+/// The method whose name starts like `name`: "near", "aver", "mode", "bili", "bicu" or "cubic" in
+/// any letter case, whatever follows; `ResampleInvalid` for any other text. Blanks are not trimmed.
 QRTOverviewResampleType GetPyramidType(std::string name);
 
 /// The user's preferred method, nearest neighbour when there is none. Never bilinear or bicubic.

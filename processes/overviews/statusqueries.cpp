@@ -67,8 +67,9 @@ bool HasEnoughOverviews(std::string file, const std::vector<unsigned int>& chann
 }
 
 bool HasEnoughOverviews(std::vector<std::string> files, int factor) {
-  return std::all_of(files.begin(), files.end(),
-                     [factor](const std::string& file) { return HasEnoughOverviews(file, factor); });
+  return std::all_of(files.begin(), files.end(), [factor](const std::string& file) {
+    return HasEnoughOverviews(file, factor);
+  });
 }
 
 bool HasNativeOverviews(std::string file) {

@@ -7,8 +7,8 @@
 
 #include "host/datasources/dataset.h"
 
-/// True when every channel of the file has at least as many levels as a pyramid needs. Only the number
-/// of levels is compared; the smallest valid level stands for the factor.
+/// True when every channel of the file has at least as many levels as a pyramid needs. Only the
+/// number of levels is compared; the smallest valid level stands for the factor.
 /// \param factor  2 or 3; any other value: the user's preference
 /// \throws orin::Exception  the file cannot be opened
 bool HasEnoughOverviews(std::string file, int factor);

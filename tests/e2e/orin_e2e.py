@@ -43,7 +43,7 @@ def random_pixels(shape, dtype, seed):
     if numpy.issubdtype(dtype, numpy.floating):
         return generator.normal(scale=1000, size=shape).astype(dtype)
     limits = numpy.iinfo(dtype)
-    return generator.integers(limits.min, limits.max, size=shape, dtype=dtype, endpoint=True)
+    return generator.integers(limits.min, limits.max, shape, dtype, endpoint=True)
 
 
 def write_tiff(path, pixels, type_name, options=(), no_data=None):
@@ -62,7 +62,7 @@ def write_tiff(path, pixels, type_name, options=(), no_data=None):
 
 
 def read_pixels(path, level_index=None):
-    """Pixels of the image, or of its n-th overview as GDAL lists them: (channels, rows, columns)."""
+    """Pixels of the image, or of the n-th overview that GDAL lists: (channels, rows, columns)."""
     dataset = gdal.Open(str(path))
     bands = [dataset.GetRasterBand(i + 1) for i in range(dataset.RasterCount)]
     if level_index is not None:

@@ -35,7 +35,8 @@ class EveryLayout(Case):
 
     def test_every_lossless_codec_and_layout(self):
         layouts = itertools.product(
-            ("NONE", "DEFLATE", "LZW", "ZSTD", "PACKBITS", "LZMA", "LERC"), ("YES", "NO"), ("PIXEL", "BAND"))
+            ("NONE", "DEFLATE", "LZW", "ZSTD", "PACKBITS", "LZMA", "LERC"),
+            ("YES", "NO"), ("PIXEL", "BAND"))
         for number, (codec, tiled, interleave) in enumerate(layouts):
             options = [f"COMPRESS={codec}", f"TILED={tiled}", f"INTERLEAVE={interleave}",
                        "BIGTIFF=" + ("YES" if number % 2 else "NO"),
@@ -60,7 +61,8 @@ class EveryLayout(Case):
                 expected = [] if min(rows, columns) < 2 else [(columns // 2, rows // 2)]
                 self.assertEqual(expected, overview_sizes(file))
                 if expected:
-                    self.assertSamePixels(nearest(pixels, 1, 2, (columns, rows)), read_pixels(file, 0))
+                    two = nearest(pixels, 1, 2, (columns, rows))
+                    self.assertSamePixels(two, read_pixels(file, 0))
 
 
 class OtherPrograms(Case):
@@ -77,7 +79,8 @@ class OtherPrograms(Case):
         listed = subprocess.run(["gdalinfo", self.file], capture_output=True, text=True, check=True)
         self.assertIn("Overviews: 1001x750, 500x375, 250x187", listed.stdout)
         self.assertEqual("", listed.stderr)
-        directories = subprocess.run(["tiffinfo", self.file], capture_output=True, text=True, check=True)
+        directories = subprocess.run(["tiffinfo", self.file], capture_output=True, text=True,
+                                     check=True)
         self.assertEqual(3, directories.stdout.count("Subfile Type: reduced-resolution image"))
 
     def test_rasterio_and_gdalinfo_read_a_side_car(self):
@@ -106,7 +109,8 @@ class OtherPrograms(Case):
         six = nearest(three, 3, 6, size)
         for index, expected in enumerate((two, three, six, nearest(six, 6, 8, size))):
             self.assertSamePixels(expected, read_pixels(self.file, index))
-        self.assertEqual([1, 2, 3, 6], [entry["sourceLevel"] for entry in info(self.file)["levels"]])
+        sources = [entry["sourceLevel"] for entry in info(self.file)["levels"]]
+        self.assertEqual([1, 2, 3, 6], sources)
 
     def test_levels_of_another_program_count_and_are_replaced_when_forced(self):
         dataset = gdal.Open(self.file, gdal.GA_Update)

@@ -47,7 +47,8 @@ class Killed(Case):
             shutil.copy(original, file)
             killed += self.kill_at(delays.uniform(0, duration), file, arguments)
             self.assertSamePixels(pixels, read_pixels(file))
-            valid = [entry for entry in info(file)["levels"] if all(c["valid"] for c in entry["channels"])]
+            valid = [entry for entry in info(file)["levels"]
+                     if all(channel["valid"] for channel in entry["channels"])]
             for entry in valid:
                 index = overview_sizes(file).index((entry["width"], entry["height"]))
                 self.assertSamePixels(expected[(2, 4, 8, 16).index(entry["level"])],

@@ -1,4 +1,5 @@
-/// A resampling method for tests: logs how it is used, and takes one source pixel for each output pixel.
+/// A resampling method for tests: logs how it is used, and takes one source pixel for each output
+/// pixel.
 // SPDX-License-Identifier: MIT
 #pragma once
 
@@ -35,7 +36,8 @@ class FakeKernel final : public resamplers::Resampler {
 /// Outlives whoever uses its kernels; releases those that nobody released.
 class FakeKernelFactory final : public resamplers::IResamplerFactory {
  public:
-  using Hook = std::function<void(const gobs::Raster& src, const gobs::Mask* mask, const gobs::Raster& dst)>;
+  using Hook =
+      std::function<void(const gobs::Raster& src, const gobs::Mask* mask, const gobs::Raster& dst)>;
 
   ~FakeKernelFactory() override {
     while (!alive.empty()) delete *alive.begin();

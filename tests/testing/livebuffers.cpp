@@ -33,7 +33,9 @@ void* operator new(std::size_t size, std::align_val_t alignment) {
   if (step == kCacheLine) Raise(++live);
   return memory;
 }
-void operator delete(void* memory, std::align_val_t alignment) noexcept { Release(memory, alignment); }
+void operator delete(void* memory, std::align_val_t alignment) noexcept {
+  Release(memory, alignment);
+}
 void operator delete(void* memory, std::size_t, std::align_val_t alignment) noexcept {
   Release(memory, alignment);
 }

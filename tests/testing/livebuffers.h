@@ -4,8 +4,8 @@
 
 namespace orin::testing {
 
-/// Buffers of blocks alive now. Linking livebuffers.cpp replaces the aligned forms of operator new and
-/// delete in the whole program and counts what is aligned to a cache line, as only blocks are.
+/// Buffers of blocks alive now. Linking livebuffers.cpp replaces the aligned forms of operator new
+/// and delete in the whole program and counts what is aligned to a cache line, as only blocks are.
 int LiveBuffers();
 /// The most that were alive at once since the last `ResetMostBuffers`.
 int MostBuffers();

@@ -12,9 +12,12 @@ namespace {
 [[noreturn]] void Throw(Fault fault, const std::string& operation) {
   const std::string message = "injected fault: " + operation;
   switch (fault) {
-    case Fault::kException: throw Exception(message, "tests/testing/recorder", operation, 1);
-    case Fault::kDataException: throw DataException(message, "tests/testing/recorder", operation, 2);
-    case Fault::kStdRuntimeError: break;
+    case Fault::kException:
+      throw Exception(message, "tests/testing/recorder", operation, 1);
+    case Fault::kDataException:
+      throw DataException(message, "tests/testing/recorder", operation, 2);
+    case Fault::kStdRuntimeError:
+      break;
   }
   throw std::runtime_error(message);
 }

@@ -22,7 +22,8 @@ struct LiveObjects {
   int Total() const { return sources + stores + readers + writers; }
 };
 
-/// Shared by a recording host and all its objects, so that late releases are recorded too. Thread-safe.
+/// Shared by a recording host and all its objects, so that late releases are recorded too.
+/// Thread-safe.
 class Recorder {
  public:
   /// Logs `text`, counts the call of `operation`, and throws when a fault is armed for it.
@@ -30,7 +31,8 @@ class Recorder {
   /// Logs without counting: progress, reports, releases.
   void Note(const std::string& text);
 
-  /// Throws at the n-th call (1-based, counted from now) of `operation`, or of any when it is empty.
+  /// Throws at the n-th call (1-based, counted from now) of `operation`, or of any when it is
+  /// empty.
   void Arm(const std::string& operation, size_t n, Fault fault);
   void DisarmAll();
   /// Calls since the start or the last `Clear`; of all operations when `operation` is empty.

@@ -35,14 +35,16 @@ class RecordingHost::Driver final : public datasources::IFormatDriver {
     if (update && opened.entry->raster.readOnly)
       throw Exception(file + ": cannot be changed: it is read-only.", "tests/testing/recordinghost",
                       "Open", 0);
-    return Recorded(host_.recorder_, OpenMemorySource(opened.entry, update), HoldsLevels(opened.code));
+    return Recorded(host_.recorder_, OpenMemorySource(opened.entry, update),
+                    HoldsLevels(opened.code));
   }
 
  private:
   bool HoldsLevels(int code) const {
-    return std::any_of(host_.formats_.begin(), host_.formats_.end(), [code](const ZMBInfo_s& format) {
-      return format.code == code && format.nativeOverviews != 0;
-    });
+    return std::any_of(host_.formats_.begin(), host_.formats_.end(),
+                       [code](const ZMBInfo_s& format) {
+                         return format.code == code && format.nativeOverviews != 0;
+                       });
   }
 
   RecordingHost& host_;
@@ -55,9 +57,10 @@ class RecordingHost::SideCar final : public datasources::ISideCarFormat {
   std::unique_ptr<datasources::ILevelStore> Open(const std::string& imageFile,
                                                  datasources::IRasterSource&) override {
     host_.recorder_->Call("SideCar.Open", "sidecar.Open(" + imageFile + ")");
-    return Recorded(host_.recorder_,
-                    std::make_unique<drivers::MemoryLevels>(host_.files_.at(imageFile).sideCar, true),
-                    "sidecar");
+    return Recorded(
+        host_.recorder_,
+        std::make_unique<drivers::MemoryLevels>(host_.files_.at(imageFile).sideCar, true),
+        "sidecar");
   }
 
  private:
@@ -114,7 +117,8 @@ drivers::MemoryLevelTable& RecordingHost::Levels(const std::string& file, LevelP
   return place == LevelPlace::kInternal ? *found.entry->levels : *found.sideCar;
 }
 
-void RecordingHost::AddLevel(const std::string& file, unsigned level, bool valid, LevelPlace place) {
+void RecordingHost::AddLevel(const std::string& file, unsigned level, bool valid,
+                             LevelPlace place) {
   drivers::MemoryLevelTable& table = Levels(file, place);
   drivers::MemoryLevel& added = table.levels[level];
   added.description.level = level;

@@ -15,8 +15,8 @@
 
 namespace orin::testing {
 
-/// Installs itself as the only driver, as the side-car format and as the sink of warnings, events and
-/// progress; gives the sinks back, and leaves an empty registry, when it is destroyed.
+/// Installs itself as the only driver, as the side-car format and as the sink of warnings, events
+/// and progress; gives the sinks back, and leaves an empty registry, when it is destroyed.
 ///
 ///     RecordingHost host;
 ///     host.Put("a.tif", Picture(), kFormatTiff);
@@ -34,14 +34,14 @@ namespace orin::testing {
 ///     Update(0.25)      Update(0.25,Generating overview level: 2)
 ///     Warn(MESSAGE,FILE,LINE)      LogEvent(MESSAGE,FILE,LINE)      ~source      ~store
 ///
-/// where a window is (x,y,width,height) without margins. Plain getters are not logged. The calls that
-/// count, and that a fault can hit, are Open, SideCar.Open, OpenReader, MetadataOf, List, Create,
-/// OpenWriter, SetValid, Writer.Write, and Read, SetMargin, SetTileSize, SetOptimalTileSize and
-/// GetAuxiliaryData of Reader and Writer. A call that fails is logged and has no other effect.
+/// where a window is (x,y,width,height) without margins. Plain getters are not logged. The calls
+/// that count, and that a fault can hit, are Open, SideCar.Open, OpenReader, MetadataOf, List,
+/// Create, OpenWriter, SetValid, Writer.Write, and Read, SetMargin, SetTileSize, SetOptimalTileSize
+/// and GetAuxiliaryData of Reader and Writer. A call that fails is logged and has no other effect.
 class RecordingHost {
  public:
-  /// The formats served; one without native overviews keeps no levels in its files. By default TIFF (58)
-  /// and TESSRA (3) with native overviews, ODD (99) without.
+  /// The formats served; one without native overviews keeps no levels in its files. By default TIFF
+  /// (58) and TESSRA (3) with native overviews, ODD (99) without.
   explicit RecordingHost(std::vector<ZMBInfo_s> formats = DefaultFormats());
   ~RecordingHost();
   RecordingHost(const RecordingHost&) = delete;
@@ -67,7 +67,9 @@ class RecordingHost {
   void Clear();
   LiveObjects Live() const { return recorder_->Live(); }
   /// Calls that count, of one operation ("Writer.Write"), or of all of them.
-  size_t CallCount(const std::string& operation = "") const { return recorder_->CallCount(operation); }
+  size_t CallCount(const std::string& operation = "") const {
+    return recorder_->CallCount(operation);
+  }
 
   /// The n-th call from now (1-based), of any operation or of the named one, throws.
   void FailAt(size_t n, Fault fault = Fault::kException) { recorder_->Arm("", n, fault); }

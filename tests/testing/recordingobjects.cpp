@@ -17,7 +17,8 @@ using datasources::IRasterWriter;
 /// One live object of a kind, from construction to destruction.
 class Alive {
  public:
-  Alive(RecorderPtr recorder, int LiveObjects::*kind) : recorder_(std::move(recorder)), kind_(kind) {
+  Alive(RecorderPtr recorder, int LiveObjects::*kind)
+      : recorder_(std::move(recorder)), kind_(kind) {
     recorder_->Count(kind_, 1);
   }
   ~Alive() { recorder_->Count(kind_, -1); }
@@ -43,7 +44,8 @@ class RecordedReader : public Interface {
                  std::string operations, int LiveObjects::*live)
       : recorder_(recorder),
         inner_(std::move(inner)),
-        name_(kind + FormatString("[%u]", inner_->GetLevel()) + ListText(inner_->GetChannelsInfo())),
+        name_(kind + FormatString("[%u]", inner_->GetLevel()) +
+              ListText(inner_->GetChannelsInfo())),
         operations_(std::move(operations)),
         alive_(recorder, live) {}
   ~RecordedReader() override { recorder_->Note("~" + name_); }
@@ -127,14 +129,14 @@ class RecordedStore final : public ILevelStore {
   }
   std::unique_ptr<IRasterWriter> OpenWriter(unsigned level,
                                             const std::vector<unsigned>& channels) override {
-    recorder_->Call("OpenWriter", name_ + FormatString(".OpenWriter(%u,%s)", level,
-                                                       ListText(channels).c_str()));
+    recorder_->Call("OpenWriter",
+                    name_ + FormatString(".OpenWriter(%u,%s)", level, ListText(channels).c_str()));
     return Recorded(recorder_, inner_.OpenWriter(level, channels));
   }
   void SetValid(unsigned level, const std::vector<unsigned>& channels, bool valid) override {
-    recorder_->Call("SetValid", name_ + FormatString(".SetValid(%u,%s,%s)", level,
-                                                     ListText(channels).c_str(),
-                                                     valid ? "true" : "false"));
+    recorder_->Call("SetValid",
+                    name_ + FormatString(".SetValid(%u,%s,%s)", level, ListText(channels).c_str(),
+                                         valid ? "true" : "false"));
     inner_.SetValid(level, channels, valid);
   }
 
@@ -185,12 +187,14 @@ std::string ListText(const std::vector<unsigned>& numbers) {
   return text + "}";
 }
 
-std::unique_ptr<IRasterReader> Recorded(RecorderPtr recorder, std::unique_ptr<IRasterReader> reader) {
+std::unique_ptr<IRasterReader> Recorded(RecorderPtr recorder,
+                                        std::unique_ptr<IRasterReader> reader) {
   return std::make_unique<RecordedReader<IRasterReader>>(std::move(recorder), std::move(reader),
                                                          "reader", "Reader", &LiveObjects::readers);
 }
 
-std::unique_ptr<IRasterWriter> Recorded(RecorderPtr recorder, std::unique_ptr<IRasterWriter> writer) {
+std::unique_ptr<IRasterWriter> Recorded(RecorderPtr recorder,
+                                        std::unique_ptr<IRasterWriter> writer) {
   return std::make_unique<RecordedWriter>(std::move(recorder), std::move(writer));
 }
 

@@ -7,8 +7,8 @@
 
 namespace orin::testing {
 
-/// Slot of a virtual member function, from 0; a virtual destructor takes two. Holds for the Itanium C++
-/// ABI on x86-64, where a pointer to a virtual member is one more than the slot's byte offset.
+/// Slot of a virtual member function, from 0; a virtual destructor takes two. Holds for the Itanium
+/// C++ ABI on x86-64, where a pointer to a virtual member is one more than the slot's byte offset.
 template <class Member>
 size_t SlotOf(Member member) {
   static_assert(sizeof(Member) == 2 * sizeof(ptrdiff_t));

@@ -20,13 +20,13 @@ struct DispatchType<TypeList<First, Rest...>, Factory> {
   /// \throws orin::Exception  no listed type fits
   static Product Dispatch(const gobs::DataType& type) {
     Product product{};
-    const bool found = detail::Visit(TypeList<First, Rest...>{}, type, [&]<class T>(std::type_identity<T>) {
-      product = Factory<T>::Create();
-    });
+    const bool found =
+        detail::Visit(TypeList<First, Rest...>{}, type,
+                      [&]<class T>(std::type_identity<T>) { product = Factory<T>::Create(); });
     if (!found)
-      throw Exception("Invalid type to dispatch.", "basic/core/typedispatch/dispatchtype",
-                      "static orin::typedispatch::DispatchType::Dispatch(const orin::gobs::DataType&)",
-                      316);
+      throw Exception(
+          "Invalid type to dispatch.", "basic/core/typedispatch/dispatchtype",
+          "static orin::typedispatch::DispatchType::Dispatch(const orin::gobs::DataType&)", 316);
     return product;
   }
 };

@@ -14,8 +14,8 @@ template <class... Ts>
 struct TypeList {};
 
 /// In the order in which a dispatch tries them.
-using PixelTypes = TypeList<signed char, unsigned char, short, unsigned short, int, unsigned int, float,
-                            double, int64_t, uint64_t>;
+using PixelTypes = TypeList<signed char, unsigned char, short, unsigned short, int, unsigned int,
+                            float, double, int64_t, uint64_t>;
 
 /// True when `type` describes T, real or complex.
 template <class T>

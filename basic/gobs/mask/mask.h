@@ -40,8 +40,8 @@ class Mask {
   Mask(const Mask&) = delete;
   Mask& operator=(const Mask&) = delete;
 
-  /// Copies the mask into a raster of the same geometry: bytes verbatim into the bit type, one byte of
-  /// 1 (valid) or 0 (no data) per buffer pixel into `eDT_8U`.
+  /// Copies the mask into a raster of the same geometry: bytes verbatim into the bit type, one byte
+  /// of 1 (valid) or 0 (no data) per buffer pixel into `eDT_8U`.
   /// \throws orin::DataException  `out` has another type
   void RetrieveRaster(Raster* out) const;
 

@@ -11,8 +11,8 @@ namespace orin::gobs {
 class IMaskDecision {
  public:
   virtual ~IMaskDecision() = default;
-  /// Sets the bit of every buffer pixel of `block`, margins included, in `mask`, which has its geometry.
-  /// Called from one thread at a time.
+  /// Sets the bit of every buffer pixel of `block`, margins included, in `mask`, which has its
+  /// geometry. Called from one thread at a time.
   virtual void Decide(const Raster& block, Mask& mask) const = 0;
 };
 
@@ -21,7 +21,8 @@ class MaskDecisionBuilder {
  public:
   explicit MaskDecisionBuilder(const IMaskDecision* decision) : decision_(decision) {}
 
-  /// A new mask of the geometry of `block`, owned by the caller. What the decision throws passes through.
+  /// A new mask of the geometry of `block`, owned by the caller. What the decision throws passes
+  /// through.
   Mask* BuildMask(const Raster& block) const;
 
  private:

@@ -18,10 +18,8 @@ struct AllValid {
 /// Calls `body` with the validity test that `mask` (null: none) asks for.
 template <class Body>
 void WithValidity(const Mask* mask, Body&& body) {
-  if (mask)
-    std::forward<Body>(body)(MaskBits{mask->begin, LayoutOf(*mask)});
-  else
-    std::forward<Body>(body)(AllValid{});
+  if (mask) std::forward<Body>(body)(MaskBits{mask->begin, LayoutOf(*mask)});
+  else std::forward<Body>(body)(AllValid{});
 }
 
 }  // namespace orin::gobs

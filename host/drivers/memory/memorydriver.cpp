@@ -59,7 +59,8 @@ class MemoryDriver final : public datasources::IFormatDriver {
                       "MemoryDriver::Open(const std::string&, orin::datasources::AccessMode)", 0);
     };
     std::shared_ptr<MemoryEntry> entry = Names::Instance().Find(file);
-    if (!entry) refuse(FormatString(_("%s: there is no memory raster of that name."), file.c_str()));
+    if (!entry)
+      refuse(FormatString(_("%s: there is no memory raster of that name."), file.c_str()));
     const bool update = access == datasources::kUpdate;
     if (update && entry->raster.readOnly)
       refuse(FormatString(_("%s: cannot be changed: it is read-only."), file.c_str()));

@@ -47,8 +47,8 @@ class MemoryWriter final : public datasources::ReaderState<datasources::IRasterW
 
   void Write(const gobs::Raster& block) override {
     if (!writable_)
-      throw Exception(FormatString(_("%s: is open for reading only."), table_->file.c_str()), kSource,
-                      "MemoryWriter::Write(const orin::gobs::Raster&)", 0);
+      throw Exception(FormatString(_("%s: is open for reading only."), table_->file.c_str()),
+                      kSource, "MemoryWriter::Write(const orin::gobs::Raster&)", 0);
     RequireFittingBlock(block, *this, table_->file);
     Invalidate();
     WritePlanes(planes_, block);
@@ -124,13 +124,13 @@ MemoryLevel& MemoryLevels::PresentLevel(unsigned level, const std::vector<unsign
   for (const unsigned channel : channels)
     if (found == table_->levels.end() || channel < 1 || channel > table_->types.size() ||
         !found->second.channels[channel - 1].present)
-      throw Exception(FormatString(_("%s: there is no level %u of channel %u."), table_->file.c_str(),
-                                   level, channel),
+      throw Exception(FormatString(_("%s: there is no level %u of channel %u."),
+                                   table_->file.c_str(), level, channel),
                       kSource, function, 0);
   if (found == table_->levels.end() || channels.empty())
-    throw Exception(FormatString(_("%s: no channel of level %u was asked for."), table_->file.c_str(),
-                                 level),
-                    kSource, function, 0);
+    throw Exception(
+        FormatString(_("%s: no channel of level %u was asked for."), table_->file.c_str(), level),
+        kSource, function, 0);
   return found->second;
 }
 
@@ -182,8 +182,8 @@ std::unique_ptr<datasources::IRasterWriter> MemoryLevels::OpenWriter(
   const std::lock_guard lock(table_->mutex);
   MemoryLevel& stored = PresentLevel(
       level, channels, "MemoryLevels::OpenWriter(unsigned int, const std::vector<unsigned int>&)");
-  return std::make_unique<MemoryWriter>(table_, stored, channels,
-                                        CommonType(table_->types, channels, table_->file), writable_);
+  return std::make_unique<MemoryWriter>(
+      table_, stored, channels, CommonType(table_->types, channels, table_->file), writable_);
 }
 
 void MemoryLevels::SetValid(unsigned level, const std::vector<unsigned>& channels, bool valid) {

@@ -26,11 +26,11 @@ struct MemoryLevel {
   std::vector<MemoryLevelChannel> channels;   ///< one for each channel of the raster
 };
 
-/// The levels of one raster, shared by all that have it open. Lists and flags are guarded by the mutex;
-/// pixels are not: nobody reads a block while another thread writes it.
+/// The levels of one raster, shared by all that have it open. Lists and flags are guarded by the
+/// mutex; pixels are not: nobody reads a block while another thread writes it.
 struct MemoryLevelTable {
-  std::string file;       ///< named in messages
-  unsigned width = 0;     ///< of the raster, pixels
+  std::string file;    ///< named in messages
+  unsigned width = 0;  ///< of the raster, pixels
   unsigned height = 0;
   datasources::LevelPlace place = datasources::LevelPlace::kInternal;
   std::vector<gobs::DataType> types;  ///< one for each channel of the raster
@@ -50,8 +50,8 @@ class MemoryLevels final : public datasources::ILevelStore {
               const std::string& method) override;
   std::unique_ptr<datasources::IRasterWriter> OpenWriter(
       unsigned level, const std::vector<unsigned>& channels) override;
-  /// True needs every pixel of the channels written since the level was created or since the first write
-  /// to it after it was complete.
+  /// True needs every pixel of the channels written since the level was created or since the first
+  /// write to it after it was complete.
   void SetValid(unsigned level, const std::vector<unsigned>& channels, bool valid) override;
 
  private:

@@ -21,25 +21,21 @@ struct Pair {
 template <class Body>
 void WithSample(const gobs::DataType& type, Body&& body) {
   typedispatch::WithPixelType(type, [&]<class T>(std::type_identity<T>) {
-    if (type.isComplex)
-      body(std::type_identity<Pair<T>>{});
-    else
-      body(std::type_identity<T>{});
+    if (type.isComplex) body(std::type_identity<Pair<T>>{});
+    else body(std::type_identity<T>{});
   });
 }
 
 template <class Sample>
 void ReadRow(const Sample* from, uint64_t step, Sample* to, int64_t count) {
-  if (step == 1)
-    std::copy_n(from, count, to);
+  if (step == 1) std::copy_n(from, count, to);
   else
     for (int64_t i = 0; i < count; ++i) to[static_cast<uint64_t>(i) * step] = from[i];
 }
 
 template <class Sample>
 void WriteRow(const Sample* from, uint64_t step, Sample* to, int64_t count) {
-  if (step == 1)
-    std::copy_n(from, count, to);
+  if (step == 1) std::copy_n(from, count, to);
   else
     for (int64_t i = 0; i < count; ++i) to[i] = from[static_cast<uint64_t>(i) * step];
 }

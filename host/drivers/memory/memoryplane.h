@@ -22,9 +22,9 @@ inline uint64_t SampleBytes(const gobs::DataType& type) {
   return uint64_t{BytesPerComponent(type)} * ComponentsPerSample(type);
 }
 
-/// Fills the whole buffer of `block` from `planes`, one a channel: margins inside the raster with the real
-/// neighbours, margins outside with the edge pixels. In a block of the bit type, channel c of buffer
-/// pixel n is bit n * channels + c, most significant bit first.
+/// Fills the whole buffer of `block` from `planes`, one a channel: margins inside the raster with
+/// the real neighbours, margins outside with the edge pixels. In a block of the bit type, channel c
+/// of buffer pixel n is bit n * channels + c, most significant bit first.
 /// \pre the useful area lies inside, and the planes hold samples of the block's type
 void ReadPlanes(const std::vector<MemoryPlane>& planes, gobs::Raster& block);
 

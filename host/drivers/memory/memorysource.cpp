@@ -28,7 +28,8 @@ class MemoryReader final : public datasources::ReaderState<datasources::IRasterR
         channels_(std::move(channels)),
         type_(CommonType(entry_->levels->types, channels_, entry_->levels->file)) {
     for (const unsigned channel : channels_)
-      planes_.push_back({GetWidth(), GetHeight(), entry_->raster.channels[channel - 1].samples.data()});
+      planes_.push_back(
+          {GetWidth(), GetHeight(), entry_->raster.channels[channel - 1].samples.data()});
   }
 
   unsigned GetWidth() const override { return entry_->raster.width; }
@@ -92,12 +93,13 @@ std::shared_ptr<MemoryEntry> MakeMemoryEntry(const std::string& file, MemoryRast
     const MemoryChannel& channel = raster.channels[i];
     const uint64_t wanted = uint64_t{raster.width} * raster.height * SampleBytes(channel.type);
     if (channel.samples.size() != wanted)
-      throw DataException(FormatString(_("%s: channel %zu holds %zu bytes; %u x %u pixels of its type "
-                                         "take %llu."),
-                                       file.c_str(), i + 1, channel.samples.size(), raster.width,
-                                       raster.height, static_cast<unsigned long long>(wanted)),
-                          "host/drivers/memory/memorysource",
-                          "MakeMemoryEntry(const std::string&, orin::drivers::MemoryRaster)", 0);
+      throw DataException(
+          FormatString(_("%s: channel %zu holds %zu bytes; %u x %u pixels of its type "
+                         "take %llu."),
+                       file.c_str(), i + 1, channel.samples.size(), raster.width, raster.height,
+                       static_cast<unsigned long long>(wanted)),
+          "host/drivers/memory/memorysource",
+          "MakeMemoryEntry(const std::string&, orin::drivers::MemoryRaster)", 0);
     levels->types.push_back(channel.type);
   }
   return std::make_shared<MemoryEntry>(MemoryEntry{std::move(raster), std::move(levels)});

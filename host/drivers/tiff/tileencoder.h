@@ -17,8 +17,8 @@ class TileEncoder {
   TileEncoder(const LevelCoding& coding, std::string file);
 
   /// The stored bytes of one tile.
-  /// \param samples  coding.TileBytes() bytes: rows without gaps, the machine's byte order, samples as
-  ///                 a reader delivers them
+  /// \param samples  coding.TileBytes() bytes: rows without gaps, the machine's byte order,
+  ///                 samples as a reader delivers them
   /// \param plane    0-based; 0 for a level in one plane
   /// \throws orin::Exception  the codec fails; the text names the file and the reason
   std::vector<uint8_t> Encode(const std::vector<uint8_t>& samples, uint32_t plane) const;

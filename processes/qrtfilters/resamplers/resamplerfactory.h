@@ -11,8 +11,8 @@ namespace orin::resamplers {
 
 class IResamplerFactory {
  public:
-  /// A new resampler for blocks of `type`, owned by the caller; null when `ORIN_TARGET` names anything
-  /// but the CPU.
+  /// A new resampler for blocks of `type`, owned by the caller; null when `ORIN_TARGET` names
+  /// anything but the CPU.
   /// \throws orin::Exception  the method serves no such type
   virtual IRasterResampler* CreateResampler(const gobs::DataType& type) = 0;
   /// The margin of the method, as its resamplers report it.

@@ -11,7 +11,8 @@ namespace {
 
 constexpr char kSource[] = "processes/qrtfilters/resamplers/resamplermanager";
 constexpr char kProcessBlock[] =
-    "void orin::resamplers::ResamplerManager::ProcessBlock(orin::gobs::Raster*, orin::gobs::Raster*)";
+    "void orin::resamplers::ResamplerManager::ProcessBlock(orin::gobs::Raster*, "
+    "orin::gobs::Raster*)";
 
 }  // namespace
 
@@ -20,7 +21,8 @@ ResamplerManager::~ResamplerManager() { delete resampler; }
 void ResamplerManager::ProcessBlock(gobs::Raster* in, gobs::Raster* out) {
   if (!factory)
     throw Exception(
-        "The ResamplerManager has not been setup correctly. Ensure the IResamplerFactory has been set "
+        "The ResamplerManager has not been setup correctly. Ensure the IResamplerFactory has been "
+        "set "
         "for the ResamplerManager before proceeding.",
         kSource, kProcessBlock, 37);
   if (!resampler || !(in->dataType == dataType)) RenewKernel(in->dataType);
@@ -29,13 +31,14 @@ void ResamplerManager::ProcessBlock(gobs::Raster* in, gobs::Raster* out) {
 }
 
 void ResamplerManager::RenewKernel(const gobs::DataType& type) {
-  // Deliberate: the recorded type stays empty, so that every block gets a kernel of its own, and the
-  // kernel that is replaced is not released.
+  // Deliberate: the recorded type stays empty, so that every block gets a kernel of its own, and
+  // the kernel that is replaced is not released.
   resampler = factory->CreateResampler(type);
   if (!resampler)
-    throw Exception(_("There is no resampler for the processing target that ORIN_TARGET names. Unset "
-                      "it, or set it to CPU."),
-                    kSource, kProcessBlock, 0);
+    throw Exception(
+        _("There is no resampler for the processing target that ORIN_TARGET names. Unset "
+          "it, or set it to CPU."),
+        kSource, kProcessBlock, 0);
   resampler->SetRatio(xRatio, yRatio);
   resampler->SetNoDataValue(noDataValue);
   resampler->SetComplex(complex);

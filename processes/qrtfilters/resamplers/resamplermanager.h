@@ -18,19 +18,20 @@ class ResamplerManager {
   /// Destroys the current kernel; the factory and the mask builder are their owner's.
   virtual ~ResamplerManager();
 
-  /// Resamples `in`, which carries the margin that the kernel needs, into `out`; both stay the caller's.
-  /// \throws orin::Exception  there is no factory, or it gives no kernel; what the factory, the kernel
-  ///                          and the mask builder throw passes through
+  /// Resamples `in`, which carries the margin that the kernel needs, into `out`; both stay the
+  /// caller's.
+  /// \throws orin::Exception  there is no factory, or it gives no kernel; what the factory,
+  ///                          the kernel and the mask builder throw passes through
   void ProcessBlock(gobs::Raster* in, gobs::Raster* out);
 
-  IResamplerFactory* factory = nullptr;       ///< not owned
-  IRasterResampler* resampler = nullptr;      ///< the current kernel; owned
-  gobs::DataType dataType;                    ///< recorded for kernel reuse; never set by the library
-  double xRatio = 1.0;                        ///< output size / input size
+  IResamplerFactory* factory = nullptr;   ///< not owned
+  IRasterResampler* resampler = nullptr;  ///< the current kernel; owned
+  gobs::DataType dataType;                ///< recorded for kernel reuse; never set by the library
+  double xRatio = 1.0;                    ///< output size / input size
   double yRatio = 1.0;
   gobs::MaskDecisionBuilder* maskBuilder = nullptr;  ///< not owned; null: no mask
   double noDataValue = 0.0;
-  bool complex = false;                       ///< every sample holds two components
+  bool complex = false;  ///< every sample holds two components
 
  private:
   void RenewKernel(const gobs::DataType& type);

@@ -13,7 +13,7 @@ struct ResamplerState {
   double ratioX = 0;           ///< destination size / source size
   double ratioY = 0;
   double noDataValue = 0;
-  double srcOriginX = 0;       ///< ground units, as all that follow
+  double srcOriginX = 0;  ///< ground units, as all that follow
   double srcOriginY = 0;
   double srcPixelSizeX = 1.0;
   double srcPixelSizeY = 1.0;

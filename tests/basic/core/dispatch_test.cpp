@@ -26,9 +26,9 @@ std::string NameOf(const gobs::DataType& type) {
 }
 
 TEST(Dispatch, TheListHoldsTheTenTypesInTheirFixedOrder) {
-  EXPECT_TRUE((std::is_same_v<PixelTypes, TypeList<signed char, unsigned char, short, unsigned short,
-                                                   int, unsigned int, float, double, int64_t,
-                                                   uint64_t>>));
+  EXPECT_TRUE(
+      (std::is_same_v<PixelTypes, TypeList<signed char, unsigned char, short, unsigned short, int,
+                                           unsigned int, float, double, int64_t, uint64_t>>));
 }
 
 TEST(Dispatch, EveryDescriptorReachesItsTypeRealAndComplex) {
@@ -90,8 +90,9 @@ TEST(Dispatch, TheFirstEntryThatFitsDecides) {
     EXPECT_TRUE((std::is_same_v<T, float>));
   });
   EXPECT_EQ(1, made);
-  EXPECT_EQ("first", (DispatchType<TypeList<short, short>, FirstFactory>::Dispatch(
-                         gobs::DataTypeOf<short>())));
+  EXPECT_EQ(
+      "first",
+      (DispatchType<TypeList<short, short>, FirstFactory>::Dispatch(gobs::DataTypeOf<short>())));
 }
 
 TEST(Dispatch, WithPixelTypeAnswersFalseForTheBitTypeAndCallsNothing) {

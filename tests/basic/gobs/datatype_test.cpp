@@ -52,8 +52,10 @@ TEST(DataType, FieldsStandInTheirOrder) {
   EXPECT_LT(static_cast<const void*>(&type.bits), static_cast<const void*>(&type.isSigned));
   EXPECT_LT(static_cast<const void*>(&type.isSigned), static_cast<const void*>(&type.isFloat));
   EXPECT_LT(static_cast<const void*>(&type.isFloat), static_cast<const void*>(&type.mantissaBits));
-  EXPECT_LT(static_cast<const void*>(&type.mantissaBits), static_cast<const void*>(&type.exponentBits));
-  EXPECT_LT(static_cast<const void*>(&type.exponentBits), static_cast<const void*>(&type.isComplex));
+  EXPECT_LT(static_cast<const void*>(&type.mantissaBits),
+            static_cast<const void*>(&type.exponentBits));
+  EXPECT_LT(static_cast<const void*>(&type.exponentBits),
+            static_cast<const void*>(&type.isComplex));
 }
 
 TEST(DataType, ComponentSizesCountWholeBytes) {

@@ -42,10 +42,10 @@ TEST(Mask, TheFirstPixelOfAByteIsItsTopBit) {
 }
 
 TEST(Mask, LinesAreNotPaddedToBytes) {
-  Mask mask(3, 3, {1, 1, 0, 0});         // 5 pixels a line: (0, 0) is pixel 6
+  Mask mask(3, 3, {1, 1, 0, 0});  // 5 pixels a line: (0, 0) is pixel 6
   mask.SetValid(0, 0, false);
   EXPECT_EQ(0b11111101, mask.begin[0]);
-  mask.SetValid(2, 2, false);            // pixel 18
+  mask.SetValid(2, 2, false);  // pixel 18
   EXPECT_EQ(0b11011111, mask.begin[2]);
 }
 
@@ -79,11 +79,13 @@ TEST(Mask, IntoAByteRasterEveryBitBecomesOneOrZeroAlsoBeyondWholeGroupsOfEight) 
     const ProcessWindow window{1, 1, 0, 0};
     Mask mask(width, 3, window);
     std::mt19937 random(width);
-    for (uint8_t* byte = mask.begin; byte != mask.end; ++byte) *byte = static_cast<uint8_t>(random());
+    for (uint8_t* byte = mask.begin; byte != mask.end; ++byte)
+      *byte = static_cast<uint8_t>(random());
     Raster bytes({width, 3, 1, eDT_8U}, window);
     std::fill_n(bytes.data, bytes.byteSize, uint8_t{77});
     mask.RetrieveRaster(&bytes);
-    EXPECT_EQ(BytesOf(mask), std::vector<uint8_t>(bytes.data, bytes.data + bytes.byteSize)) << width;
+    EXPECT_EQ(BytesOf(mask), std::vector<uint8_t>(bytes.data, bytes.data + bytes.byteSize))
+        << width;
   }
 }
 

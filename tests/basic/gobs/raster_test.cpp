@@ -90,9 +90,9 @@ TEST(Raster, CopiesOfTheInformationHoldAllItsFields) {
 
 TEST(Raster, FieldsStandInTheirOrder) {
   const Raster r({1, 1, 1, eDT_8U}, {});
-  const void* const fields[] = {&r.width,   &r.height, &r.channelCount, &r.dataType, &r.marginX,
-                                &r.marginY, &r.x,      &r.y,            &r.stride,   &r.bufferLines,
-                                &r.data,    &r.byteSize, &r.ownsData};
+  const void* const fields[] = {
+      &r.width, &r.height, &r.channelCount, &r.dataType, &r.marginX,  &r.marginY, &r.x,
+      &r.y,     &r.stride, &r.bufferLines,  &r.data,     &r.byteSize, &r.ownsData};
   for (size_t i = 1; i < std::size(fields); ++i) EXPECT_LT(fields[i - 1], fields[i]) << i;
 }
 

@@ -72,7 +72,8 @@ TEST_F(Accessors, TheMethodIsRecordedWithTheLevel) {
   accessor.SetResamplingName("AVERAGE");
   accessor.CreateLevel(4);
   EXPECT_THAT(host_.Log("store.Create"), ElementsAre("store.Create(4,{1,2},AVERAGE)"));
-  const std::unique_ptr<IOverviewInfo> info(dynamic_cast<IRasterDataset&>(*dataset_).GetOverviewInfo());
+  const std::unique_ptr<IOverviewInfo> info(
+      dynamic_cast<IRasterDataset&>(*dataset_).GetOverviewInfo());
   EXPECT_EQ("AVERAGE", info->GetResamplingName(4));
   EXPECT_EQ("", info->GetResamplingName(2));
 }

@@ -35,16 +35,17 @@ double PixelsOf(const Size& block, const FakeRaster& source, const FakeRaster& t
   const double ratio = double(source.level) / target.level;
   const double width = std::min(block.width, target.width);
   const double height = std::min(block.height, target.height);
-  return width * height + (width / ratio + 2.0 * source.GetMarginX()) *
-                              (height / ratio + 2.0 * source.GetMarginY());
+  return width * height +
+         (width / ratio + 2.0 * source.GetMarginX()) * (height / ratio + 2.0 * source.GetMarginY());
 }
 
 constexpr unsigned kBudgets[] = {1,       100,     1000,     65536,     100000,
                                  1000000, 8388608, 33554432, 134217728, 4294967295u};
 
 TEST(FindOptimalRasterSize, IsAtLeastOneByOneAndAMultipleOfTheStepWhateverIsAsked) {
-  const std::pair<unsigned, unsigned> kLevels[] = {{1, 2}, {1, 3}, {1, 4},  {2, 4},  {2, 3}, {4, 6},
-                                                   {3, 2}, {2, 8}, {1, 75}, {1, 77}, {5, 7}, {0, 0}};
+  const std::pair<unsigned, unsigned> kLevels[] = {{1, 2},  {1, 3},  {1, 4}, {2, 4},
+                                                   {2, 3},  {4, 6},  {3, 2}, {2, 8},
+                                                   {1, 75}, {1, 77}, {5, 7}, {0, 0}};
   for (const auto& [source, target] : kLevels)
     for (const unsigned budget : kBudgets)
       for (const unsigned side : {1u, 100u, 5001u, 70000u}) {
@@ -54,7 +55,8 @@ TEST(FindOptimalRasterSize, IsAtLeastOneByOneAndAMultipleOfTheStepWhateverIsAske
         to.level = target;
         if (to.width == 0) continue;
         const Size size = BlockOf(from, to, budget);
-        const unsigned step = std::max(source, 1u) / std::gcd(std::max(source, 1u), std::max(target, 1u));
+        const unsigned step =
+            std::max(source, 1u) / std::gcd(std::max(source, 1u), std::max(target, 1u));
         EXPECT_GE(size.width, 1u);
         EXPECT_GE(size.height, 1u);
         EXPECT_EQ(0u, size.width % step) << source << " " << target << " " << budget;
@@ -115,7 +117,8 @@ TEST(FindOptimalRasterSize, BlocksAreWholeTilesWhereverATileFits) {
       target.storedTileWidth = tileWidth;
       target.storedTileHeight = tileHeight;
       const Size size = BlockOf(source, target, budget);
-      EXPECT_TRUE(size.width == target.width || size.width % tileWidth == 0) << tileWidth << " " << size.width;
+      EXPECT_TRUE(size.width == target.width || size.width % tileWidth == 0)
+          << tileWidth << " " << size.width;
       EXPECT_EQ(0u, size.height % tileHeight) << tileHeight << " " << size.height;
     }
 }
@@ -136,7 +139,8 @@ TEST(FindOptimalRasterSize, ALevelThatFitsIsOneBlock) {
 }
 
 TEST(FindOptimalRasterSize, WithoutExactArithmeticTheSizeIsFixedWhateverTheBudget) {
-  const std::pair<unsigned, unsigned> kLevels[] = {{1, 75}, {1, 77}, {2, 3}, {4, 6}, {3, 7}, {2, 75}};
+  const std::pair<unsigned, unsigned> kLevels[] = {{1, 75}, {1, 77}, {2, 3},
+                                                   {4, 6},  {3, 7},  {2, 75}};
   for (const auto& [from, to] : kLevels) {
     std::set<Size> sizes;
     for (const unsigned budget : kBudgets)

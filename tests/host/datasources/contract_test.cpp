@@ -15,8 +15,8 @@ namespace {
 
 using orin::testing::SlotOf;
 
-// The destructor of an interface that begins with it takes the slots 0 and 1, so that the n-th operation
-// of such an interface, counted from 1, stands in slot n.
+// The destructor of an interface that begins with it takes the slots 0 and 1, so that the n-th
+// operation of such an interface, counted from 1, stands in slot n.
 
 TEST(Contract, OperationsOfADatasetKeepTheirPlaces) {
   EXPECT_EQ(2u, SlotOf(&IDataset::GetFormatDescriptor));

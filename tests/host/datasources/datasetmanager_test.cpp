@@ -23,7 +23,8 @@ using DatasetPtr = std::unique_ptr<IDataset>;
 DatasetPtr Open(const std::string& file, AccessMode mode = kUpdate) {
   return DatasetPtr(DatasetManager::GetInstance()->Open(file, mode));
 }
-DatasetPtr OpenFormat(const std::string& format, const std::string& file, AccessMode mode = kUpdate) {
+DatasetPtr OpenFormat(const std::string& format, const std::string& file,
+                      AccessMode mode = kUpdate) {
   return DatasetPtr(DatasetManager::GetInstance()->OpenFormat(format, file, mode));
 }
 
@@ -91,7 +92,8 @@ TEST(DatasetManager, AnyOtherNameMustBeTheFilesOwnFormat) {
   host.Put("a.tif", NoiseOf(9, 7, 1));
   EXPECT_NE(nullptr, OpenFormat("TIFF", "a.tif"));
   EXPECT_EQ("a.tif: is not a TESSRA file.", MessageOf([] { OpenFormat("TESSRA", "a.tif"); }));
-  EXPECT_EQ("There is no raster format named GRID.", MessageOf([] { OpenFormat("GRID", "a.tif"); }));
+  EXPECT_EQ("There is no raster format named GRID.",
+            MessageOf([] { OpenFormat("GRID", "a.tif"); }));
   EXPECT_EQ("There is no raster format named UNKNOWN.",
             MessageOf([] { OpenFormat("UNKNOWN", "a.tif"); }));
 }
@@ -101,7 +103,8 @@ TEST(DatasetManager, WhatCannotBeOpenedIsNamedWithTheReason) {
   EXPECT_EQ("/nowhere/a.tif: cannot be opened: No such file or directory.",
             MessageOf([] { Open("/nowhere/a.tif"); }));
   EXPECT_EQ("/tmp: is a directory, not a raster file.", MessageOf([] { Open("/tmp"); }));
-  EXPECT_EQ("/dev/null: is not a raster file of a known format.", MessageOf([] { Open("/dev/null"); }));
+  EXPECT_EQ("/dev/null: is not a raster file of a known format.",
+            MessageOf([] { Open("/dev/null"); }));
   EXPECT_EQ("/nowhere/a.tif: cannot be opened: No such file or directory.",
             MessageOf([] { OpenFormat("ZMBALL", "/nowhere/a.tif"); }));
 }
@@ -146,8 +149,9 @@ TEST(BasicReader, AsksTheDriverForNothingWhenAChannelDoesNotExist) {
   RecordingHost host;
   host.Put("a.tif", NoiseOf(9, 7, 2));
   const DatasetPtr dataset = Open("a.tif");
-  EXPECT_EQ("a.tif: there is no channel 3; the file has 2.",
-            MessageOf([&] { BasicReader(dataset.get(), {1, 3}, false); }));
+  EXPECT_EQ("a.tif: there is no channel 3; the file has 2.", MessageOf([&] {
+              BasicReader(dataset.get(), {1, 3}, false);
+            }));
   EXPECT_THROW(BasicReader(dataset.get(), {0}, false), DataException);
   EXPECT_TRUE(host.Log("source.OpenReader").empty());
 }

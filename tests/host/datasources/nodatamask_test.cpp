@@ -19,8 +19,8 @@ using orin::gobs::IMaskDecision;
 using orin::gobs::Mask;
 using orin::gobs::Raster;
 using orin::testing::FakeRaster;
-using ::testing::ElementsAre;
 using ::testing::Each;
+using ::testing::ElementsAre;
 
 /// The decision of a raster whose file declares `file` and whose channels declare `channels`.
 std::unique_ptr<IMaskDecision> DecisionOf(const orin::gobs::DataType& type, const std::string& file,
@@ -90,8 +90,9 @@ TYPED_TEST(NoDataMaskOfType, TheLimitsOfTheTypeAreExact) {
     constexpr T kLowest = std::numeric_limits<T>::lowest();
     EXPECT_THAT(ValidityOf<T>("-3.4028234663852886e+38", {T(-3.4028234663852886e+38), T(0)}),
                 ElementsAre(false, true));
-    EXPECT_THAT(ValidityOf<T>(std::is_same_v<T, float> ? "-3.40282346638529e+38" : "-1.7976931348623157e308",
-                              {kLowest, T(0)}),
+    EXPECT_THAT(ValidityOf<T>(
+                    std::is_same_v<T, float> ? "-3.40282346638529e+38" : "-1.7976931348623157e308",
+                    {kLowest, T(0)}),
                 ElementsAre(false, true));
   }
 }
@@ -129,9 +130,11 @@ TEST(NoDataMask, SixtyFourBitIntegersAreComparedExactly) {
 }
 
 TEST(NoDataMask, AFloatIsComparedAfterTheTextWasRoundedToFloat) {
-  EXPECT_THAT(ValidityOf<float>("0.1", {0.1f, std::nextafter(0.1f, 1.0f)}), ElementsAre(false, true));
+  EXPECT_THAT(ValidityOf<float>("0.1", {0.1f, std::nextafter(0.1f, 1.0f)}),
+              ElementsAre(false, true));
   EXPECT_THAT(ValidityOf<double>("0.1", {0.1, double(0.1f)}), ElementsAre(false, true));
-  EXPECT_THAT(ValidityOf<float>("0", {0.0f, -0.0f, NAN, 1.0f}), ElementsAre(false, false, true, true));
+  EXPECT_THAT(ValidityOf<float>("0", {0.0f, -0.0f, NAN, 1.0f}),
+              ElementsAre(false, false, true, true));
 }
 
 TEST(NoDataMask, OfSeveralChannelsAllMustEqualTheirValue) {

@@ -128,9 +128,9 @@ TEST(RepeatEdges, FillsMarginsOutsideTheRasterFromItsEdgePixels) {
                             0, 0, 0, 0, 0, 0};
   std::copy_n(pixels, sizeof pixels, block.data);
   RepeatEdges(block, InsideOf(block, 2, 2));
-  EXPECT_THAT(LinesOf(block), ElementsAre(ElementsAre(1, 1, 1, 2, 2, 2), ElementsAre(1, 1, 1, 2, 2, 2),
-                                          ElementsAre(3, 3, 3, 4, 4, 4),
-                                          ElementsAre(3, 3, 3, 4, 4, 4)));
+  EXPECT_THAT(LinesOf(block),
+              ElementsAre(ElementsAre(1, 1, 1, 2, 2, 2), ElementsAre(1, 1, 1, 2, 2, 2),
+                          ElementsAre(3, 3, 3, 4, 4, 4), ElementsAre(3, 3, 3, 4, 4, 4)));
 }
 
 TEST(RepeatEdges, LeavesRealNeighboursAlone) {

@@ -21,8 +21,8 @@ using tarn::Report;
 class Preferences : public ::testing::Test {
  protected:
   void SetUp() override {
-    directory_ = std::filesystem::temp_directory_path() /
-                 ("orin-preferences-" + std::to_string(::getpid()));
+    directory_ =
+        std::filesystem::temp_directory_path() / ("orin-preferences-" + std::to_string(::getpid()));
     std::filesystem::create_directories(directory_);
     former_ = tarn::Warning::SetSink([this](const Report& report) { warnings_.push_back(report); });
   }
@@ -66,10 +66,11 @@ TEST_F(Preferences, NamesAndNumbersOfMethodsAreRead) {
   const struct {
     const char* text;
     int method;
-  } kCases[] = {{"\"nearest\"", 0}, {"\"average\"", 1}, {"\"mode\"", 2}, {"0", 0}, {"1", 1}, {"2", 2}};
+  } kCases[] = {{"\"nearest\"", 0}, {"\"average\"", 1}, {"\"mode\"", 2},
+                {"0", 0},           {"1", 1},           {"2", 2}};
   for (const auto& c : kCases) {
-    const auto registry = LoadPreferences(
-        File(std::string("[raster-layer]\noverview-method = ") + c.text + "\ndecimation-factor = 3\n"));
+    const auto registry = LoadPreferences(File(std::string("[raster-layer]\noverview-method = ") +
+                                               c.text + "\ndecimation-factor = 3\n"));
     EXPECT_EQ(c.method, LayerOf(*registry).GetOverviewGenerationMethod()) << c.text;
     EXPECT_EQ(3, LayerOf(*registry).GetDecimationLevels()) << c.text;
   }
@@ -93,8 +94,10 @@ TEST_F(Preferences, AWrongValueNamesItsLineAndLeavesTheOtherOneAlone) {
   EXPECT_EQ(0, LayerOf(*registry).GetOverviewGenerationMethod());
   EXPECT_EQ(3, LayerOf(*registry).GetDecimationLevels());
   ASSERT_EQ(1u, warnings_.size());
-  EXPECT_EQ(file + ":3: overview-method must be \"nearest\", \"average\" or \"mode\". The defaults apply.",
-            warnings_[0].message);
+  EXPECT_EQ(
+      file +
+          ":3: overview-method must be \"nearest\", \"average\" or \"mode\". The defaults apply.",
+      warnings_[0].message);
   EXPECT_EQ(3u, warnings_[0].line);
 }
 
@@ -105,7 +108,8 @@ TEST_F(Preferences, WrongKindsAndRangesOfValuesAreRefused) {
         File(std::string("[raster-layer]\ndecimation-factor = ") + value + "\n");
     ExpectDefaults(*LoadPreferences(file));
     ASSERT_EQ(1u, warnings_.size()) << value;
-    EXPECT_EQ(file + ":2: decimation-factor must be 2 or 3. The defaults apply.", warnings_[0].message);
+    EXPECT_EQ(file + ":2: decimation-factor must be 2 or 3. The defaults apply.",
+              warnings_[0].message);
   }
   for (const char* value : {"3", "-1", "4294967296", "\"Average\"", "1.0"}) {
     warnings_.clear();

@@ -16,7 +16,9 @@ namespace {
 class Sinks : public ::testing::Test {
  protected:
   Sinks()
-      : events_(Logger::SetSink({})), warnings_(Warning::SetSink({})), progress_(Counter::SetSink({})) {}
+      : events_(Logger::SetSink({})),
+        warnings_(Warning::SetSink({})),
+        progress_(Counter::SetSink({})) {}
   ~Sinks() override {
     Logger::SetSink(events_);
     Warning::SetSink(warnings_);

@@ -35,7 +35,8 @@ TEST_P(Cancellation, AtAnyCallLeavesNoUnfinishedLevelValidAndTheNextRunFinishes)
     host.Put(place.file, raster, place.code);
     host.RefuseProgressAt(n);
     const bool answer = JobFor(place.file, {2, 4}).Generate();
-    const bool both = IsValid(host, place.file, 2, place.place) && IsValid(host, place.file, 4, place.place);
+    const bool both =
+        IsValid(host, place.file, 2, place.place) && IsValid(host, place.file, 4, place.place);
     EXPECT_TRUE(both || !answer) << n;
     EXPECT_TRUE(host.Warnings().empty()) << n;
     EXPECT_EQ(1.0f, host.Progress().back()) << n;
@@ -46,10 +47,10 @@ TEST_P(Cancellation, AtAnyCallLeavesNoUnfinishedLevelValidAndTheNextRunFinishes)
   }
 }
 
-INSTANTIATE_TEST_SUITE_P(
-    Places, Cancellation,
-    ::testing::Values(Place{"a.tif", kFormatTiff, datasources::LevelPlace::kInternal},
-                      Place{"a.odd", 99, datasources::LevelPlace::kSideCar}));
+INSTANTIATE_TEST_SUITE_P(Places, Cancellation,
+                         ::testing::Values(Place{"a.tif", kFormatTiff,
+                                                 datasources::LevelPlace::kInternal},
+                                           Place{"a.odd", 99, datasources::LevelPlace::kSideCar}));
 
 TEST(CancellationOfALevel, MarksNothingAndBuildsNothingMore) {
   RecordingHost host;

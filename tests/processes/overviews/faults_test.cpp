@@ -28,7 +28,8 @@ TEST_P(Faults, AtAnyCallEndWithAWarningAndNoFalseFlag) {
   const auto [file, code, fault] = GetParam();
   const size_t calls = CallsOfAnUndisturbedRun();
   ASSERT_GT(calls, 15u);
-  const auto place = code == 99 ? datasources::LevelPlace::kSideCar : datasources::LevelPlace::kInternal;
+  const auto place =
+      code == 99 ? datasources::LevelPlace::kSideCar : datasources::LevelPlace::kInternal;
   for (size_t n = 1; n <= calls; ++n) {
     RecordingHost host;
     host.Put(file, Raster(), code);
@@ -41,7 +42,8 @@ TEST_P(Faults, AtAnyCallEndWithAWarningAndNoFalseFlag) {
     } else if (!host.Log("store.List()").empty() || !host.Log("sidecar.List()").empty()) {
       ASSERT_EQ(1u, host.Warnings().size()) << n;
       EXPECT_EQ(913u, host.Warnings()[0].line) << n;
-      EXPECT_EQ(0u, host.Warnings()[0].message.find("Failed to create overviews.\ninjected fault: "))
+      EXPECT_EQ(0u,
+                host.Warnings()[0].message.find("Failed to create overviews.\ninjected fault: "))
           << host.Warnings()[0].message;
     }
     EXPECT_EQ(0, host.Live().Total()) << n;

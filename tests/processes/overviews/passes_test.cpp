@@ -23,10 +23,10 @@ TEST(Passes, TiffTakesAllChannelsInOnePassAndMarksTheLevel) {
                   "source.OpenReader({1,2,3})", "reader[1]{1,2,3}.GetAuxiliaryData()",
                   "reader[1]{1,2,3}.GetAuxiliaryData()", "store.Create(2,{1,2,3},NEAREST)",
                   "store.OpenWriter(2,{1,2,3})", "store.List()", "source.OpenReader({1,2,3})",
-                  "reader[1]{1,2,3}.SetMargin(0,0,2)", "reader[1]{1,2,3}.Read(0,0,8,8)", "Update(0)",
-                  "writer[2]{1,2,3}.Write(0,0,4,4)", "Update(1)", "store.SetValid(2,{1,2,3},true)",
-                  "~writer[2]{1,2,3}", "~reader[1]{1,2,3}", "~reader[1]{1,2,3}", "Update(1)",
-                  "~source", "~store"));
+                  "reader[1]{1,2,3}.SetMargin(0,0,2)", "reader[1]{1,2,3}.Read(0,0,8,8)",
+                  "Update(0)", "writer[2]{1,2,3}.Write(0,0,4,4)", "Update(1)",
+                  "store.SetValid(2,{1,2,3},true)", "~writer[2]{1,2,3}", "~reader[1]{1,2,3}",
+                  "~reader[1]{1,2,3}", "Update(1)", "~source", "~store"));
 }
 
 TEST(Passes, OtherFormatsTakeChannelByChannelAndMarkEachOne) {
@@ -132,7 +132,8 @@ TEST(Passes, ProgressOfOtherFormatsRunsThroughTheChannels) {
   EXPECT_TRUE(JobFor("a.odd", {2, 4}).Generate());
   const std::vector<float> expected = {0, 0, 0, 0.4f, 0.4f, 0.8f, 0.8f, 0.8f, 0.9f, 0.9f, 1, 1};
   ASSERT_EQ(expected.size(), host.Progress().size());
-  for (size_t i = 0; i < expected.size(); ++i) EXPECT_NEAR(expected[i], host.Progress()[i], 1e-6) << i;
+  for (size_t i = 0; i < expected.size(); ++i)
+    EXPECT_NEAR(expected[i], host.Progress()[i], 1e-6) << i;
 }
 
 TEST(Passes, SkippedLevelsHaveAShareButNoMessage) {

@@ -90,8 +90,11 @@ TEST(HasNativeOverviews, FollowsTheFormatTable) {
 /// A dataset of which only the names are asked.
 class NamedDataset : public IDataset {
  public:
-  NamedDataset(std::string format, std::string file) : format_(std::move(format)), file_(std::move(file)) {}
-  datasources::IFormatDescriptor* GetFormatDescriptor() const override { return new Format(format_); }
+  NamedDataset(std::string format, std::string file)
+      : format_(std::move(format)), file_(std::move(file)) {}
+  datasources::IFormatDescriptor* GetFormatDescriptor() const override {
+    return new Format(format_);
+  }
   datasources::AccessMode GetAccessMode() const override { return datasources::kReadOnly; }
   int GetFileFormatCode() const override { return 0; }
   std::string GetFileName() const override { return file_; }

@@ -24,8 +24,8 @@ TEST(Validation, RefusesLevelsBelowTwoCountingThemFromOne) {
     RecordingHost host;
     host.Put("a.tif", NoiseOf(64, 64, 1));
     EXPECT_FALSE(JobFor("a.tif", {2, level}).Generate());
-    ExpectOneWarning(host, 625,
-                     "OLEVELS[2] = " + std::to_string(level) + "  - Levels must be 2 or greater.\n");
+    ExpectOneWarning(
+        host, 625, "OLEVELS[2] = " + std::to_string(level) + "  - Levels must be 2 or greater.\n");
     EXPECT_TRUE(CreatedLevels(host).empty());
   }
 }
@@ -63,9 +63,11 @@ TEST(Validation, InternalLevelsNeedAFormatThatHoldsThem) {
   CreateFileOverviews job = JobFor("a.odd", {2});
   job.SaveToKvx(false);
   EXPECT_FALSE(job.Generate());
-  ExpectOneWarning(host, 658,
-                   "Error. You have requested overviews be created internally (with KVX=NO) but that "
-                   "is not supported for " + ZMBInfo[99]->description + " files.");
+  ExpectOneWarning(
+      host, 658,
+      "Error. You have requested overviews be created internally (with KVX=NO) but that "
+      "is not supported for " +
+          ZMBInfo[99]->description + " files.");
 }
 
 TEST(Validation, InternalLevelsNeedAWritableFile) {
@@ -76,9 +78,10 @@ TEST(Validation, InternalLevelsNeedAWritableFile) {
   CreateFileOverviews job = JobFor("a.tif", {2});
   job.SaveToKvx(false);
   EXPECT_FALSE(job.Generate());
-  ExpectOneWarning(host, 670,
-                   "Error. You have requested overviews be created internally (with KVX=NO) but that "
-                   "is not possible for a read-only file.");
+  ExpectOneWarning(
+      host, 670,
+      "Error. You have requested overviews be created internally (with KVX=NO) but that "
+      "is not possible for a read-only file.");
 }
 
 TEST(Validation, LevelsAreCheckedBeforePlacement) {
@@ -115,10 +118,11 @@ TEST(Validation, AnUnknownMethodEndsAsAFailureOfTheRun) {
   CreateFileOverviews job = JobFor("a.tif", {2});
   job.SetPyramidType(static_cast<QRTOverviewResampleType>(9));
   EXPECT_FALSE(job.Generate());
-  ExpectOneWarning(host, 913,
-                   "Failed to create overviews.\nThe ResamplerManager has not been setup correctly. "
-                   "Ensure the IResamplerFactory has been set for the ResamplerManager before "
-                   "proceeding.");
+  ExpectOneWarning(
+      host, 913,
+      "Failed to create overviews.\nThe ResamplerManager has not been setup correctly. "
+      "Ensure the IResamplerFactory has been set for the ResamplerManager before "
+      "proceeding.");
   EXPECT_FALSE(IsValid(host, "a.tif", 2));
   EXPECT_EQ(1.0f, host.Progress().back());
 }

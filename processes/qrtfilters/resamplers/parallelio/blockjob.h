@@ -12,7 +12,8 @@ struct BlockJob {
   gobs::RasterInfo outputInfo;
   ProcessWindow inputWindow;   ///< in the source raster
   ProcessWindow outputWindow;  ///< in the output raster
-  gobs::Raster* raster = nullptr;  ///< owned by the driver: the input block once read, then the output block
+  gobs::Raster* raster =
+      nullptr;  ///< owned by the driver: the input block once read, then the output block
 };
 
 }  // namespace orin::parallelio

@@ -42,9 +42,9 @@ class IODriver : public Base {
     Base::ComputeBlocks(blocks, reader, writer);
   }
 
-  /// Resamples the whole of `reader` into the whole of `writer`. Returns when all is written, or when
-  /// progress was refused, which `IsCancelled` tells. `reader` may be null when every block is preloaded
-  /// by a derived planning.
+  /// Resamples the whole of `reader` into the whole of `writer`. Returns when all is written, or
+  /// when progress was refused, which `IsCancelled` tells. `reader` may be null when every block is
+  /// preloaded by a derived planning.
   /// \throws orin::Exception  the first failure of reading, resampling or writing
   void Process(datasources::IRasterReader* reader, datasources::IRasterWriter* writer);
 
@@ -132,7 +132,8 @@ void IODriver<Processing, Access, Base>::RunSteps(Blocks& blocks,
     this->Update(static_cast<float>(step) / static_cast<float>(blocks.size()));
     if (this->IsCancelled()) break;
     RunStep(blocks, step, reader, writer, error);
-    // Deliberate: the blocks still held are neither written nor destroyed, whatever state they are in.
+    // Deliberate: the blocks still held are neither written nor destroyed, whatever state they are
+    // in.
     if (error.IsSet()) throw Exception(error.Get());
   }
 }

@@ -15,12 +15,9 @@ void TARNUpdateStrategy::Report(float fraction, const std::string* message) {
   if (!enabled) return;
   const float p = (end - start) * fraction + start;
   bool ok;
-  if (callback)
-    ok = callback(p, message ? message->c_str() : nullptr, userData) != 0;
-  else if (message)
-    ok = tarn::Counter::Update(p, *message, nullptr);
-  else
-    ok = tarn::Counter::Update(p);
+  if (callback) ok = callback(p, message ? message->c_str() : nullptr, userData) != 0;
+  else if (message) ok = tarn::Counter::Update(p, *message, nullptr);
+  else ok = tarn::Counter::Update(p);
   // Deliberate: a refusal at the very end changes nothing, all the work is done.
   if (!ok && p < 1.0f) cancelled = true;
 }

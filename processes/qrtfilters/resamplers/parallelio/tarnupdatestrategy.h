@@ -27,7 +27,7 @@ class TARNUpdateStrategy : public logging::IAlgorithmStatusManager {
   float start = 0.0f;  ///< of the whole run, where this level begins
   float end = 1.0f;
   bool enabled = true;
-  bool cancelled = false;  ///< never reset
+  bool cancelled = false;       ///< never reset
   Callback callback = nullptr;  ///< null: the host's counter
   void* userData = nullptr;
 

@@ -39,7 +39,8 @@ class MemoryDriver : public ::testing::Test {
     for (const char* name : {"mem:a", "mem:b"}) RemoveMemoryRaster(name);
     FormatRegistry::Instance().Clear();
   }
-  static std::unique_ptr<IDataset> Open(const std::string& name, AccessMode mode = datasources::kUpdate) {
+  static std::unique_ptr<IDataset> Open(const std::string& name,
+                                        AccessMode mode = datasources::kUpdate) {
     return std::unique_ptr<IDataset>(DatasetManager::GetInstance()->Open(name, mode));
   }
   /// Builds a level of one pixel.

@@ -78,8 +78,9 @@ TEST(MemoryLevels, ChannelsOfDifferentTypesOrUnknownOnesAreRefused) {
 TEST(MemoryLevels, ALevelIsMarkedValidOnlyWhenEveryPixelOfTheChannelWasWritten) {
   MemoryLevels levels(Table(), true);
   levels.Create(2, {1, 2}, "NEAREST");
-  EXPECT_EQ("mem:a: level 2 of channel 1 is not complete.",
-            MessageOf([&] { levels.SetValid(2, {1, 2}, true); }));
+  EXPECT_EQ("mem:a: level 2 of channel 1 is not complete.", MessageOf([&] {
+              levels.SetValid(2, {1, 2}, true);
+            }));
   Fill(*levels.OpenWriter(2, {1}), 0, 5);
   Fill(*levels.OpenWriter(2, {2}), 0, 4);
   EXPECT_NO_THROW(levels.SetValid(2, {1}, true));
@@ -116,7 +117,8 @@ TEST(MemoryLevels, MarkingNotValidKeepsThePixels) {
 TEST(MemoryLevels, WhatDoesNotExistCannotBeOpenedOrMarked) {
   MemoryLevels levels(Table(), true);
   levels.Create(2, {1}, "NEAREST");
-  EXPECT_EQ("mem:a: there is no level 3 of channel 1.", MessageOf([&] { levels.OpenWriter(3, {1}); }));
+  EXPECT_EQ("mem:a: there is no level 3 of channel 1.",
+            MessageOf([&] { levels.OpenWriter(3, {1}); }));
   EXPECT_THROW(levels.OpenWriter(2, {2}), Exception);
   EXPECT_THROW(levels.OpenWriter(2, {}), Exception);
   EXPECT_THROW(levels.SetValid(2, {1, 2}, false), Exception);

@@ -61,11 +61,13 @@ TEST_F(Manager, WithoutAFactoryTheFirstBlockIsRefusedEvenWhenAKernelIsThere) {
     FAIL() << "processed";
   } catch (const Exception& e) {
     EXPECT_EQ(
-        "The ResamplerManager has not been setup correctly. Ensure the IResamplerFactory has been set "
+        "The ResamplerManager has not been setup correctly. Ensure the IResamplerFactory has been "
+        "set "
         "for the ResamplerManager before proceeding.",
         e.GetMessage());
     EXPECT_EQ("processes/qrtfilters/resamplers/resamplermanager", e.GetSourceFile());
-    EXPECT_NE(std::string::npos, e.GetFunction().find("orin::resamplers::ResamplerManager::ProcessBlock"));
+    EXPECT_NE(std::string::npos,
+              e.GetFunction().find("orin::resamplers::ResamplerManager::ProcessBlock"));
     EXPECT_NE(std::string::npos, e.GetFunction().find("orin::gobs::Raster"));
     EXPECT_EQ(37u, e.GetLine());
   }
@@ -77,10 +79,10 @@ TEST_F(Manager, EveryBlockGetsANewKernelConfiguredBeforeItResamples) {
   const IRasterResampler* first = manager_.resampler;
   manager_.ProcessBlock(&in_, &out_);
   EXPECT_NE(first, manager_.resampler);
-  EXPECT_THAT(factory_.calls,
-              ElementsAre("Create(8)", "SetRatio(0.5,0.25)", "SetNoDataValue(7)", "SetComplex(false)",
-                          "Resample(no mask)", "Create(8)", "SetRatio(0.5,0.25)", "SetNoDataValue(7)",
-                          "SetComplex(false)", "Resample(no mask)"));
+  EXPECT_THAT(factory_.calls, ElementsAre("Create(8)", "SetRatio(0.5,0.25)", "SetNoDataValue(7)",
+                                          "SetComplex(false)", "Resample(no mask)", "Create(8)",
+                                          "SetRatio(0.5,0.25)", "SetNoDataValue(7)",
+                                          "SetComplex(false)", "Resample(no mask)"));
   EXPECT_EQ(5, out_.data[1]);
 }
 
@@ -107,10 +109,10 @@ TEST_F(Manager, AKernelIsReusedOnlyForABlockWhoseTypeIsAllZero) {
   manager_.ProcessBlock(&in_, &out_);
   manager_.ProcessBlock(&typeless, &typelessOut);
   EXPECT_THAT(factory_.calls,
-              ElementsAre("Create(0)", "SetRatio(0.5,0.25)", "SetNoDataValue(7)", "SetComplex(false)",
-                          "Resample(no mask)", "Resample(no mask)", "Create(8)", "SetRatio(0.5,0.25)",
-                          "SetNoDataValue(7)", "SetComplex(false)", "Resample(no mask)",
-                          "Resample(no mask)"));
+              ElementsAre("Create(0)", "SetRatio(0.5,0.25)", "SetNoDataValue(7)",
+                          "SetComplex(false)", "Resample(no mask)", "Resample(no mask)",
+                          "Create(8)", "SetRatio(0.5,0.25)", "SetNoDataValue(7)",
+                          "SetComplex(false)", "Resample(no mask)", "Resample(no mask)"));
 }
 
 TEST_F(Manager, ARecordedTypeIsComparedInAllSixFields) {
@@ -178,7 +180,9 @@ TEST_F(Manager, WhatTheKernelThrowsPassesThroughWithItsType) {
 
 TEST_F(Manager, WhatTheMaskDecisionThrowsPassesThroughBeforeTheKernelRuns) {
   class Broken final : public gobs::IMaskDecision {
-    void Decide(const Raster&, gobs::Mask&) const override { throw DataException("mask", "m", "M()", 9); }
+    void Decide(const Raster&, gobs::Mask&) const override {
+      throw DataException("mask", "m", "M()", 9);
+    }
   };
   const Broken decision;
   gobs::MaskDecisionBuilder builder(&decision);

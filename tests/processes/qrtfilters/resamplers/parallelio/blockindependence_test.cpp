@@ -65,7 +65,8 @@ struct Step {
   unsigned level;
 };
 
-constexpr Step kSteps[] = {{1, 2}, {1, 3}, {1, 4}, {1, 5}, {1, 7}, {1, 8}, {1, 75}, {2, 4}, {2, 3}, {4, 6}};
+constexpr Step kSteps[] = {{1, 2}, {1, 3},  {1, 4}, {1, 5}, {1, 7},
+                           {1, 8}, {1, 75}, {2, 4}, {2, 3}, {4, 6}};
 
 Samples LevelUnder(const drivers::MemoryRaster& image, resamplers::IResamplerFactory& factory,
                    const Step& step, const Conditions& conditions) {
@@ -90,7 +91,8 @@ class BlockIndependence : public ::testing::TestWithParam<int> {
     datasources::FormatRegistry::Instance().Clear();
   }
   resamplers::IResamplerFactory& Factory() {
-    resamplers::IResamplerFactory* const all[] = {&nearest_, &average_, &mode_, &bilinear_, &bicubic_};
+    resamplers::IResamplerFactory* const all[] = {&nearest_, &average_, &mode_, &bilinear_,
+                                                  &bicubic_};
     return *all[GetParam()];
   }
 

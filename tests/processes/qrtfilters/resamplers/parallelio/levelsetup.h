@@ -29,7 +29,8 @@ struct LevelSetup {
     host.Put("a.tif", orin::testing::NoiseOf(80, height, 1));
     dataset.reset(datasources::DatasetManager::GetInstance()->Open("a.tif", datasources::kUpdate));
     auto* raster = dynamic_cast<datasources::IRasterDataset*>(dataset.get());
-    reader = std::make_unique<datasources::BasicReader>(dataset.get(), std::vector<unsigned>{1}, false);
+    reader =
+        std::make_unique<datasources::BasicReader>(dataset.get(), std::vector<unsigned>{1}, false);
     datasources::BasicOverviewWriterAccessor accessor(raster, {1});
     accessor.CreateLevel(2);
     writer.reset(accessor.CreateRasterWriter(2));
@@ -85,7 +86,9 @@ struct LevelSetup {
 inline std::string ReadLine(unsigned block) {
   return "reader[1]{1}.Read(0," + std::to_string(4 * block) + ",80,4)";
 }
-inline std::string ProcessLine(unsigned block) { return "process(0," + std::to_string(4 * block) + ")"; }
+inline std::string ProcessLine(unsigned block) {
+  return "process(0," + std::to_string(4 * block) + ")";
+}
 inline std::string WriteLine(unsigned block) {
   return "writer[2]{1}.Write(0," + std::to_string(2 * block) + ",40,2)";
 }

@@ -53,7 +53,8 @@ TEST(Pipeline, ProgressIsReportedBeforeEachStepAndAtTheEnd) {
 TEST(Pipeline, ALevelOfOneBlockIsReadProcessedAndWrittenOnce) {
   LevelSetup level(4);
   level.Process();
-  EXPECT_THAT(level.Log(), ElementsAre(ReadLine(0), "Update(0)", ProcessLine(0), WriteLine(0), "Update(1)"));
+  EXPECT_THAT(level.Log(),
+              ElementsAre(ReadLine(0), "Update(0)", ProcessLine(0), WriteLine(0), "Update(1)"));
 }
 
 TEST(Pipeline, NoMoreThanFourBlocksAreAliveAndNoneIsLeft) {

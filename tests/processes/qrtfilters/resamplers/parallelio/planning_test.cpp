@@ -44,8 +44,10 @@ TEST(LevelDriver, DerivesFromItsPoliciesInOrderAndKeepsTheSlotOfThePlanning) {
   const LevelDriver driver;
   const void* const parts[] = {static_cast<const resamplers::ResamplerManager*>(&driver),
                                static_cast<const ResamplerAccessPolicy*>(&driver),
-                               static_cast<const TARNUpdateStrategy*>(&driver), &driver.memoryBudget,
-                               &driver.preloadOutput, &driver.keepOutputMargins};
+                               static_cast<const TARNUpdateStrategy*>(&driver),
+                               &driver.memoryBudget,
+                               &driver.preloadOutput,
+                               &driver.keepOutputMargins};
   for (size_t i = 1; i < std::size(parts); ++i) EXPECT_LT(parts[i - 1], parts[i]) << i;
   EXPECT_EQ(2u, SlotOf(&LevelDriver::ComputeBlocks));  // after the destructor's two
   EXPECT_TRUE(std::has_virtual_destructor_v<ResamplerAccessPolicy>);
@@ -53,8 +55,8 @@ TEST(LevelDriver, DerivesFromItsPoliciesInOrderAndKeepsTheSlotOfThePlanning) {
 
 TEST(BlockJob, FieldsStandInTheirOrderAndHoldNoBlockAtFirst) {
   const BlockJob job;
-  const void* const fields[] = {&job.inputInfo, &job.outputInfo, &job.inputWindow, &job.outputWindow,
-                                &job.raster};
+  const void* const fields[] = {&job.inputInfo, &job.outputInfo, &job.inputWindow,
+                                &job.outputWindow, &job.raster};
   for (size_t i = 1; i < std::size(fields); ++i) EXPECT_LT(fields[i - 1], fields[i]) << i;
   EXPECT_EQ(nullptr, job.raster);
 }
@@ -71,7 +73,7 @@ TEST(Planning, BlocksCoverTheLevelOnceRowByRowAndNoneIsEmpty) {
   FakeRaster source = LevelOf(83, 61, 1);
   FakeRaster target = LevelOf(83, 61, 2);  // 41 x 30
   LevelDriver driver;
-  driver.memoryBudget = 100;               // blocks of 3 x 3
+  driver.memoryBudget = 100;  // blocks of 3 x 3
   const std::vector<BlockJob> blocks = PlanOf(driver, source, target);
   ASSERT_EQ(14u * 10, blocks.size());
   uint32_t x = 0;
@@ -203,7 +205,7 @@ TEST(ResamplerAccessPolicy, PositionsAndSizesAreDividedByTheRatio) {
 }
 
 TEST(ResamplerAccessPolicy, QuotientsAreTruncatedNotRounded) {
-  EXPECT_EQ(Span(7, 12), SourceOf(0.4, 1000, 3, 5));         // 7.5 and 12.5
+  EXPECT_EQ(Span(7, 12), SourceOf(0.4, 1000, 3, 5));  // 7.5 and 12.5
   EXPECT_EQ(Span(9, 3), SourceOf(1.0 / 3, 1000, 3, 1));
   EXPECT_EQ(Span(224, 449), SourceOf(1.0 / 75, 1000, 3, 6));  // just below 225 and 450 in double
 }
@@ -221,8 +223,7 @@ TEST(ResamplerAccessPolicy, BothAxesHaveTheirOwnRatioAndEdge) {
   access.sourceWidth = 100;
   access.sourceHeight = 30;
   ProcessWindow position;
-  const RasterInfo input =
-      access.InputOf({5, 4, 2, DataTypeOf<short>()}, {3, 2, 10, 4}, position);
+  const RasterInfo input = access.InputOf({5, 4, 2, DataTypeOf<short>()}, {3, 2, 10, 4}, position);
   EXPECT_EQ((ProcessWindow{3, 2, 20, 16}), position);
   EXPECT_EQ(10u, input.width);
   EXPECT_EQ(14u, input.height);

@@ -46,7 +46,8 @@ TEST(TARNUpdateStrategy, StartsWithTheWholeRangeEnabledAndGoingOn) {
 
 TEST(TARNUpdateStrategy, FieldsStandInTheirOrder) {
   const TARNUpdateStrategy u;
-  const void* const fields[] = {&u.start, &u.end, &u.enabled, &u.cancelled, &u.callback, &u.userData};
+  const void* const fields[] = {&u.start,     &u.end,      &u.enabled,
+                                &u.cancelled, &u.callback, &u.userData};
   for (size_t i = 1; i < std::size(fields); ++i) EXPECT_LT(fields[i - 1], fields[i]) << i;
 }
 
