@@ -117,8 +117,7 @@ void TiffLevelStore::AddDirectory(unsigned level, const LevelMetadata& metadata,
 void TiffLevelStore::Store(unsigned level, Pending& pending, const std::vector<uint32_t>& planes) {
   const std::shared_ptr<LevelBuild> build = pending.build;
   file_->Sync();
-  file_->Refresh();  // another program may have changed the chain
-  Reload();
+  CatchUp();
   const StoredLevel* ours = FindOurs(level);
   const LevelMetadata metadata = MetadataFor(level, pending, ours);
   if (ours && CanPatch(*ours, metadata, *build)) Patch(*ours, metadata, *build, planes);
