@@ -5,6 +5,7 @@
 
 #include <algorithm>
 #include <array>
+#include <atomic>
 #include <mutex>
 #include <new>
 
@@ -67,9 +68,16 @@ FreeBuffers& Free() {
   return buffers;
 }
 
-}  // namespace
+std::atomic<int> live = 0;
+std::atomic<int> most = 0;
 
-void* AllocateBlock(size_t bytes) {
+void CountOneMore() {
+  const int now = ++live;
+  for (int seen = most; seen < now && !most.compare_exchange_weak(seen, now);) {
+  }
+}
+
+void* Allocate(size_t bytes) {
   if (!kKeepsBuffers || bytes < kLarge) return ::operator new(bytes, kAlignment);
   const size_t capacity = CapacityFor(bytes);
   if (void* kept = Free().Take(capacity)) return kept;
@@ -79,10 +87,23 @@ void* AllocateBlock(size_t bytes) {
   return memory;
 }
 
+}  // namespace
+
+void* AllocateBlock(size_t bytes) {
+  void* memory = Allocate(bytes);
+  CountOneMore();
+  return memory;
+}
+
 void ReleaseBlock(void* memory, size_t bytes) noexcept {
   if (!memory) return;
+  --live;
   if (!kKeepsBuffers || bytes < kLarge) ::operator delete(memory, kAlignment);
   else Free().Put(memory, CapacityFor(bytes));
 }
+
+int LiveBlocks() { return live; }
+int MostLiveBlocks() { return most; }
+void ResetMostLiveBlocks() { most = live.load(); }
 
 }  // namespace orin::gobs

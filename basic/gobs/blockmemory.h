@@ -14,4 +14,10 @@ void* AllocateBlock(size_t bytes);
 /// Gives back what `AllocateBlock` returned for the same `bytes`. Thread-safe; null is ignored.
 void ReleaseBlock(void* memory, size_t bytes) noexcept;
 
+/// Blocks allocated and not yet released, in the whole process.
+int LiveBlocks();
+/// The most that were live at once since the last `ResetMostLiveBlocks`.
+int MostLiveBlocks();
+void ResetMostLiveBlocks();
+
 }  // namespace orin::gobs

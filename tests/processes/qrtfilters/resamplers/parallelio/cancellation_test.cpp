@@ -7,14 +7,14 @@
 namespace orin::parallelio {
 namespace {
 
-using orin::testing::LiveBuffers;
+using orin::gobs::LiveBlocks;
 using ::testing::ElementsAre;
 
 constexpr size_t kBlocks = LevelSetup::kBlocks;
 
 TEST(Cancellation, ARefusalBeforeStepNStopsTheLevelThere) {
   for (size_t step = 0; step < kBlocks; ++step) {
-    const int before = LiveBuffers();
+    const int before = LiveBlocks();
     LevelSetup level;
     level.host.RefuseProgressAt(step + 1);
     EXPECT_NO_THROW(level.Process());
@@ -24,7 +24,7 @@ TEST(Cancellation, ARefusalBeforeStepNStopsTheLevelThere) {
     EXPECT_EQ(step, level.Processed()) << step;
     EXPECT_EQ(step == 0 ? 0 : step - 1, level.Writes()) << step;
     EXPECT_EQ(step + 1, level.host.Progress().size()) << step;  // no report after the refusal
-    EXPECT_EQ(before, LiveBuffers()) << step;
+    EXPECT_EQ(before, LiveBlocks()) << step;
   }
 }
 
@@ -50,7 +50,7 @@ TEST(Cancellation, ARefusalAtTheEndOfALevelThatIsNotTheLastCancelsButAllIsWritte
 }
 
 TEST(Cancellation, ACancelledDriverStaysCancelledAndOnlyReadsTheFirstBlockAgain) {
-  const int before = LiveBuffers();
+  const int before = LiveBlocks();
   LevelSetup level;
   level.host.RefuseProgressAt(2);
   level.Process();
@@ -58,7 +58,7 @@ TEST(Cancellation, ACancelledDriverStaysCancelledAndOnlyReadsTheFirstBlockAgain)
   level.Process();
   EXPECT_THAT(level.Log(), ElementsAre(ReadLine(0)));
   EXPECT_FALSE(level.driver.HasWrittenAll());
-  EXPECT_EQ(before, LiveBuffers());
+  EXPECT_EQ(before, LiveBlocks());
 }
 
 TEST(Cancellation, ALaterLevelForgetsThatTheOneBeforeWasWritten) {

@@ -9,12 +9,12 @@
 #include <string>
 #include <vector>
 
+#include "basic/gobs/blockmemory.h"
 #include "host/datasources/basicreader.h"
 #include "host/datasources/datasetmanager.h"
 #include "host/datasources/overviewaccessors.h"
 #include "processes/qrtfilters/resamplers/parallelio/filteriodriver.h"
 #include "tests/testing/fakekernel.h"
-#include "tests/testing/livebuffers.h"
 #include "tests/testing/pictures.h"
 #include "tests/testing/recordinghost.h"
 

@@ -10,9 +10,9 @@ namespace orin::parallelio {
 namespace {
 
 using gobs::Raster;
-using orin::testing::LiveBuffers;
-using orin::testing::MostBuffers;
-using orin::testing::ResetMostBuffers;
+using orin::gobs::LiveBlocks;
+using orin::gobs::MostLiveBlocks;
+using orin::gobs::ResetMostLiveBlocks;
 using ::testing::ElementsAre;
 
 TEST(Pipeline, ABlockIsReadThenProcessedThenWritten) {
@@ -58,13 +58,13 @@ TEST(Pipeline, ALevelOfOneBlockIsReadProcessedAndWrittenOnce) {
 }
 
 TEST(Pipeline, NoMoreThanFourBlocksAreAliveAndNoneIsLeft) {
-  const int before = LiveBuffers();
+  const int before = LiveBlocks();
   LevelSetup level(80);
-  ResetMostBuffers();
+  ResetMostLiveBlocks();
   level.Process();
-  EXPECT_LE(MostBuffers() - before, 4);
-  EXPECT_GE(MostBuffers() - before, 2);
-  EXPECT_EQ(before, LiveBuffers());
+  EXPECT_LE(MostLiveBlocks() - before, 4);
+  EXPECT_GE(MostLiveBlocks() - before, 2);
+  EXPECT_EQ(before, LiveBlocks());
 }
 
 TEST(Pipeline, BlocksOfTheWindowThatWasPlannedReachKernelAndWriter) {
