@@ -19,10 +19,6 @@ using datasources::IDataset;
 using datasources::IRasterDataset;
 using datasources::LevelDescription;
 
-std::string FormatNameOf(const IDataset& dataset) {
-  return std::unique_ptr<datasources::IFormatDescriptor>(dataset.GetFormatDescriptor())->GetName();
-}
-
 std::unique_ptr<IDataset> Open(const std::string& file, AccessMode mode) {
   return std::unique_ptr<IDataset>(DatasetManager::GetInstance()->Open(file, mode));
 }
@@ -100,8 +96,9 @@ BuildPlan PlanBuild(const BuildOptions& options, const std::string& file) {
   plan.height = raster.GetHeight();
   plan.channelCount = raster.GetChannelCount();
   plan.channels = ChannelsToTreat(raster, options.channels);
-  plan.report = FormatNameOf(*dataset).find("TIFF") == std::string::npos ? LevelReport::kWithinShare
-                                                                         : LevelReport::kToTheEnd;
+  plan.report = datasources::FormatNameOf(*dataset).find("TIFF") == std::string::npos
+                    ? LevelReport::kWithinShare
+                    : LevelReport::kToTheEnd;
   std::vector<unsigned> requested = RequestedLevels(options, raster);
   std::sort(requested.begin(), requested.end());
   plan.requested = AscendingOnce(requested);

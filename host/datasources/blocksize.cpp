@@ -35,11 +35,16 @@ bool IsExact(const Scale& scale, unsigned length) {
 }
 
 /// Edge of the blocks of a scale without exact arithmetic: the largest power of two whose source
-/// edge stays within 1024 pixels, in whole steps. Deliberate: no other block size gives the same
-/// pixels.
-uint64_t FixedEdge(const Scale& scale) {
+/// edge stays within 1024 pixels, less where pixels of many channels would make a source block
+/// larger than 64 MiB, in whole steps. Deliberate: no other block size gives the same pixels.
+uint64_t FixedEdge(const Scale& scale, const IRasterReader& reader) {
+  constexpr double kMostBytes = 64 << 20;
+  const double pixelBytes = double(reader.GetChannelCount()) *
+                            BytesPerComponent(reader.GetDataType()) *
+                            ComponentsPerSample(reader.GetDataType());
+  const double most = std::min(1024.0, std::sqrt(kMostBytes / std::max(pixelBytes, 1.0)));
   uint64_t edge = 256;
-  while (edge > 1 && double(edge) / scale.Ratio() > 1024) edge /= 2;
+  while (edge > 1 && double(edge) / scale.Ratio() > most) edge /= 2;
   return RoundUp(edge, scale.Step());
 }
 
@@ -101,7 +106,7 @@ void FindOptimalRasterSize(orin::datasources::IRasterReader* reader,
   const Scale scale{std::max(reader->GetLevel(), 1u), std::max(writer->GetLevel(), 1u)};
   const bool exact = IsExact(scale, std::max(writer->GetWidth(), writer->GetHeight()));
   const Size block = exact ? BlockWithin(pixelBudget, *reader, *writer, scale)
-                           : Size{FixedEdge(scale), FixedEdge(scale)};
+                           : Size{FixedEdge(scale, *reader), FixedEdge(scale, *reader)};
   width = static_cast<unsigned>(std::max<uint64_t>(1, block.width));
   height = static_cast<unsigned>(std::max<uint64_t>(1, block.height));
 }

@@ -6,6 +6,7 @@
 
 #include "host/datasources/channelinfo.h"
 #include "host/datasources/overviewinfo.h"
+#include "host/services/autoptr.h"
 
 namespace orin::datasources {
 
@@ -37,6 +38,11 @@ class IDataset {
   /// True when the dataset holds pixels, which a dynamic cast to `IRasterDataset` reaches.
   virtual bool IsRaster() const = 0;
 };
+
+/// The name of the format through which `dataset` is open.
+inline std::string FormatNameOf(const IDataset& dataset) {
+  return HAutoPtr<IFormatDescriptor>(dataset.GetFormatDescriptor())->GetName();
+}
 
 class IRasterDataset : public IDataset {
  public:

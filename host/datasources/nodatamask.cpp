@@ -91,6 +91,15 @@ class EqualsNoData final : public orin::gobs::IMaskDecision {
   bool possible_ = true;
 };
 
+/// Without blanks around it and without a plus sign, which number parsing does not take.
+std::string Trimmed(const std::string& text) {
+  constexpr char kBlanks[] = " \t\r\n";
+  const size_t first = text.find_first_not_of(kBlanks);
+  if (first == std::string::npos) return "";
+  const size_t start = text[first] == '+' ? first + 1 : first;
+  return text.substr(start, text.find_last_not_of(kBlanks) + 1 - start);
+}
+
 /// The reader's no-data texts, one a channel; nothing when no channel has one.
 std::optional<std::vector<std::string>> DeclaredTexts(const IRasterReader& reader) {
   const AuxiliaryData metadata = reader.GetAuxiliaryData();
@@ -99,7 +108,7 @@ std::optional<std::vector<std::string>> DeclaredTexts(const IRasterReader& reade
   bool any = false;
   for (unsigned channel = 1; channel <= reader.GetChannelCount(); ++channel) {
     std::string own = metadata.GetChanMetadataValue(orin::datasources::kNoDataKey, channel);
-    texts.push_back(own.empty() ? file : std::move(own));
+    texts.push_back(Trimmed(own.empty() ? file : own));
     any = any || IsFiniteNumber(texts.back());
   }
   if (!any) return std::nullopt;

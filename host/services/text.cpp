@@ -5,6 +5,7 @@
 
 #include <cstdarg>
 #include <cstdio>
+#include <optional>
 
 #include "host/services/exception.h"
 
@@ -12,17 +13,22 @@ namespace {
 
 constexpr char kDomain[] = "orin-overviews";
 
-std::string Format(const char* format, va_list arguments) {
+/// Nothing when the format cannot be applied.
+std::optional<std::string> Format(const char* format, va_list arguments) {
   va_list again;
   va_copy(again, arguments);
   const int length = std::vsnprintf(nullptr, 0, format, again);
   va_end(again);
-  if (length < 0)
-    throw orin::Exception(std::string("The text cannot be formatted: ") + format,
-                          "host/services/text", "std::string FormatString(const char*, ...)", 0);
+  if (length < 0) return std::nullopt;
   std::string text(static_cast<size_t>(length), '\0');
   std::vsnprintf(text.data(), text.size() + 1, format, arguments);
   return text;
+}
+
+std::string TextOrThrow(const std::optional<std::string>& text, const char* format) {
+  if (text) return *text;
+  throw orin::Exception(std::string("The text cannot be formatted: ") + format,
+                        "host/services/text", "std::string FormatString(const char*, ...)", 0);
 }
 
 }  // namespace
@@ -30,27 +36,17 @@ std::string Format(const char* format, va_list arguments) {
 std::string FormatString(const char* format, ...) {
   va_list arguments;
   va_start(arguments, format);
-  try {
-    std::string text = Format(format, arguments);
-    va_end(arguments);
-    return text;
-  } catch (...) {
-    va_end(arguments);
-    throw;
-  }
+  const std::optional<std::string> text = Format(format, arguments);
+  va_end(arguments);
+  return TextOrThrow(text, format);
 }
 
 std::string MkString(const char* format, ...) {
   va_list arguments;
   va_start(arguments, format);
-  try {
-    std::string text = Format(format, arguments);
-    va_end(arguments);
-    return text;
-  } catch (...) {
-    va_end(arguments);
-    throw;
-  }
+  const std::optional<std::string> text = Format(format, arguments);
+  va_end(arguments);
+  return TextOrThrow(text, format);
 }
 
 char* _(const char* text) {

@@ -39,11 +39,6 @@ HAutoPtr<IDataset> TryOpenGenerically(const std::string& name, AccessMode access
   }
 }
 
-std::string FormatNameOf(const IDataset& dataset) {
-  const HAutoPtr<orin::datasources::IFormatDescriptor> format(dataset.GetFormatDescriptor());
-  return format->GetName();
-}
-
 }  // namespace
 
 // Deliberate: only the constructors that name a file ask for the user's factor.
@@ -94,7 +89,8 @@ bool CreateFileOverviews::OpenDataset(const std::string& name, IDataset** out) c
   const bool readOnly = !dataset;
   if (readOnly) dataset = TryOpen(name, orin::datasources::kReadOnly);
   if (!dataset) return readOnly;
-  const bool alreadyGeneric = FormatNameOf(*dataset).find("ZMB") != std::string::npos;
+  const bool alreadyGeneric =
+      orin::datasources::FormatNameOf(*dataset).find("ZMB") != std::string::npos;
   const bool outside =
       automatic_ ? readOnly || !SupportsInternalOverviews(dataset.get()) : external_;
   if (!alreadyGeneric && outside) {

@@ -38,11 +38,6 @@ bool FailWith(const orin::Exception& exception) {
   return Fail(_("Failed to create overviews.\n") + exception.GetMessage(), 913);
 }
 
-std::string FormatNameOf(const IDataset& dataset) {
-  const HAutoPtr<orin::datasources::IFormatDescriptor> format(dataset.GetFormatDescriptor());
-  return format->GetName();
-}
-
 Channels AllChannels(unsigned count) {
   Channels channels(count);
   std::iota(channels.begin(), channels.end(), 1u);
@@ -205,7 +200,7 @@ bool CreateFileOverviews::CreateOverviews(IDataset** dataset, bool readOnly,
                                           std::vector<unsigned>& levels) {
   auto* raster = dynamic_cast<IRasterDataset*>(*dataset);
   if (!raster) return false;
-  const bool isTiff = FormatNameOf(**dataset).find("TIFF") != std::string::npos;
+  const bool isTiff = orin::datasources::FormatNameOf(**dataset).find("TIFF") != std::string::npos;
   if (channels_.empty()) AppendDefaultChannels(*raster, channels_);
   else if (!CheckChannels(channels_, raster->GetChannelCount())) return false;
   if (!CheckLevels(levels, *raster, force_)) return false;

@@ -39,6 +39,7 @@ unsigned SmallestValidLevel(IRasterDataset* raster, const std::vector<unsigned>&
 }
 
 bool HasEnough(IRasterDataset* raster, const std::vector<unsigned>& channels, int factor) {
+  const HAutoPtr<orin::datasources::IFormatDescriptor> notConsulted(raster->GetFormatDescriptor());
   unsigned step = SmallestValidLevel(raster, channels);
   if (step < 2) step = PyramidFactorOrDefault(factor);
   const orin::datasources::BasicReader reader(raster, {1}, false);

@@ -87,6 +87,8 @@ Appender::Appender(PositionedFile& file, bool isBig, ByteOrder byteOrder)
 
 uint64_t Appender::Reserve(uint64_t bytes) {
   const std::lock_guard lock(mutex_);
+  const uint64_t size = file_.Size();
+  if (size > end_) end_ = kept_ = size;  // the bytes of another program
   const uint64_t position = EvenFrom(end_);
   if (!isBig_ && (position > kClassicLimit || bytes > kClassicLimit - position))
     throw Exception(
@@ -126,9 +128,14 @@ uint64_t Appender::End() const {
   return end_;
 }
 
+void Appender::Keep() {
+  const std::lock_guard lock(mutex_);
+  kept_ = end_;
+}
+
 void Appender::CutBackTo(uint64_t end) {
   const std::lock_guard lock(mutex_);
-  if (file_.Size() > end_) return;
+  if (end < kept_ || file_.Size() > end_) return;
   file_.Truncate(end);
   end_ = end;
 }

@@ -24,7 +24,8 @@ NewEntry NumbersEntry(uint16_t tag, uint16_t type, const std::vector<uint64_t>& 
 /// An entry of text, with its closing zero.
 NewEntry TextEntry(uint16_t tag, const std::string& text);
 
-/// Nothing that the file held is changed, but for `Link`. Appending is safe from several threads.
+/// Nothing that the file holds is changed, but for `Link`: bytes that another program adds
+/// meanwhile are left alone too. Appending is safe from several threads.
 class Appender {
  public:
   /// \param file  open for update; outlives the appender
@@ -41,7 +42,9 @@ class Appender {
 
   /// Where the next bytes go.
   uint64_t End() const;
-  /// Gives up everything from `end` on, unless another program has added to the file meanwhile.
+  /// Something in the file refers to what was appended so far: it is never given up.
+  void Keep();
+  /// Gives up everything from `end` on, unless some of it is kept or another program's.
   void CutBackTo(uint64_t end);
 
  private:
@@ -52,6 +55,7 @@ class Appender {
   ByteOrder byteOrder_;
   mutable std::mutex mutex_;
   uint64_t end_;
+  uint64_t kept_ = 0;  ///< the file is never cut before this
 };
 
 }  // namespace orin::drivers

@@ -5,10 +5,9 @@
 
 namespace orin::drivers {
 
-LevelBuild::LevelBuild(const LevelCoding& coding, uint64_t firstEnd, unsigned links)
+LevelBuild::LevelBuild(const LevelCoding& coding, uint64_t firstEnd)
     : coding_(coding),
       firstEnd_(firstEnd),
-      links_(links),
       tilesPerPlane_(coding.format.TilesPerPlane()),
       places_(tilesPerPlane_ * coding.Planes()),
       isWritten_(places_.size()),

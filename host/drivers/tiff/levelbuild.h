@@ -19,12 +19,10 @@ struct TilePlace {
 class LevelBuild {
  public:
   /// \param firstEnd   where the file ended before the first tile
-  /// \param links      of the file at that time
-  LevelBuild(const LevelCoding& coding, uint64_t firstEnd, unsigned links);
+  LevelBuild(const LevelCoding& coding, uint64_t firstEnd);
 
   const LevelCoding& Coding() const { return coding_; }
   uint64_t FirstEnd() const { return firstEnd_; }
-  unsigned Links() const { return links_; }
 
   void Record(uint64_t tile, TilePlace place);
   /// The tile is being written anew, and not complete until it is recorded again.
@@ -45,7 +43,6 @@ class LevelBuild {
  private:
   LevelCoding coding_;
   uint64_t firstEnd_;
-  unsigned links_;
   uint64_t tilesPerPlane_;
   std::vector<TilePlace> places_;
   std::vector<bool> isWritten_;

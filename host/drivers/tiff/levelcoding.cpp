@@ -149,6 +149,8 @@ LevelCoding CodingOfLevel(const LevelCoding& image, unsigned level, const std::s
   const bool keepsTiles = image.format.tiled && format.tileWidth % 16 == 0 &&
                           format.tileHeight % 16 == 0 && coding.TileBytes() <= kMostTileBytes;
   if (!keepsTiles) format.tileWidth = format.tileHeight = kTileEdge;
+  while (!keepsTiles && format.tileWidth > 16 && coding.TileBytes() > kMostTileBytes)
+    format.tileWidth = format.tileHeight = format.tileWidth / 2;
   format.tiled = true;
   format.fillOrder = FILLORDER_MSB2LSB;
   if (format.TilesPerPlane() > kMostTiles / coding.Planes())

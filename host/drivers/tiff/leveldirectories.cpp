@@ -45,7 +45,8 @@ bool IsReduced(uint64_t subfile) { return (subfile & FILETYPE_REDUCEDIMAGE) != 0
 void ReadMetadata(const PositionedFile& file, const TiffStructure& structure,
                   const TiffDirectory& directory, StoredLevel& stored) {
   const TiffEntry* entry = directory.Find(TIFFTAG_GDAL_METADATA);
-  if (!entry) return;
+  constexpr uint64_t kMostBytes = 1 << 20;  // ours takes a few hundred
+  if (!entry || entry->bytes > kMostBytes) return;
   const std::vector<uint8_t> bytes = ReadBytes(file, structure, *entry);
   stored.metadata = ParseLevelMetadata(std::string(bytes.begin(), bytes.end()));
   stored.validityPosition = entry->position + stored.metadata.validityAt;

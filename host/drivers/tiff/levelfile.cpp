@@ -50,13 +50,22 @@ void LevelFile::OpenForChange() {
     throw Exception(
         FormatString(_("%s: is open for reading only; no level can be written."), path_.c_str()),
         "host/drivers/tiff/levelfile", "LevelFile::OpenForChange()", 0);
-  if (isMade_) file_ = std::make_unique<PositionedFile>(path_, PositionedFile::Mode::kUpdate);
-  else Make();
+  if (isMade_) {
+    auto changed = std::make_unique<PositionedFile>(path_, PositionedFile::Mode::kUpdate);
+    changed->Lock();
+    file_ = std::move(changed);
+    Refresh();  // another program may have changed the chain before
+  } else {
+    Make();
+  }
   appender_ = std::make_unique<Appender>(*file_, structure_.isBig, structure_.byteOrder);
 }
 
 void LevelFile::Make() {
-  file_ = std::make_unique<PositionedFile>(path_ + kPartial, PositionedFile::Mode::kCreate);
+  auto made = std::make_unique<PositionedFile>(path_ + kPartial, PositionedFile::Mode::kCreate);
+  made->Lock();
+  made->Truncate(0);  // what a build that was killed left behind
+  file_ = std::move(made);
   const std::vector<uint8_t> header = EmptyHeader(structure_);
   file_->Write(0, header.data(), header.size());
 }
@@ -95,14 +104,18 @@ void LevelFile::Link(const Place& place, uint64_t directory) {
   OpenForChange();
   file_->Sync();
   if (isMade_) DeclareEdited();
+  Keep();  // first: a link that fails half-way may point there already
   appender_->Link(place.linkPosition, directory);
   file_->Sync();
-  ++links_;
   if (!isMade_) {
     file_->Rename(path_);
     isMade_ = true;
   }
   structure_ = ParseStructure(*file_);
+}
+
+void LevelFile::Keep() {
+  if (appender_) appender_->Keep();
 }
 
 void LevelFile::CutBackTo(uint64_t end) {

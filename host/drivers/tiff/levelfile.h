@@ -43,9 +43,10 @@ class LevelFile {
   /// structure is read again.
   void Link(const Place& place, uint64_t directory);
 
-  /// How often something was linked.
-  unsigned Links() const { return links_; }
-  /// Gives up everything from `end` on; a file that is not yet made goes altogether.
+  /// Something in the file refers to what was appended so far.
+  void Keep();
+  /// Gives up everything from `end` on unless some of it is kept; a file that is not yet made goes
+  /// altogether.
   void CutBackTo(uint64_t end);
 
  private:
@@ -57,7 +58,6 @@ class LevelFile {
   std::string path_;
   bool mayChange_ = false;
   bool isMade_ = false;
-  unsigned links_ = 0;
   TiffStructure structure_;
   std::unique_ptr<PositionedFile> file_;
   std::unique_ptr<Appender> appender_;  // null until the first change

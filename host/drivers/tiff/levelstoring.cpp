@@ -49,13 +49,16 @@ LevelMetadata TiffLevelStore::MetadataFor(unsigned level, const Pending& pending
   return metadata;
 }
 
-/// What is in the directory already stays there: size of numbers, texts, and all but validity.
+/// What is in the directory already stays there: size of numbers, texts, and all but validity. No
+/// channel that stays valid has its tiles in the part that changes: that takes several writes.
 bool TiffLevelStore::CanPatch(const StoredLevel& stored, const LevelMetadata& metadata,
                               const LevelBuild& build) const {
   const LevelMetadata& old = stored.metadata;
   if (old.method != metadata.method || old.sourceLevel != metadata.sourceLevel ||
       old.program != metadata.program)
     return false;
+  const bool sharesTiles = !build.Coding().format.planar;
+  if (sharesTiles && metadata.validity.find(kValid) != std::string::npos) return false;
   const TiffStructure& structure = file_->Structure();
   return std::all_of(std::begin(kTables), std::end(kTables), [&](const TileTable& table) {
     const TiffEntry* entry = structure.directories[stored.index].Find(table.tag);
@@ -71,6 +74,7 @@ void TiffLevelStore::Patch(const StoredLevel& stored, const LevelMetadata& metad
   const uint64_t tiles = build.TilesPerPlane();
   file_->Overwrite(stored.validityPosition, metadata.validity);
   file_->Sync();
+  file_->Keep();
   for (const TileTable& table : kTables) {
     const TiffEntry* entry = structure.directories[stored.index].Find(table.tag);
     for (const uint32_t plane : planes) {
@@ -113,8 +117,7 @@ void TiffLevelStore::AddDirectory(unsigned level, const LevelMetadata& metadata,
 void TiffLevelStore::Store(unsigned level, Pending& pending, const std::vector<uint32_t>& planes) {
   const std::shared_ptr<LevelBuild> build = pending.build;
   file_->Sync();
-  file_->Refresh();  // another program may have changed the chain
-  Reload();
+  CatchUp();
   const StoredLevel* ours = FindOurs(level);
   const LevelMetadata metadata = MetadataFor(level, pending, ours);
   if (ours && CanPatch(*ours, metadata, *build)) Patch(*ours, metadata, *build, planes);

@@ -3,6 +3,7 @@
 
 #include <algorithm>
 #include <cstring>
+#include <functional>
 #include <numeric>
 #include <utility>
 
@@ -111,9 +112,10 @@ void LevelWriter::CopyPixels(const Raster& block, const Piece& piece,
                              const std::vector<unsigned>& positions, OpenTile& to) const {
   const uint64_t sample = format_.SampleBytes();
   const uint64_t pixel = sample * format_.TileSamples();
-  const bool areWholePixels = positions.size() == format_.TileSamples() &&
-                              positions.size() == channels_.size() &&
-                              std::is_sorted(channels_.begin(), channels_.end());
+  const bool areWholePixels =
+      positions.size() == format_.TileSamples() && positions.size() == channels_.size() &&
+      std::adjacent_find(channels_.begin(), channels_.end(), std::greater_equal<>()) ==
+          channels_.end();
   for (uint32_t row = 0; row < piece.height; ++row) {
     const uint64_t first =
         uint64_t{piece.y - piece.tileY + row} * format_.tileWidth + (piece.x - piece.tileX);

@@ -8,6 +8,7 @@
 #include <utility>
 
 #include <fcntl.h>
+#include <sys/file.h>
 #include <sys/stat.h>
 #include <unistd.h>
 
@@ -37,7 +38,7 @@ int FlagsOf(PositionedFile::Mode mode) {
     case PositionedFile::Mode::kCreate:
       break;
   }
-  return O_RDWR | O_CREAT | O_TRUNC;
+  return O_RDWR | O_CREAT;
 }
 
 }  // namespace
@@ -51,6 +52,15 @@ PositionedFile::PositionedFile(std::string path, Mode mode)
 }
 
 PositionedFile::~PositionedFile() { close(descriptor_); }
+
+void PositionedFile::Lock() {
+  // A file system without locks is none to refuse work on.
+  if (flock(descriptor_, LOCK_EX | LOCK_NB) == 0 || errno != EWOULDBLOCK) return;
+  throw Exception(FormatString(_("%s: another build is writing levels into it. Wait until it is "
+                                 "finished, then run again."),
+                               path_.c_str()),
+                  "host/drivers/tiff/positionedfile", "PositionedFile::Lock()", 0);
+}
 
 uint64_t PositionedFile::Size() const {
   struct stat status;

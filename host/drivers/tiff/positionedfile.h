@@ -15,7 +15,7 @@ class PositionedFile {
   enum class Mode {
     kRead,
     kUpdate,
-    kCreate  ///< made, or emptied when it is there
+    kCreate  ///< made when it is not there
   };
 
   /// \throws orin::Exception  it cannot be opened in that mode
@@ -34,6 +34,9 @@ class PositionedFile {
   /// Returns when everything written is on the storage device.
   void Sync();
   void Truncate(uint64_t size);
+  /// Keeps other programs that ask for it from changing the file, until this object goes.
+  /// \throws orin::Exception  another one has it
+  void Lock();
   /// Gives the file its new name, replacing what has it, and makes the name durable.
   void Rename(const std::string& path);
 

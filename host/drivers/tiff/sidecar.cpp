@@ -18,7 +18,7 @@ using datasources::IRasterSource;
 gobs::DataType LevelTypeOf(const IRasterSource& image) {
   for (unsigned channel = 1; channel <= image.ChannelCount(); ++channel)
     if (image.TypeOf(channel).bits > 1) return image.TypeOf(channel);
-  return image.TypeOf(1);
+  return image.ChannelCount() == 0 ? gobs::eDT_8U : image.TypeOf(1);
 }
 
 LevelCoding CodingOfImage(const IRasterSource& image) {

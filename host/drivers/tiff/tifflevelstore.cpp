@@ -34,6 +34,14 @@ void TiffLevelStore::Reload() {
   if (file_->Exists()) levels_ = FindLevels(file_->File(), file_->Structure(), settings_.image);
 }
 
+/// Opens the file for changes and looks again where everything stands: another program may have
+/// moved it since the file was opened.
+void TiffLevelStore::CatchUp() {
+  file_->ToAppend();
+  file_->Refresh();
+  Reload();
+}
+
 void TiffLevelStore::Fail(const char* format, unsigned level, const char* operation) const {
   throw Exception(FormatString(format, file_->Path().c_str(), level),
                   "host/drivers/tiff/tifflevelstore",
@@ -201,6 +209,7 @@ void TiffLevelStore::Mark(const StoredLevel& stored, const std::vector<unsigned>
 std::shared_ptr<LevelBuild> TiffLevelStore::BeginWriting(unsigned level,
                                                          const std::vector<unsigned>& channels) {
   const std::lock_guard lock(mutex_);
+  CatchUp();
   Pending& pending = Reopen(level, channels);
   const StoredLevel* ours = FindOurs(level);
   std::vector<unsigned> valid;
@@ -208,8 +217,7 @@ std::shared_ptr<LevelBuild> TiffLevelStore::BeginWriting(unsigned level,
     if (ours && ours->metadata.validity[channel - 1] == kValid) valid.push_back(channel);
   if (!valid.empty()) Mark(*ours, valid, kInvalid);
   if (!pending.build)
-    pending.build =
-        std::make_shared<LevelBuild>(pending.coding, file_->ToAppend().End(), file_->Links());
+    pending.build = std::make_shared<LevelBuild>(pending.coding, file_->ToAppend().End());
   ++pending.build->writers;
   return pending.build;
 }
@@ -228,7 +236,7 @@ void TiffLevelStore::GiveUp(unsigned level, LevelBuild& build) {
   pending_.erase(level);
   const bool isLast = std::none_of(pending_.begin(), pending_.end(),
                                    [](const auto& entry) { return entry.second.build != nullptr; });
-  if (isLast && build.Links() == file_->Links()) file_->CutBackTo(build.FirstEnd());
+  if (isLast) file_->CutBackTo(build.FirstEnd());
 }
 
 void TiffLevelStore::EndWriting(unsigned level, LevelBuild& build) noexcept {
@@ -257,6 +265,8 @@ void TiffLevelStore::SetValid(unsigned level, const std::vector<unsigned>& chann
       if (!pending->second.build->IsComplete(plane))
         Fail(_("%s: level %u is not complete and cannot be marked valid."), level, "SetValid");
     Store(level, pending->second, planes);
+  } else if (file_->Exists()) {
+    CatchUp();
   }
   const StoredLevel* stored = Find(level);
   RequireStored(stored, level, channels);

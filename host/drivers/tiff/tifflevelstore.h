@@ -73,6 +73,7 @@ class TiffLevelStore final : public datasources::ILevelStore {
   const StoredLevel* Find(unsigned level) const;
   const StoredLevel* FindOurs(unsigned level) const;
   void Reload();
+  void CatchUp();
   datasources::LevelDescription Describe(const StoredLevel& stored) const;
   void AddPending(unsigned level, const Pending& pending,
                   std::vector<datasources::LevelDescription>& list) const;

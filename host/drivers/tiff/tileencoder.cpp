@@ -75,6 +75,12 @@ unsigned StoredUnit(const PixelFormat& format) {
   return format.bitsPerSample == 24 ? 3 : 1;  // libtiff takes 24 bits for a number
 }
 
+/// libtiff turns 16-bit words round, and so the two bytes of a complex sample, which have no order.
+bool ExchangesParts(const LevelCoding& coding) {
+  return coding.byteOrder.IsSwapped() && coding.format.type.isComplex &&
+         coding.format.bitsPerSample == 16;
+}
+
 }  // namespace
 
 TileEncoder::TileEncoder(const LevelCoding& coding, std::string file)
@@ -99,6 +105,8 @@ std::vector<uint8_t> TileEncoder::Encode(const std::vector<uint8_t>& samples,
     coding_.byteOrder.Swap(packed, StoredUnit(coding_.format));
     return packed;
   }
+  if (ExchangesParts(coding_))
+    for (size_t i = 0; i + 1 < packed.size(); i += 2) std::swap(packed[i], packed[i + 1]);
   const MemoryTiff memory(coding_.byteOrder.order, file_);
   if (!SetLayout(memory.Get(), coding_) || !SetCodec(memory.Get(), coding_)) memory.Fail();
   const auto size = static_cast<tmsize_t>(packed.size());

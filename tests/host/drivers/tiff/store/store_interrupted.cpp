@@ -3,6 +3,7 @@
 #include <sys/wait.h>
 #include <unistd.h>
 
+#include "host/services/exception.h"
 #include "tests/host/drivers/tiff/store/storesupport.h"
 
 namespace orin::tests {
@@ -51,6 +52,34 @@ TEST_F(Interrupted, BuildLeavesTheFileAsItWas) {
            .marksValid = false});
     EXPECT_EQ(before, BytesOf(file_)) << "stopped before block " << stop;
   }
+}
+
+TEST_F(Interrupted, TheSecondOfTwoBuildsAtOnceIsRefusedAndTheFirstOneFinishes) {
+  const auto first = Open(file_, datasources::kUpdate);
+  const auto second = Open(file_, datasources::kUpdate);
+  datasources::BasicOverviewWriterAccessor toFirst(first.get(), {1, 2, 3});
+  datasources::BasicOverviewWriterAccessor toSecond(second.get(), {1, 2, 3});
+  for (auto* accessor : {&toFirst, &toSecond}) {
+    accessor->SetResamplingName("NEAREST");
+    accessor->CreateLevel(2);
+  }
+  const std::unique_ptr<IRasterWriter> writer(toFirst.CreateRasterWriter(2));
+  const std::unique_ptr<IRasterWriter> other(toSecond.CreateRasterWriter(2));
+  bool isRefused = false;
+  WriteBlocks(*writer, LevelLayout(kImage, 2), 40, [&](unsigned block) {
+    if (block != 1) return true;
+    try {
+      WriteBlocks(*other, LevelLayout(kImage, 2), 40, [](unsigned) { return true; });
+    } catch (const orin::Exception& refusal) {
+      isRefused = refusal.GetMessage().find("another build is writing") != std::string::npos;
+    }
+    return true;
+  });
+  toFirst.SetLevelValid(2, true);
+  EXPECT_TRUE(isRefused);
+  const auto levels = LevelsOf(*Open(file_, datasources::kReadOnly));
+  ASSERT_EQ(1u, levels.size());
+  EXPECT_EQ(std::vector<bool>(3, true), levels[0].validChannels);
 }
 
 TEST_F(Interrupted, BuildOfALaterLevelLeavesTheEarlierOnes) {
@@ -108,6 +137,20 @@ TEST_F(Interrupted, KilledRebuildIsNotValidAndStillHoldsTheOldPixels) {
     }
   Build(file_, kImage, {.level = 2, .method = "AVERAGE"});
   EXPECT_EQ("111", ValidityOf(LevelsOf(file_).at(0)));
+}
+
+TEST_F(Interrupted, BuildTakesNoTileOfALevelThatIsRebuiltMeanwhile) {
+  Build(file_, kImage, {.level = 2});
+  const auto dataset = Open(file_, datasources::kUpdate);
+  datasources::BasicOverviewWriterAccessor accessor(dataset.get(), {1, 2, 3});
+  accessor.CreateLevel(4);
+  {
+    const std::unique_ptr<IRasterWriter> writer(accessor.CreateRasterWriter(4));
+    WriteBlocks(*writer, LevelLayout(kImage, 4), 32, [](unsigned block) { return block < 1; });
+    Build(*dataset, kImage, {.level = 2});
+  }
+  EXPECT_EQ("111", ValidityOf(LevelsOf(file_).at(0)));
+  EXPECT_EQ("", WrongTile(file_, 1, LevelLayout(kImage, 2)));
 }
 
 TEST_F(Interrupted, SomeChannelsOfAPlanarLevelAreKeptWhenOthersAreGivenUp) {

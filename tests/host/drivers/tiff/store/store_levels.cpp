@@ -118,6 +118,19 @@ TEST_P(EveryKind, OfImageKeepsItsLevelsPixels) {
 INSTANTIATE_TEST_SUITE_P(, EveryKind, ::testing::ValuesIn(Kinds()),
                          [](const auto& kind) { return kind.param.name; });
 
+TEST_F(TiffStore, ComplexSamplesOfTwoBytesComeBackFromAFileOfTheOtherByteOrder) {
+  for (const uint16_t compression : {COMPRESSION_NONE, COMPRESSION_ADOBE_DEFLATE})
+    for (const char* mode : {"wl", "wb"}) {
+      Layout layout = Grey(16, SAMPLEFORMAT_COMPLEXINT);
+      layout.compression = compression;
+      layout.mode = mode;
+      const std::string file = folder_.File("image.tif");
+      WriteImage(file, layout);
+      Build(file, layout, {.level = 2});
+      EXPECT_EQ("", WrongPixels(file, layout, 2)) << mode << ", compression " << compression;
+    }
+}
+
 /// A smooth image, which lossy codecs keep well.
 TEST_F(TiffStore, JpegLevelKeepsYCbCrAndItsTilesStandAlone) {
   Layout layout = Rgb();

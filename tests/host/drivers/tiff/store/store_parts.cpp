@@ -132,6 +132,44 @@ TEST_F(Parts, BytesOfAnotherProgramAreNeverCutOff) {
   EXPECT_EQ(14u, file.Size());
 }
 
+TEST(Coding, OfLevelsWithVeryManyChannelsHasSmallerTiles) {
+  const auto edge = [](uint32_t channels) {
+    const auto image = drivers::PlainCoding(5000, 5000, channels, gobs::eDT_8U, "");
+    return drivers::CodingOfLevel(image, 2, "image").format.tileWidth;
+  };
+  EXPECT_EQ(256u, edge(3));
+  EXPECT_EQ(256u, edge(1024));  // 64 MiB
+  EXPECT_EQ(128u, edge(1025));
+  EXPECT_EQ(32u, edge(65535));  // 64 MiB less 1 KiB
+}
+
+TEST_F(Parts, BytesOfAnotherProgramAreNeverWrittenOver) {
+  const std::string name = folder_.File("bytes");
+  std::ofstream(name) << "before";
+  PositionedFile file(name, PositionedFile::Mode::kUpdate);
+  Appender appender(file, false, {});
+  std::ofstream(name, std::ios::app) << "others";
+  EXPECT_EQ(12u, appender.Append({1, 2}));
+  const std::vector<char> bytes = BytesOf(name);
+  EXPECT_EQ("beforeothers", std::string(bytes.begin(), bytes.begin() + 12));
+  appender.CutBackTo(6);
+  EXPECT_EQ(14u, file.Size());
+}
+
+TEST_F(Parts, KeptBytesAreNotGivenUp) {
+  const std::string name = folder_.File("bytes");
+  std::ofstream(name) << "before";
+  PositionedFile file(name, PositionedFile::Mode::kUpdate);
+  Appender appender(file, false, {});
+  appender.Append({1, 2});
+  appender.Keep();
+  appender.Append({3, 4});
+  appender.CutBackTo(6);
+  EXPECT_EQ(10u, file.Size());
+  appender.CutBackTo(8);
+  EXPECT_EQ(8u, file.Size());
+}
+
 TEST_F(Parts, DirectoryIsReadByLibtiffAsItWasComposed) {
   for (const bool isBig : {false, true})
     for (const std::endian order : {std::endian::little, std::endian::big}) {

@@ -82,6 +82,38 @@ TEST_F(Validity, OfARebuildByTheSameMethodIsAllThatChangesBesideTheTileTable) {
   EXPECT_EQ("", WrongTile(file_, 1, LevelLayout(kImage, 2)));
 }
 
+TEST_F(Validity, OfChannelsThatShareTheRebuiltOnesTilesStandsOverAWholeTileTable) {
+  Build(file_, kImage, {.level = 2});
+  const auto before = DirectoriesOf(file_);
+  const auto table = BytesOf(file_);
+  Build(file_, kImage, {.level = 2, .channels = {1}});
+  const auto after = DirectoriesOf(file_);
+  EXPECT_NE(before.at(1).offset, after.at(1).offset);  // linked in by one write
+  EXPECT_EQ("111", Valid());
+  EXPECT_EQ("", WrongTile(file_, 1, LevelLayout(kImage, 2)));
+  const auto now = BytesOf(file_);
+  const auto end = static_cast<ptrdiff_t>(table.size());
+  const auto first = static_cast<ptrdiff_t>(before.at(1).offset);
+  unsigned changed = 0;  // of the old directory: one character, for the channel
+  for (ptrdiff_t at = first; at < end; ++at) changed += table.at(at) != now.at(at);
+  EXPECT_EQ(1u, changed);
+}
+
+TEST_F(Validity, OfAChannelThatIsNamedTwiceIsNotAnotherChannels) {
+  Layout pair = kImage;
+  pair.samples = 2;
+  pair.photometric = PHOTOMETRIC_MINISBLACK;
+  WriteImage(file_, pair);
+  Build(file_, pair, {.level = 2, .channels = {1, 1}});
+  EXPECT_EQ("1-", Valid());
+  const auto dataset = Open(file_, datasources::kReadOnly);
+  datasources::BasicOverviewWriterAccessor second(dataset.get(), {2});
+  const std::unique_ptr<IRasterWriter> reader(second.CreateRasterWriter(2));
+  gobs::Raster block({100, 80, 1, gobs::eDT_8U}, {});
+  reader->Read(block);
+  EXPECT_EQ(100 * 80, std::count(block.data, block.data + block.byteSize, 0));
+}
+
 TEST_F(Validity, IsSwitchedInPlace) {
   Build(file_, kImage, {.level = 2});
   const auto size = BytesOf(file_).size();
