@@ -20,8 +20,11 @@ constexpr size_t kUnit = size_t{1} << 20;   // bytes; blocks of nearly one size 
 #if defined(__SANITIZE_ADDRESS__) || defined(__SANITIZE_THREAD__)
 constexpr bool kKeepsBuffers = false;
 #elif defined(__has_feature)
-constexpr bool kKeepsBuffers =
-    !__has_feature(address_sanitizer) && !__has_feature(thread_sanitizer);
+#if __has_feature(address_sanitizer) || __has_feature(thread_sanitizer)
+constexpr bool kKeepsBuffers = false;
+#else
+constexpr bool kKeepsBuffers = true;
+#endif
 #else
 constexpr bool kKeepsBuffers = true;
 #endif

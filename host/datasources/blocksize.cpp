@@ -28,7 +28,8 @@ uint64_t RoundUp(uint64_t value, uint64_t step) { return RoundDown(value + step 
 bool IsExact(const Scale& scale, unsigned length) {
   if (scale.target % scale.source != 0) return false;
   const double ratio = scale.Ratio();
-  const double factor = double(scale.target / scale.source);
+  const uint64_t whole = scale.target / scale.source;
+  const auto factor = static_cast<double>(whole);
   for (unsigned i = 0; i <= length; ++i)
     if (i / ratio != i * factor || (i + 0.5) / ratio != (i + 0.5) * factor) return false;
   return true;

@@ -27,8 +27,9 @@ std::unique_ptr<gobs::Raster> IRasterReader::GetRaster(unsigned index) {
     throw DataException(
         FormatString(_("There is no tile %u; the raster has %u."), index, GetTileCount()), kSource,
         "IRasterReader::GetRaster(unsigned int)", 0);
-  const unsigned x = index % TilesAcross() * GetTileWidth();
-  const unsigned y = index / TilesAcross() * GetTileHeight();
+  const unsigned across = std::max(TilesAcross(), 1u);
+  const unsigned x = index % across * GetTileWidth();
+  const unsigned y = index / across * GetTileHeight();
   const gobs::RasterInfo info(std::min(GetTileWidth(), GetWidth() - x),
                               std::min(GetTileHeight(), GetHeight() - y), GetChannelCount(),
                               GetDataType());

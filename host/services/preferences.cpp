@@ -84,8 +84,7 @@ namespace orin {
 
 std::string PreferenceFilePath() {
   using core::QRTGetEnvironmentVariable;
-  if (const std::string path = QRTGetEnvironmentVariable("ORIN_PREFERENCES"); !path.empty())
-    return path;
+  if (std::string path = QRTGetEnvironmentVariable("ORIN_PREFERENCES"); !path.empty()) return path;
   if (const std::string base = QRTGetEnvironmentVariable("XDG_CONFIG_HOME"); !base.empty())
     return base + "/orin/preferences.toml";
   if (const std::string home = QRTGetEnvironmentVariable("HOME"); !home.empty())

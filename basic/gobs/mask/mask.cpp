@@ -57,9 +57,9 @@ void Mask::RetrieveBytes(Raster* out) const {
       std::min({wanted, uint64_t{out->byteSize}, static_cast<uint64_t>(end - begin) * 8});
   const uint64_t groups = pixels / 8;
   for (uint64_t group = 0; group < groups; ++group)
-    std::memcpy(out->data + group * 8, &kBitTable[begin[group] * 8u], 8);
+    std::memcpy(out->data + group * 8, &kBitTable[begin[group] * uint64_t{8}], 8);
   for (uint64_t pixel = groups * 8; pixel < pixels; ++pixel)
-    out->data[pixel] = kBitTable[begin[groups] * 8u + pixel % 8];
+    out->data[pixel] = kBitTable[begin[groups] * uint64_t{8} + pixel % 8];
 }
 
 std::unique_ptr<Raster> ByteRasterOf(const Mask& mask) {

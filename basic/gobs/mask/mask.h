@@ -3,6 +3,7 @@
 #pragma once
 
 #include <array>
+#include <cstddef>
 #include <cstdint>
 #include <memory>
 
@@ -14,8 +15,8 @@ namespace orin::gobs {
 /// Entry [b * 8 + k] is bit k of the byte b, counted from the most significant bit.
 inline constexpr std::array<uint8_t, 256 * 8> kBitTable = [] {
   std::array<uint8_t, 256 * 8> table{};
-  for (unsigned b = 0; b < 256; ++b)
-    for (unsigned k = 0; k < 8; ++k) table[b * 8 + k] = (b >> (7 - k)) & 1u;
+  for (size_t b = 0; b < 256; ++b)
+    for (size_t k = 0; k < 8; ++k) table[b * 8 + k] = (b >> (7 - k)) & 1u;
   return table;
 }();
 
@@ -27,7 +28,7 @@ struct MaskBits {
 
   bool operator()(int64_t x, int64_t y) const {
     const uint64_t index = layout.Index(x, y);
-    return kBitTable[bits[index / 8] * 8u + index % 8] != 0;
+    return kBitTable[bits[index / 8] * uint64_t{8} + index % 8] != 0;
   }
 };
 
