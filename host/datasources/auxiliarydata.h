@@ -25,8 +25,21 @@ class AuxiliaryData {
   std::string GetChanMetadataValue(const std::string& key, unsigned channel) const {
     return channel < 1 || channel > channels_.size() ? "" : ValueOf(channels_[channel - 1], key);
   }
+  /// Changes, adds or, with an empty text, removes an item.
+  void SetFileMetadataValue(const std::string& key, const std::string& text) {
+    Set(file_, key, text);
+  }
+  /// The same for a channel, 1-based within the reader's channels.
+  void SetChanMetadataValue(const std::string& key, unsigned channel, const std::string& text) {
+    if (channel > channels_.size()) channels_.resize(channel);
+    if (channel > 0) Set(channels_[channel - 1], key, text);
+  }
 
  private:
+  static void Set(Items& items, const std::string& key, const std::string& text) {
+    if (text.empty()) items.erase(key);
+    else items[key] = text;
+  }
   static std::string ValueOf(const Items& items, const std::string& key) {
     const auto found = items.find(key);
     return found == items.end() ? "" : found->second;

@@ -2,32 +2,42 @@
 #include "host/datasources/basicreader.h"
 
 #include "host/datasources/levelstore.h"
+#include "host/datasources/nodataanswers.h"
 #include "host/services/exception.h"
 #include "host/services/text.h"
 
 namespace orin::datasources {
 namespace {
 
-std::unique_ptr<IRasterReader> Open(IDataset* dataset, const std::vector<unsigned>& channels) {
-  const auto refuse = [](const std::string& text) {
-    throw DataException(text, "host/datasources/basicreader",
-                        "orin::datasources::BasicReader::BasicReader(orin::datasources::IDataset*, "
-                        "const std::vector<unsigned int>&, bool)",
-                        0);
-  };
+[[noreturn]] void Refuse(const std::string& text) {
+  throw DataException(text, "host/datasources/basicreader",
+                      "orin::datasources::BasicReader::BasicReader(orin::datasources::IDataset*, "
+                      "const std::vector<unsigned int>&, bool)",
+                      0);
+}
+
+IRasterDataset& RasterOf(IDataset* dataset) {
   auto* raster = dynamic_cast<IRasterDataset*>(dataset);
-  if (!raster) refuse(_("A reader was asked for a dataset that is no raster."));
+  if (!raster) Refuse(_("A reader was asked for a dataset that is no raster."));
+  return *raster;
+}
+
+std::unique_ptr<IRasterReader> Open(IRasterDataset& raster, const std::vector<unsigned>& channels) {
   for (const unsigned channel : channels)
-    if (channel < 1 || channel > raster->GetChannelCount())
-      refuse(FormatString(_("%s: there is no channel %u; the file has %u."),
-                          raster->GetFileName().c_str(), channel, raster->GetChannelCount()));
-  return raster->GetSource()->OpenReader(channels);
+    if (channel < 1 || channel > raster.GetChannelCount())
+      Refuse(FormatString(_("%s: there is no channel %u; the file has %u."),
+                          raster.GetFileName().c_str(), channel, raster.GetChannelCount()));
+  return raster.GetSource()->OpenReader(channels);
 }
 
 }  // namespace
 
 BasicReader::BasicReader(IDataset* dataset, const std::vector<unsigned>& channels, bool)
-    : reader_(Open(dataset, channels)) {}
+    : noData_(&RasterOf(dataset).GetNoDataAnswers()), reader_(Open(RasterOf(dataset), channels)) {}
 BasicReader::~BasicReader() = default;
+
+AuxiliaryData BasicReader::GetAuxiliaryData() const {
+  return noData_->Answer(reader_->GetAuxiliaryData(), GetChannelsInfo(), GetDataType());
+}
 
 }  // namespace orin::datasources

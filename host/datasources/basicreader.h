@@ -35,10 +35,13 @@ class BasicReader : public IRasterReader {
   }
   void SetOptimalTileSize() override { reader_->SetOptimalTileSize(); }
   void Read(gobs::Raster& block) override { reader_->Read(block); }
-  AuxiliaryData GetAuxiliaryData() const override { return reader_->GetAuxiliaryData(); }
+  /// With no-data values as a run can take them; the first question may have the image searched for
+  /// a value that does not occur. \throws orin::Exception  the image cannot be opened for that
+  AuxiliaryData GetAuxiliaryData() const override;
   std::vector<unsigned> GetChannelsInfo() const override { return reader_->GetChannelsInfo(); }
 
  private:
+  NoDataAnswers* noData_;
   std::unique_ptr<IRasterReader> reader_;
 };
 

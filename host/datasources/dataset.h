@@ -11,6 +11,7 @@
 namespace orin::datasources {
 
 class IRasterSource;
+class NoDataAnswers;
 
 enum AccessMode { kReadOnly = 0, kUpdate = 1 };
 
@@ -55,6 +56,8 @@ class IRasterDataset : public IDataset {
   virtual IRasterSource* GetSource() = 0;
   /// The levels known at the time of the call; null when none can be.
   virtual IOverviewInfo* GetOverviewInfo() = 0;
+  /// What readers answer about no data, and what that means for levels; owned by the dataset.
+  virtual NoDataAnswers& GetNoDataAnswers() = 0;
 };
 
 }  // namespace orin::datasources

@@ -1,73 +1,35 @@
 // SPDX-License-Identifier: MIT
 #include "host/datasources/nodatamask.h"
 
-#include <charconv>
 #include <cmath>
-#include <limits>
 #include <memory>
 #include <optional>
 #include <string>
 #include <vector>
 
 #include "basic/core/typedispatch/pixeltypes.h"
+#include "host/datasources/nodataanswers.h"
+#include "host/datasources/nodatavalue.h"
 
 namespace {
 
 using orin::datasources::AuxiliaryData;
 using orin::datasources::IRasterReader;
+using orin::datasources::NoDataValue;
 using orin::gobs::Mask;
 using orin::gobs::Raster;
-
-/// A no-data value as its channel can hold it.
-template <class T>
-struct Declared {
-  bool comparable = false;  ///< false: no pixel of the type can equal it
-  T value{};
-};
-
-bool IsFiniteNumber(const std::string& text) {
-  double value = 0;
-  const auto [end, error] = std::from_chars(text.data(), text.data() + text.size(), value);
-  return end == text.data() + text.size() && !text.empty() &&
-         (error == std::errc::result_out_of_range ||
-          (error == std::errc() && std::isfinite(value)));
-}
-
-template <class T>
-Declared<T> Parse(const std::string& text) {
-  Declared<T> declared;
-  if constexpr (std::is_integral_v<T>) {  // digit by digit: a double cannot hold every 64-bit value
-    const auto [end, error] =
-        std::from_chars(text.data(), text.data() + text.size(), declared.value);
-    declared.comparable = error == std::errc() && end == text.data() + text.size();
-    if (declared.comparable) return declared;
-  }
-  double number = 0;
-  const auto [end, error] = std::from_chars(text.data(), text.data() + text.size(), number);
-  if (error != std::errc()) return declared;
-  if constexpr (std::is_floating_point_v<T>) {
-    declared.comparable = std::isfinite(static_cast<T>(number)) || std::isinf(number);
-    declared.value = static_cast<T>(number);
-  } else {
-    // 2 to the power of the type's digits is exact in double; the maximum of a 64-bit type is not.
-    const double limit = std::ldexp(1.0, std::numeric_limits<T>::digits);
-    const bool inRange = number < limit && number >= double(std::numeric_limits<T>::min());
-    declared.comparable = inRange && number == std::trunc(number);
-    if (declared.comparable) declared.value = static_cast<T>(number);
-  }
-  return declared;
-}
 
 /// A pixel is no data when every channel equals its value.
 template <class T>
 class EqualsNoData final : public orin::gobs::IMaskDecision {
  public:
-  EqualsNoData(std::vector<Declared<T>> values, uint32_t componentsPerSample)
+  /// \param values  one for each channel; nothing where no pixel can equal the declared one
+  EqualsNoData(const std::vector<std::optional<NoDataValue<T>>>& values,
+               uint32_t componentsPerSample)
       : components_(componentsPerSample) {
-    for (const Declared<T>& channel : values) {
-      possible_ = possible_ && channel.comparable;
-      pixel_.push_back(channel.value);
-      for (uint32_t i = 1; i < components_; ++i) pixel_.push_back(T{0});
+    for (const std::optional<NoDataValue<T>>& channel : values) {
+      possible_ = possible_ && channel;
+      values_.push_back(channel.value_or(NoDataValue<T>()));
     }
   }
 
@@ -75,41 +37,51 @@ class EqualsNoData final : public orin::gobs::IMaskDecision {
     if (!possible_) return;  // a new mask is all valid
     const T* sample = reinterpret_cast<const T*>(block.data);
     const uint64_t pixels = uint64_t{block.stride} * block.bufferLines;
-    for (uint64_t pixel = 0; pixel < pixels; ++pixel, sample += pixel_.size())
+    const uint64_t size = values_.size() * components_;
+    for (uint64_t pixel = 0; pixel < pixels; ++pixel, sample += size)
       if (IsNoData(sample)) mask.begin[pixel / 8] &= static_cast<uint8_t>(~(0x80u >> (pixel % 8)));
   }
 
  private:
   bool IsNoData(const T* sample) const {
-    for (size_t i = 0; i < pixel_.size(); ++i)
-      if (sample[i] != pixel_[i]) return false;
+    for (const NoDataValue<T>& value : values_) {
+      if (!(components_ == 1 ? value.Matches(*sample) : MatchesPair(value, sample))) return false;
+      sample += components_;
+    }
     return true;
   }
 
+  /// A complex sample: (value, 0), and with NaN in either part it is no number.
+  static bool MatchesPair(const NoDataValue<T>& value, const T* sample) {
+    if constexpr (std::is_floating_point_v<T>)
+      if (std::isnan(value.stored)) return std::isnan(sample[0]) || std::isnan(sample[1]);
+    return value.Matches(sample[0]) && sample[1] == T{0};
+  }
+
   uint32_t components_;
-  std::vector<T> pixel_;
+  std::vector<NoDataValue<T>> values_;
   bool possible_ = true;
 };
 
-/// Without blanks around it and without a plus sign, which number parsing does not take.
-std::string Trimmed(const std::string& text) {
-  constexpr char kBlanks[] = " \t\r\n";
-  const size_t first = text.find_first_not_of(kBlanks);
-  if (first == std::string::npos) return "";
-  const size_t start = text[first] == '+' ? first + 1 : first;
-  return text.substr(start, text.find_last_not_of(kBlanks) + 1 - start);
+/// The declared text where another one is answered for it.
+std::string Declared(const std::string& answered, const std::string& declared) {
+  return declared.empty() ? answered : declared;
 }
 
 /// The reader's no-data texts, one a channel; nothing when no channel has one.
 std::optional<std::vector<std::string>> DeclaredTexts(const IRasterReader& reader) {
+  using orin::datasources::kDeclaredNoDataKey;
+  using orin::datasources::kNoDataKey;
   const AuxiliaryData metadata = reader.GetAuxiliaryData();
-  const std::string file = metadata.GetFileMetadataValue(orin::datasources::kNoDataKey);
+  const std::string file = Declared(metadata.GetFileMetadataValue(kNoDataKey),
+                                    metadata.GetFileMetadataValue(kDeclaredNoDataKey));
   std::vector<std::string> texts;
   bool any = false;
   for (unsigned channel = 1; channel <= reader.GetChannelCount(); ++channel) {
-    std::string own = metadata.GetChanMetadataValue(orin::datasources::kNoDataKey, channel);
-    texts.push_back(Trimmed(own.empty() ? file : own));
-    any = any || IsFiniteNumber(texts.back());
+    const std::string own = Declared(metadata.GetChanMetadataValue(kNoDataKey, channel),
+                                     metadata.GetChanMetadataValue(kDeclaredNoDataKey, channel));
+    texts.push_back(own.empty() ? file : own);
+    any = any || orin::datasources::ParseNoData(texts.back());
   }
   if (!any) return std::nullopt;
   return texts;
@@ -123,9 +95,10 @@ orin::gobs::IMaskDecision* GetFileMetadataSrcMask(orin::datasources::IRasterRead
   const orin::gobs::DataType type = reader->GetDataType();
   std::unique_ptr<orin::gobs::IMaskDecision> decision;
   orin::typedispatch::WithPixelType(type, [&]<class T>(std::type_identity<T>) {
-    std::vector<Declared<T>> values;
-    for (const std::string& text : *texts) values.push_back(Parse<T>(text));
-    decision = std::make_unique<EqualsNoData<T>>(std::move(values), ComponentsPerSample(type));
+    std::vector<std::optional<NoDataValue<T>>> values;
+    for (const std::string& text : *texts)
+      values.push_back(orin::datasources::NoDataValueOf<T>(text));
+    decision = std::make_unique<EqualsNoData<T>>(values, ComponentsPerSample(type));
   });
   return decision.release();
 }

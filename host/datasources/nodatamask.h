@@ -6,7 +6,7 @@
 #include "host/datasources/rasterreader.h"
 
 /// A new decision, owned by the caller: a pixel is no data when all of the reader's channels equal
-/// their no-data value (the channel's own, else the file's), compared in the channels' type; for
-/// complex samples the real component counts and the imaginary one must be 0. Null when none is
-/// declared as a finite number.
+/// their declared no-data value (the channel's own, else the file's), compared in the channels'
+/// type, NaN as any NaN; of complex samples the real component counts and the imaginary one must be
+/// 0, or either is NaN when NaN is declared. Null when no text is a number.
 orin::gobs::IMaskDecision* GetFileMetadataSrcMask(orin::datasources::IRasterReader* reader);

@@ -3,6 +3,7 @@
 
 #include <algorithm>
 
+#include "host/datasources/nodataanswers.h"
 #include "host/services/exception.h"
 #include "host/services/text.h"
 
@@ -37,7 +38,10 @@ bool BasicOverviewReaderAccessor::IsLevelValid(unsigned level) const {
 
 BasicOverviewWriterAccessor::BasicOverviewWriterAccessor(IRasterDataset* dataset,
                                                          const std::vector<unsigned>& channels)
-    : store_(dataset->GetSource()->Levels()), channels_(channels), file_(dataset->GetFileName()) {}
+    : store_(dataset->GetSource()->Levels()),
+      noData_(dataset->GetNoDataAnswers()),
+      channels_(channels),
+      file_(dataset->GetFileName()) {}
 
 ILevelStore& BasicOverviewWriterAccessor::Store() const {
   if (!store_)
@@ -52,7 +56,7 @@ void BasicOverviewWriterAccessor::CreateLevel(unsigned level) {
 }
 
 IRasterWriter* BasicOverviewWriterAccessor::CreateRasterWriter(unsigned level) {
-  return Store().OpenWriter(level, channels_).release();
+  return noData_.ForLevel(Store().OpenWriter(level, channels_), channels_).release();
 }
 
 std::vector<unsigned> BasicOverviewWriterAccessor::GetLevels() const {

@@ -37,7 +37,8 @@ class BasicOverviewWriterAccessor {
   /// Makes `level` exist for the channels; a level that exists is kept.
   /// \throws orin::Exception  the format holds no levels, or the level cannot be made
   void CreateLevel(unsigned level);
-  /// A new writer of an existing level, owned by the caller. \throws orin::Exception
+  /// A new writer of an existing level, owned by the caller; where the run fills with what readers
+  /// answered, the level stores the declared no-data value. \throws orin::Exception
   IRasterWriter* CreateRasterWriter(unsigned level);
   /// Levels present for these channels, ascending.
   std::vector<unsigned> GetLevels() const;
@@ -51,6 +52,7 @@ class BasicOverviewWriterAccessor {
   ILevelStore& Store() const;
 
   ILevelStore* store_;
+  const NoDataAnswers& noData_;
   std::vector<unsigned> channels_;
   std::string file_;
   std::string method_;

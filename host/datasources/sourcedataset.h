@@ -7,6 +7,7 @@
 #include "host/datasources/dataset.h"
 #include "host/datasources/formats.h"
 #include "host/datasources/levelstore.h"
+#include "host/datasources/nodataanswers.h"
 
 namespace orin::datasources {
 
@@ -28,9 +29,11 @@ class SourceDataset final : public IRasterDataset {
   IChannelInfo* GetChannelInfo(unsigned channel) const override;
   IRasterSource* GetSource() override { return source_.get(); }
   IOverviewInfo* GetOverviewInfo() override;
+  NoDataAnswers& GetNoDataAnswers() override { return noDataAnswers_; }
 
  private:
   std::unique_ptr<IRasterSource> source_;
+  NoDataAnswers noDataAnswers_{*source_};
   std::string fileName_;
   AccessMode access_;
   int formatCode_;

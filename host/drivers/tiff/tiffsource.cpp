@@ -3,14 +3,13 @@
 
 #include <algorithm>
 #include <cerrno>
-#include <charconv>
-#include <cmath>
 #include <cstring>
 #include <utility>
 
 #include <fcntl.h>
 #include <unistd.h>
 
+#include "host/datasources/nodatavalue.h"
 #include "host/drivers/tiff/pixelreader.h"
 #include "host/drivers/tiff/tifflevelstore.h"
 #include "host/services/exception.h"
@@ -64,13 +63,6 @@ void RequireWritable(const std::string& file) {
   close(descriptor);
 }
 
-bool IsFiniteDecimal(const std::string& text) {
-  double value = 0;
-  const char* end = text.data() + text.size();
-  const auto [stop, error] = std::from_chars(text.data(), end, value);
-  return error == std::errc() && stop == end && std::isfinite(value);
-}
-
 /// Items of the file (no sample) or of one of its channels.
 AuxiliaryData::Items ItemsOf(const std::vector<MetadataItem>& metadata,
                              std::optional<unsigned> sample) {
@@ -90,7 +82,7 @@ TiffSource::TiffSource(std::string file, datasources::AccessMode access) : file_
   const bool declared = std::any_of(
       metadata_.begin(), metadata_.end(),
       [](const MetadataItem& item) { return item.domain.empty() && item.name == kNoDataKey; });
-  if (!declared && IsFiniteDecimal(format_.noData))
+  if (!declared && datasources::ParseNoData(format_.noData))
     metadata_.push_back({kNoDataKey, std::nullopt, "", "", format_.noData});
   levels_ = OpenInternalLevels(file_, format_, access == datasources::kUpdate);
 }

@@ -28,7 +28,7 @@ class TiffSource final : public datasources::IRasterSource {
   unsigned ChannelCount() const override { return format_.samplesPerPixel; }
   gobs::DataType TypeOf(unsigned) const override { return format_.type; }
   /// Items of the default domain. The no-data value is the item of that name, else the no-data tag
-  /// where that is a finite decimal number.
+  /// where that is a number, NaN and infinities included.
   datasources::AuxiliaryData MetadataOf(const std::vector<unsigned>& channels) const override;
   std::unique_ptr<datasources::IRasterReader> OpenReader(
       const std::vector<unsigned>& channels) override;
