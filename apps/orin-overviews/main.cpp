@@ -13,6 +13,9 @@
 #include "apps/orin-overviews/exitcode.h"
 #include "apps/orin-overviews/info.h"
 #include "apps/orin-overviews/locale.h"
+#ifdef ORIN_HAS_GDAL
+#include "host/drivers/gdal/gdaldriver.h"
+#endif
 #include "host/drivers/memory/memorydriver.h"
 #include "host/drivers/tiff/tiffdriver.h"
 #include "host/services/exception.h"
@@ -29,6 +32,9 @@ int Run(const Invocation& invocation) {
   const LibraryReports reports(console);
   orin::drivers::RegisterMemoryDriver();
   orin::drivers::RegisterTiffDriver();
+#ifdef ORIN_HAS_GDAL
+  orin::drivers::RegisterGdalDriver();  // after it: local TIFF files are the TIFF driver's
+#endif
   PreferenceRegistry::Install(orin::LoadPreferences(orin::PreferenceFilePath()));
   const ExitCode code = invocation.command == Command::kBuild ? RunBuild(invocation.build, console)
                                                               : RunInfo(invocation.info, console);

@@ -1,0 +1,56 @@
+// SPDX-License-Identifier: MIT
+#include "host/drivers/gdal/gdalerrors.h"
+
+#include <cpl_error.h>
+
+#include <string_view>
+
+#include "host/services/exception.h"
+#include "host/services/text.h"
+
+namespace orin::drivers {
+namespace {
+
+/// A file that ends too early is decoded to the end with grey, and only a warning tells.
+bool TellsOfMissingData(std::string_view message) {
+  return message.find("remature end") != message.npos;
+}
+
+void CPL_STDCALL Collect(CPLErr kind, CPLErrorNum, const char* message) {
+  const std::string_view text = message ? message : "";
+  const bool isFailure = kind == CE_Failure || kind == CE_Fatal || TellsOfMissingData(text);
+  static_cast<GdalErrors*>(CPLGetErrorHandlerUserData())->Add(isFailure, message);
+}
+
+}  // namespace
+
+GdalErrors::GdalErrors() {
+  CPLPushErrorHandlerEx(Collect, this);
+  CPLErrorReset();
+}
+
+GdalErrors::~GdalErrors() { CPLPopErrorHandler(); }
+
+void GdalErrors::Add(bool isFailure, const char* message) {
+  if (!isFailure || any_) return;  // later failures are the consequences of the first
+  any_ = true;
+  first_ = message ? message : "";
+}
+
+std::string GdalErrors::Reason() const {
+  std::string reason = first_.substr(0, first_.find('\n'));
+  while (!reason.empty() && (reason.back() == '.' || reason.back() == ' ')) reason.pop_back();
+  return reason.empty() ? _("the file is damaged") : reason;
+}
+
+void GdalErrors::Require(bool succeeded, const char* format, const std::string& file) const {
+  if (succeeded && !any_) return;
+  std::string reason = Reason();
+  if (reason.starts_with(file + ": ")) reason.erase(0, file.size() + 2);
+  throw Exception(FormatString(format, file.c_str(), reason.c_str()),
+                  "host/drivers/gdal/gdalerrors", "orin::drivers::GdalErrors::Require", 0);
+}
+
+void SilenceGdal() { CPLSetErrorHandler(CPLQuietErrorHandler); }
+
+}  // namespace orin::drivers

@@ -1,0 +1,99 @@
+// SPDX-License-Identifier: MIT
+#include "host/drivers/gdal/gdalformats.h"
+
+#include <dlfcn.h>
+#include <gdal.h>
+#include <sys/stat.h>
+
+#include <algorithm>
+#include <cctype>
+#include <mutex>
+
+#include "host/drivers/gdal/gdalerrors.h"
+
+namespace orin::drivers {
+namespace {
+
+// Most specific first: a file is the first one's that knows it. No name may hold "TIFF", nor "ZMB"
+// but for the one format that keeps levels inside.
+constexpr GdalFormat kFormats[] = {
+    {"HFA", "GDALRegister_HFA", kFormatErdas, "ZMBERDAS", "ERDAS Imagine", 1, false},
+    {"VRT", "GDALRegister_VRT", 300, "VRT", "virtual raster (VRT)", 0, true},
+    {"GTiff", "GDALRegister_GTiff", 301, "GTIF-REMOTE", "GeoTIFF in an archive or on a server", 0,
+     false},
+    {"COG", "GDALRegister_COG", 0, "", "", 0, false},
+    {"NITF", "GDALRegister_NITF", 302, "NITF", "NITF", 0, false},
+    {"AAIGrid", "GDALRegister_AAIGrid", 303, "AAIGRID", "Arc/Info ASCII grid", 0, true},
+    {"PNG", "GDALRegister_PNG", 304, "PNG", "PNG", 0, true},
+    {"JPEG", "GDALRegister_JPEG", 305, "JPEG", "JPEG", 0, true},
+    {"MEM", "GDALRegister_MEM", 0, "", "", 0, false},
+    {"GIF", "GDALRegister_GIF", 306, "GIF", "GIF", 0, true},
+    {"BMP", "GDALRegister_BMP", 307, "BMP", "BMP", 0, true},
+    {"WEBP", "GDALRegister_WEBP", 308, "WEBP", "WebP", 0, true},
+    {"JP2OpenJPEG", "GDALRegister_JP2OpenJPEG", 309, "JP2", "JPEG 2000", 0, true},
+    {"netCDF", "GDALRegister_netCDF", 310, "NETCDF", "netCDF", 0, true},
+    {"HDF5", "GDALRegister_HDF5", 311, "HDF5", "HDF5", 0, true},
+    {"HDF5Image", "GDALRegister_HDF5Image", 311, "HDF5", "HDF5", 0, true},
+    {"GRIB", "GDALRegister_GRIB", 312, "GRIB", "GRIB", 0, true},
+    {"ENVI", "GDALRegister_ENVI", 313, "ENVI", "ENVI", 0, true},
+    {"EHdr", "GDALRegister_EHdr", 314, "EHDR", "ESRI .hdr labelled", 0, true},
+    {"RRASTER", "GDALRegister_RRASTER", 315, "RRASTER", "R raster", 0, true},
+    {"MRF", "GDALRegister_mrf", 316, "MRF", "meta raster format (MRF)", 0, false},
+};
+
+bool IsInstalled(const GdalFormat& format) { return GDALGetDriverByName(format.driver) != nullptr; }
+
+/// The drivers that may open a name, for the library's functions.
+std::vector<const char*> OpeningDrivers() {
+  std::vector<const char*> names;
+  for (const GdalFormat& format : kFormats)
+    if (format.code != 0) names.push_back(format.driver);
+  names.push_back(nullptr);
+  return names;
+}
+
+bool IsRegularFile(const std::string& name) {
+  struct stat status;
+  return stat(name.c_str(), &status) == 0 && S_ISREG(status.st_mode);
+}
+
+}  // namespace
+
+void RegisterGdalFormats() {
+  static std::once_flag once;
+  std::call_once(once, [] {
+    for (const GdalFormat& format : kFormats)
+      if (void* function = dlsym(RTLD_DEFAULT, format.registration))
+        reinterpret_cast<void (*)()>(function)();
+  });
+}
+
+std::vector<ZMBInfo_s> GdalFormatRecords() {
+  std::vector<ZMBInfo_s> records;
+  for (const GdalFormat& format : kFormats)
+    if (format.code != 0 && IsInstalled(format))
+      records.push_back({format.name, format.description, format.code, format.nativeOverviews});
+  return records;
+}
+
+bool IsLibraryName(const std::string& name) {
+  if (name.starts_with("/vsi")) return true;
+  const size_t colon = name.find(':');
+  return colon != name.npos && colon > 1 &&
+         std::all_of(name.begin(), name.begin() + static_cast<std::ptrdiff_t>(colon),
+                     [](unsigned char c) { return std::isalnum(c) || c == '_'; });
+}
+
+const GdalFormat* IdentifyGdalFormat(const std::string& name) {
+  if (!IsRegularFile(name) && !IsLibraryName(name)) return nullptr;
+  const GdalErrors quiet;
+  const auto allowed = OpeningDrivers();
+  GDALDriverH driver = GDALIdentifyDriverEx(name.c_str(), GDAL_OF_RASTER, allowed.data(), nullptr);
+  if (!driver) return nullptr;
+  const std::string found = GDALGetDriverShortName(driver);
+  const auto format = std::find_if(std::begin(kFormats), std::end(kFormats),
+                                   [&](const GdalFormat& f) { return f.driver == found; });
+  return format == std::end(kFormats) ? nullptr : &*format;
+}
+
+}  // namespace orin::drivers

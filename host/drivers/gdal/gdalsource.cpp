@@ -1,0 +1,97 @@
+// SPDX-License-Identifier: MIT
+#include "host/drivers/gdal/gdalsource.h"
+
+#include <unistd.h>
+
+#include <algorithm>
+#include <cerrno>
+#include <charconv>
+#include <cmath>
+#include <cstring>
+#include <utility>
+
+#include "host/drivers/gdal/gdalbands.h"
+#include "host/drivers/gdal/gdalerrors.h"
+#include "host/drivers/gdal/gdalreader.h"
+#include "host/drivers/gdal/subdatasets.h"
+#include "host/services/exception.h"
+#include "host/services/text.h"
+
+namespace orin::drivers {
+namespace {
+
+using datasources::AuxiliaryData;
+using datasources::kNoDataKey;
+
+[[noreturn]] void Refuse(const std::string& text) {
+  throw Exception(text, "host/drivers/gdal/gdalsource", "orin::drivers::GdalSource::GdalSource", 0);
+}
+
+/// Looks only: nothing is opened for writing before there is something to write.
+void RequireWritable(const std::string& name) {
+  if (IsLibraryName(name) && access(name.c_str(), F_OK) != 0)
+    Refuse(FormatString(_("%s: cannot be opened for writing: it is no file of its own."),
+                        name.c_str()));
+  if (access(name.c_str(), W_OK) != 0)
+    Refuse(FormatString(_("%s: cannot be opened for writing: %s."), name.c_str(),
+                        std::strerror(errno)));
+}
+
+bool IsFiniteDecimal(const std::string& text) {
+  double value = 0;
+  const char* end = text.data() + text.size();
+  const auto [stop, error] = std::from_chars(text.data(), end, value);
+  return error == std::errc() && stop == end && std::isfinite(value);
+}
+
+}  // namespace
+
+GdalSource::GdalSource(std::string name, const GdalFormat& format, datasources::AccessMode access)
+    : name_(std::move(name)), format_(format) {
+  if (access == datasources::kUpdate) RequireWritable(name_);
+  const GdalHandle handle(name_, format_);
+  if (GDALGetRasterCount(handle.Get()) == 0) Refuse(NoRasterText(handle));
+  width_ = static_cast<unsigned>(GDALGetRasterXSize(handle.Get()));
+  height_ = static_cast<unsigned>(GDALGetRasterYSize(handle.Get()));
+  items_ = ItemsOf(handle.Get());
+  ReadChannels(handle);
+}
+
+GdalSource::~GdalSource() = default;
+
+void GdalSource::ReadChannels(const GdalHandle& handle) {
+  std::vector<std::string> declared;
+  const GdalErrors quiet;
+  for (unsigned channel = 1; int(channel) <= GDALGetRasterCount(handle.Get()); ++channel) {
+    GDALRasterBandH band = handle.Band(channel);
+    types_.push_back(CommonTypeOf(handle, {channel}));
+    channelItems_.push_back(ItemsOf(band));
+    declared.push_back(NoDataTextOf(band));
+    if (alphaChannel_ == 0 && GDALGetRasterColorInterpretation(band) == GCI_AlphaBand)
+      alphaChannel_ = channel;
+  }
+  AnswerNoData(declared);
+}
+
+void GdalSource::AnswerNoData(const std::vector<std::string>& declared) {
+  if (items_.contains(kNoDataKey)) return;
+  const bool agree = std::all_of(declared.begin(), declared.end(),
+                                 [&](const std::string& text) { return text == declared[0]; });
+  if (agree && IsFiniteDecimal(declared[0])) items_[kNoDataKey] = declared[0];
+  if (agree) return;
+  for (size_t i = 0; i < declared.size(); ++i)
+    if (IsFiniteDecimal(declared[i])) channelItems_[i].emplace(kNoDataKey, declared[i]);
+}
+
+AuxiliaryData GdalSource::MetadataOf(const std::vector<unsigned>& channels) const {
+  std::vector<AuxiliaryData::Items> items;
+  for (const unsigned channel : channels) items.push_back(channelItems_.at(channel - 1));
+  return {items_, std::move(items)};
+}
+
+std::unique_ptr<datasources::IRasterReader> GdalSource::OpenReader(
+    const std::vector<unsigned>& channels) {
+  return std::make_unique<GdalReader>(name_, format_, channels, MetadataOf(channels));
+}
+
+}  // namespace orin::drivers

@@ -1,0 +1,52 @@
+/// A dataset of the GDAL library as a raster source.
+// SPDX-License-Identifier: MIT
+#pragma once
+
+#include <memory>
+#include <string>
+#include <vector>
+
+#include "host/datasources/dataset.h"
+#include "host/datasources/levelstore.h"
+#include "host/drivers/gdal/gdalhandle.h"
+
+namespace orin::drivers {
+
+class GdalSource final : public datasources::IRasterSource {
+ public:
+  /// \throws orin::Exception  it cannot be opened, it holds no raster, or for kUpdate: the file
+  ///                          cannot be written, or it cannot hold levels that its format could
+  GdalSource(std::string name, const GdalFormat& format, datasources::AccessMode access);
+  ~GdalSource() override;
+
+  unsigned Width() const override { return width_; }
+  unsigned Height() const override { return height_; }
+  unsigned ChannelCount() const override { return static_cast<unsigned>(types_.size()); }
+  gobs::DataType TypeOf(unsigned channel) const override { return types_.at(channel - 1); }
+  /// Items of the default domain. The no-data value is the item of that name, else what is declared
+  /// where that is a finite number: for the file when all of its channels agree.
+  datasources::AuxiliaryData MetadataOf(const std::vector<unsigned>& channels) const override;
+  std::unique_ptr<datasources::IRasterReader> OpenReader(
+      const std::vector<unsigned>& channels) override;
+  /// Levels inside the file; what the format makes up without storing it is none.
+  datasources::ILevelStore* Levels() override { return levels_.get(); }
+
+  /// The channel that holds opacity, 1-based; 0 when there is none.
+  unsigned AlphaChannel() const { return alphaChannel_; }
+
+ private:
+  void ReadChannels(const GdalHandle& handle);
+  void AnswerNoData(const std::vector<std::string>& declared);
+
+  std::string name_;
+  const GdalFormat& format_;
+  unsigned width_ = 0;
+  unsigned height_ = 0;
+  unsigned alphaChannel_ = 0;
+  std::vector<gobs::DataType> types_;
+  datasources::AuxiliaryData::Items items_;
+  std::vector<datasources::AuxiliaryData::Items> channelItems_;
+  std::unique_ptr<datasources::ILevelStore> levels_;
+};
+
+}  // namespace orin::drivers
