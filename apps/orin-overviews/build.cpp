@@ -114,6 +114,8 @@ ExitCode BuildFile(const BuildOptions& options, const std::string& file,
   if (!options.force)
     for (const PlannedLevel& planned : plan.building)
       if (planned.empty) console.Notice(AfterFileName(file, LeftOutText(plan, planned.level)));
+  if (const std::string stale = StaleText(plan); !stale.empty())
+    console.Notice(AfterFileName(file, stale));
   const Outcome outcome = RunJob(job, plan, options, file, interruption, console);
   if (!outcome.built)
     return ReportFailure(outcome, plan, options, file, interruption.Requested(), console);

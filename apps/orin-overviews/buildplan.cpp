@@ -55,6 +55,13 @@ std::vector<LevelDescription> DescribeLevels(IDataset& dataset) {
   return info ? info->Describe() : std::vector<LevelDescription>();
 }
 
+bool Has(const std::vector<LevelDescription>& levels, unsigned level,
+         datasources::LevelStatus status) {
+  return std::any_of(levels.begin(), levels.end(), [&](const LevelDescription& l) {
+    return l.level == level && l.status == status;
+  });
+}
+
 bool IsValid(const std::vector<LevelDescription>& levels, unsigned level,
              const std::vector<unsigned>& channels) {
   const auto found = std::find_if(levels.begin(), levels.end(),
@@ -103,12 +110,17 @@ BuildPlan PlanBuild(const BuildOptions& options, const std::string& file) {
   std::sort(requested.begin(), requested.end());
   plan.requested = AscendingOnce(requested);
   const auto existing = DescribeLevels(*dataset);
+  for (const unsigned level : plan.requested)
+    if (Has(existing, level, datasources::LevelStatus::kStale)) plan.stale.push_back(level);
   for (const unsigned level : requested) {
     if (level < 2) continue;  // the library refuses the request
     if (options.force || !IsValid(existing, level, plan.channels))
       plan.building.push_back({level, plan.IsEmpty(level)});
     else if (plan.kept.empty() || plan.kept.back() != level) plan.kept.push_back(level);
   }
+  for (const unsigned level : plan.kept)
+    if (Has(existing, level, datasources::LevelStatus::kUnverified))
+      plan.unverified.push_back(level);
   return plan;
 }
 

@@ -24,6 +24,8 @@ struct BuildPlan {
   std::vector<unsigned> channels;   ///< to be treated; those of the user, or all wider than one bit
   std::vector<unsigned> requested;  ///< levels, ascending, each once
   std::vector<unsigned> kept;       ///< of these: present, valid and not to be forced
+  std::vector<unsigned> unverified;  ///< of the kept ones: whether they match the image is unknown
+  std::vector<unsigned> stale;       ///< of those to be built: computed from other data than now
   std::vector<PlannedLevel>
       building;  ///< the others in the order of building, repeated ones repeated
   LevelReport report = LevelReport::kWithinShare;

@@ -2,6 +2,7 @@
 #include "apps/orin-overviews/buildreport.h"
 
 #include <algorithm>
+#include <iterator>
 
 #include "apps/orin-overviews/numberlist.h"
 #include "host/services/text.h"
@@ -35,8 +36,17 @@ std::string PlaceText(const datasources::LevelDescription& level) {
              : FormatString(_("in %s"), level.file.c_str());
 }
 
+/// "already up to date: 2; kept unverified: 4" as far as there are such levels.
 std::string KeptText(const BuildPlan& plan) {
-  return FormatString(_("already up to date: %s"), JoinNumbers(plan.kept).c_str());
+  std::vector<unsigned> verified;
+  std::set_difference(plan.kept.begin(), plan.kept.end(), plan.unverified.begin(),
+                      plan.unverified.end(), std::back_inserter(verified));
+  std::string text;
+  if (!verified.empty())
+    text = FormatString(_("already up to date: %s"), JoinNumbers(verified).c_str());
+  if (plan.unverified.empty()) return text;
+  return text + (text.empty() ? "" : "; ") +
+         FormatString(_("kept unverified: %s"), JoinNumbers(plan.unverified).c_str());
 }
 
 /// "Levels finished: 2, 4; still to do: 8." as far as there are such levels.
@@ -96,6 +106,12 @@ std::string NothingToDoText(const BuildPlan& plan) {
   if (!plan.building.empty())
     return _("nothing to do: every level asked for is larger than the image");
   return FormatString(_("nothing to do: %u x %u pixels need no levels"), plan.width, plan.height);
+}
+
+std::string StaleText(const BuildPlan& plan) {
+  if (plan.stale.empty()) return "";
+  return FormatString(_("the image was changed after these levels were built: %s."),
+                      JoinNumbers(plan.stale).c_str());
 }
 
 std::string LeftOutText(const BuildPlan& plan, unsigned level) {

@@ -14,6 +14,8 @@ std::string AfterFileName(const std::string& file, const std::string& text);
 
 std::string SummaryText(const BuildPlan& plan, const LevelState& state);
 std::string NothingToDoText(const BuildPlan& plan);
+/// Which levels are built again because the image was changed; empty without such levels.
+std::string StaleText(const BuildPlan& plan);
 /// Why a level larger than the image is not built.
 std::string LeftOutText(const BuildPlan& plan, unsigned level);
 /// What to know of levels in both places; empty when they stand in one.

@@ -12,6 +12,20 @@ using Json = nlohmann::ordered_json;
 
 Json OrNull(const std::string& text) { return text.empty() ? Json() : Json(text); }
 
+const char* NameOf(datasources::LevelStatus status) {
+  switch (status) {
+    case datasources::LevelStatus::kCurrent:
+      return "current";
+    case datasources::LevelStatus::kStale:
+      return "stale";
+    case datasources::LevelStatus::kUnfinished:
+      return "unfinished";
+    case datasources::LevelStatus::kUnverified:
+      break;
+  }
+  return "unverified";
+}
+
 Json ChannelsOf(const LevelDescription& level) {
   Json channels = Json::array();
   for (size_t i = 0; i < level.validChannels.size(); ++i)
@@ -31,6 +45,8 @@ Json JsonOf(const LevelDescription& level) {
           {"method", OrNull(level.method)},
           {"sourceLevel", level.sourceLevel ? Json(level.sourceLevel) : Json()},
           {"program", OrNull(level.program)},
+          {"state", NameOf(level.status)},
+          {"fingerprint", OrNull(level.image.fingerprint)},
           {"channels", ChannelsOf(level)}};
 }
 

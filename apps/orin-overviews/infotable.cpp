@@ -38,13 +38,16 @@ std::string PlaceText(const LevelDescription& level) {
   return std::filesystem::path(level.file).filename().string();
 }
 
-/// "yes", "no", or the channels that are up to date.
+/// "yes", "no", the channels that are up to date, or what else is known.
 std::string ValidText(const LevelDescription& level) {
   std::vector<unsigned> valid;
   for (unsigned i = 0; i < level.validChannels.size(); ++i)
     if (level.validChannels[i]) valid.push_back(i + 1);
+  if (level.status == datasources::LevelStatus::kStale) return _("stale");
   if (valid.empty()) return _("no");
-  if (valid.size() == level.validChannels.size()) return _("yes");
+  const bool isUnverified = level.status == datasources::LevelStatus::kUnverified;
+  if (valid.size() == level.validChannels.size()) return isUnverified ? _("unverified") : _("yes");
+  if (isUnverified) return FormatString(_("channels %s unverified"), JoinNumbers(valid).c_str());
   return FormatString(_("channels %s"), JoinNumbers(valid).c_str());
 }
 

@@ -5,6 +5,7 @@
 
 #include "host/datasources/datasetmanager.h"
 #include "host/datasources/formats.h"
+#include "host/datasources/levelstore.h"
 #include "host/services/exception.h"
 #include "host/services/text.h"
 
@@ -32,6 +33,7 @@ RasterInfo CollectInfo(const std::string& file) {
     info.channels.push_back(
         std::unique_ptr<datasources::IChannelInfo>(raster->GetChannelInfo(channel))->GetDataType());
   const std::unique_ptr<datasources::IOverviewInfo> levels(raster->GetOverviewInfo());
+  if (auto* store = raster->GetSource()->Levels()) store->KeepAnswers();
   if (levels) info.levels = levels->Describe();
   return info;
 }

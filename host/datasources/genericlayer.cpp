@@ -39,10 +39,17 @@ class BothPlaces final : public ILevelStore {
   std::unique_ptr<IRasterWriter> OpenWriter(unsigned level,
                                             const std::vector<unsigned>& channels) override {
     const bool inside = internal_ && !Holds(sideCar_->List(), level);
-    return (inside ? *internal_ : *sideCar_).OpenWriter(level, channels);
+    if (!inside) return sideCar_->OpenWriter(level, channels);
+    for (const LevelDescription& entry : internal_->List())
+      if (entry.level == level) sideCar_->SetSource(entry);
+    return internal_->OpenWriter(level, channels);
   }
   void SetValid(unsigned level, const std::vector<unsigned>& channels, bool valid) override {
     sideCar_->SetValid(level, channels, valid);
+  }
+  void KeepAnswers() override {
+    sideCar_->KeepAnswers();
+    if (internal_) internal_->KeepAnswers();
   }
 
  private:
@@ -67,6 +74,7 @@ class GenericSource final : public IRasterSource {
     return image_->OpenReader(channels);
   }
   ILevelStore* Levels() override { return &levels_; }
+  std::shared_ptr<ImageWatch> Watch() override { return image_->Watch(); }
 
  private:
   std::unique_ptr<IRasterSource> image_;

@@ -8,6 +8,7 @@
 
 #include "basic/gobs/datatype.h"
 #include "host/datasources/auxiliarydata.h"
+#include "host/datasources/imagewatch.h"
 #include "host/datasources/overviewinfo.h"
 #include "host/datasources/rasterreader.h"
 #include "host/datasources/rasterwriter.h"
@@ -38,6 +39,14 @@ class ILevelStore {
   /// Marks `channels` of `level`. For true, everything written before is made durable first.
   /// \throws orin::Exception  no such level, its pixels are not complete, or it cannot be stored
   virtual void SetValid(unsigned level, const std::vector<unsigned>& channels, bool valid) = 0;
+
+  /// The level created last is computed from `source`, a level that another store keeps. Without
+  /// this call it is the level of this store whose pixels are read, or else the image.
+  virtual void SetSource(const LevelDescription& /*source*/) {}
+
+  /// Where `List` had to read the whole image to tell what is up to date, keeps the answer with the
+  /// levels, if their file may be written, so that the next one comes at once. Never fails.
+  virtual void KeepAnswers() {}
 };
 
 /// One opened raster as its driver sees it.
@@ -59,6 +68,9 @@ class IRasterSource {
 
   /// The levels kept with this raster, or null when its format holds none. Owned by the source.
   virtual ILevelStore* Levels() = 0;
+
+  /// Knows whether the image's data is what it was. Null: the bytes of its file tell.
+  virtual std::shared_ptr<ImageWatch> Watch() { return nullptr; }
 };
 
 }  // namespace orin::datasources

@@ -10,13 +10,20 @@
 namespace orin::datasources {
 namespace {
 
-std::vector<unsigned> LevelsOf(const ILevelStore* store, const std::vector<unsigned>& channels) {
+using IsWanted = bool (*)(const LevelDescription&);
+
+std::vector<unsigned> LevelsOf(const ILevelStore* store, const std::vector<unsigned>& channels,
+                               IsWanted isWanted) {
   std::vector<unsigned> levels;
   if (store)
     for (const LevelDescription& entry : store->List())
-      if (HoldsForAll(entry.presentChannels, channels)) levels.push_back(entry.level);
+      if (isWanted(entry) && HoldsForAll(entry.presentChannels, channels))
+        levels.push_back(entry.level);
   return levels;
 }
+
+bool IsAny(const LevelDescription&) { return true; }
+bool MayBeSource(const LevelDescription& entry) { return entry.status != LevelStatus::kStale; }
 
 }  // namespace
 
@@ -25,7 +32,7 @@ BasicOverviewReaderAccessor::BasicOverviewReaderAccessor(IRasterDataset* dataset
     : store_(dataset->GetSource()->Levels()), channels_(channels) {}
 
 std::vector<unsigned> BasicOverviewReaderAccessor::GetLevels() const {
-  return LevelsOf(store_, channels_);
+  return LevelsOf(store_, channels_, IsAny);
 }
 
 bool BasicOverviewReaderAccessor::IsLevelValid(unsigned level) const {
@@ -60,7 +67,7 @@ IRasterWriter* BasicOverviewWriterAccessor::CreateRasterWriter(unsigned level) {
 }
 
 std::vector<unsigned> BasicOverviewWriterAccessor::GetLevels() const {
-  return LevelsOf(store_, channels_);
+  return LevelsOf(store_, channels_, MayBeSource);
 }
 
 void BasicOverviewWriterAccessor::SetValid(unsigned channel, unsigned level, bool valid) {

@@ -40,7 +40,8 @@ class BasicOverviewWriterAccessor {
   /// A new writer of an existing level, owned by the caller; where the run fills with what readers
   /// answered, the level stores the declared no-data value. \throws orin::Exception
   IRasterWriter* CreateRasterWriter(unsigned level);
-  /// Levels present for these channels, ascending.
+  /// Levels present for these channels, ascending, but for those that are out of date: a level may
+  /// be computed from any of these.
   std::vector<unsigned> GetLevels() const;
   /// \param channel  1-based within this accessor's channels
   /// \throws orin::Exception  no such channel or level, or it cannot be stored

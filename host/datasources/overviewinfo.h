@@ -6,10 +6,20 @@
 #include <string>
 #include <vector>
 
+#include "host/datasources/imagerecord.h"
+
 namespace orin::datasources {
 
 /// Where the pixels of a level are kept.
 enum class LevelPlace { kInternal, kSideCar };
+
+/// How a level stands to its image.
+enum class LevelStatus {
+  kUnverified,  ///< present and usable; nothing tells which data it was computed from
+  kUnfinished,  ///< some channel is being built, or its build did not end
+  kStale,       ///< computed from other data than the image holds now: no channel is valid
+  kCurrent      ///< computed from the data that the image holds
+};
 
 /// Everything that is known of one level.
 struct LevelDescription {
@@ -22,7 +32,10 @@ struct LevelDescription {
   unsigned sourceLevel = 0;  ///< level it was computed from, 1 for full resolution; 0 unknown
   std::string program;       ///< program and version that made it; empty when unknown
   std::vector<bool> presentChannels;  ///< one entry for each channel of the raster: created
-  std::vector<bool> validChannels;    ///< one entry for each channel of the raster: up to date
+  std::vector<bool> validChannels;  ///< one entry for each channel of the raster: finished, and not
+                                    ///< known to be out of date
+  LevelStatus status = LevelStatus::kUnverified;
+  ImageRecord image = {};  ///< that it was computed from; blank when unknown
 };
 
 /// True when `entries` holds true for every one of `channels` (1-based).
@@ -41,7 +54,8 @@ class IOverviewInfo {
   virtual std::vector<LevelDescription> Describe() const = 0;
   /// The method that made `level`; empty when it is unknown or the level is absent.
   virtual std::string GetResamplingName(unsigned level) const = 0;
-  /// True when that channel's overview (1-based) at that level exists and is up to date.
+  /// True when that channel's overview (1-based) at that level exists, is finished, and is not
+  /// known to be out of date.
   virtual bool IsLevelValid(unsigned channel, unsigned level) const = 0;
 };
 

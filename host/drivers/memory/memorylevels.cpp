@@ -143,6 +143,12 @@ std::vector<LevelDescription> MemoryLevels::List() const {
       list.back().presentChannels.push_back(channel.present);
       list.back().validChannels.push_back(channel.valid);
     }
+    // Nobody changes the raster behind its levels' back.
+    list.back().status =
+        std::any_of(level.channels.begin(), level.channels.end(),
+                    [](const MemoryLevelChannel& c) { return c.present && !c.valid; })
+            ? datasources::LevelStatus::kUnfinished
+            : datasources::LevelStatus::kCurrent;
   }
   return list;
 }

@@ -50,6 +50,7 @@ void ReadMetadata(const PositionedFile& file, const TiffStructure& structure,
   const std::vector<uint8_t> bytes = ReadBytes(file, structure, *entry);
   stored.metadata = ParseLevelMetadata(std::string(bytes.begin(), bytes.end()));
   stored.validityPosition = entry->position + stored.metadata.validityAt;
+  stored.imagePosition = entry->position + stored.metadata.imageAt;
 }
 
 /// Whether a level of ours says so truly: one of a copied or resized image may not.

@@ -29,6 +29,7 @@ struct StoredLevel {
   PixelFormat format;
   LevelMetadata metadata;
   uint64_t validityPosition = 0;  ///< in the file
+  uint64_t imagePosition = 0;     ///< of the record of the image, in the file
 };
 
 /// The factor of a level that another program made, from its size, rounded down or up in each axis;

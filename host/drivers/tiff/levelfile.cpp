@@ -85,6 +85,11 @@ void LevelFile::Sync() {
   file_->Sync();
 }
 
+int64_t LevelFile::SetModified(int64_t nanoseconds) {
+  OpenForChange();
+  return file_->SetModified(nanoseconds);
+}
+
 /// A cloud-optimized file says in a text behind its header that it keeps a certain order; this one
 /// will not any more. The text has a blank for the longer word.
 void LevelFile::DeclareEdited() {

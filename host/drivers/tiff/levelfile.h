@@ -39,6 +39,8 @@ class LevelFile {
   /// Changes bytes in place.
   void Overwrite(uint64_t position, const std::string& bytes);
   void Sync();
+  /// \see PositionedFile::SetModified
+  int64_t SetModified(int64_t nanoseconds);
   /// Makes a directory visible, durably: everything appended before is on the device first. The
   /// structure is read again.
   void Link(const Place& place, uint64_t directory);

@@ -14,6 +14,7 @@ constexpr char kFactor[] = "ORIN_FACTOR";
 constexpr char kSource[] = "ORIN_SOURCE_LEVEL";
 constexpr char kProgram[] = "ORIN_PROGRAM";
 constexpr char kValidity[] = "ORIN_VALID";
+constexpr char kImage[] = "ORIN_IMAGE";
 
 unsigned NumberIn(const std::string& text) {
   unsigned number = 0;
@@ -21,13 +22,12 @@ unsigned NumberIn(const std::string& text) {
   return error == std::errc() && end == text.data() + text.size() ? number : 0;
 }
 
-/// Where the text of the validity item starts, or npos.
-size_t FindValidity(const std::string& text, const std::string& validity) {
-  const size_t name = text.find(std::string("name=\"") + kValidity + '"');
+/// Where the text of an item starts that is written as it is read, or npos.
+size_t FindPlain(const std::string& text, const char* item, const std::string& plain) {
+  const size_t name = text.find(std::string("name=\"") + item + '"');
   if (name == text.npos) return name;
   const size_t start = text.find('>', name);
-  const bool isThere =
-      start != text.npos && text.compare(start + 1, validity.size(), validity) == 0;
+  const bool isThere = start != text.npos && text.compare(start + 1, plain.size(), plain) == 0;
   return isThere ? start + 1 : text.npos;
 }
 
@@ -46,22 +46,29 @@ std::string ComposeLevelMetadata(const LevelMetadata& metadata) {
   add(kSource, std::to_string(metadata.sourceLevel));
   add(kProgram, metadata.program);
   add(kValidity, metadata.validity);
+  add(kImage, TextOf(metadata.image));
   return ComposeMetadata(items);
 }
 
 LevelMetadata ParseLevelMetadata(const std::string& text) {
   LevelMetadata metadata;
+  std::string image;
   for (const MetadataItem& item : ParseMetadata(text)) {
     if (item.name == kMethod && !item.sample) metadata.method = item.text;
     if (item.name == kFactor) metadata.level = NumberIn(item.text);
     if (item.name == kSource) metadata.sourceLevel = NumberIn(item.text);
     if (item.name == kProgram) metadata.program = item.text;
     if (item.name == kValidity) metadata.validity = item.text;
+    if (item.name == kImage) image = item.text;
   }
-  const size_t at = FindValidity(text, metadata.validity);
+  const size_t at = FindPlain(text, kValidity, metadata.validity);
   const bool isWhole = metadata.validity.find_first_not_of("-01") == std::string::npos;
   if (at == text.npos || !isWhole) metadata.validity.clear();
   else metadata.validityAt = at;
+  const size_t imageAt = FindPlain(text, kImage, image);
+  if (image.size() != datasources::kImageRecordLength || imageAt == text.npos) return metadata;
+  metadata.image = datasources::ParseImageRecord(image);
+  metadata.imageAt = imageAt;
   return metadata;
 }
 

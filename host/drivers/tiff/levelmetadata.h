@@ -6,6 +6,8 @@
 #include <optional>
 #include <string>
 
+#include "host/datasources/imagerecord.h"
+
 namespace orin::drivers {
 
 inline constexpr char kAbsent = '-';   ///< the channel was not created
@@ -20,6 +22,8 @@ struct LevelMetadata {
   std::string validity;  ///< one character a channel; empty when the tag has none
   uint64_t validityAt =
       0;  ///< of its first character in the tag's text: changed in place, never moved
+  datasources::ImageRecord image = {};  ///< that the level was computed from
+  uint64_t imageAt = 0;                 ///< as validityAt; 0 when the tag has no such item
 };
 
 /// The name and version that levels are signed with.

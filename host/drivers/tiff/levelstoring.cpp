@@ -35,8 +35,11 @@ std::vector<uint32_t> TiffLevelStore::CompletePlanes(const LevelBuild& build) co
 }
 
 /// \param before  the level of ours that is in the file, or null
+/// \param image   that the pending channels were computed from. Channels computed from other data
+///                are as good as not there: a level remembers one image
 LevelMetadata TiffLevelStore::MetadataFor(unsigned level, const Pending& pending,
-                                          const StoredLevel* before) const {
+                                          const StoredLevel* before,
+                                          const datasources::ImageRecord& image) const {
   LevelMetadata metadata;
   metadata.method = pending.method;
   metadata.level = level;
@@ -46,6 +49,9 @@ LevelMetadata TiffLevelStore::MetadataFor(unsigned level, const Pending& pending
       before ? before->metadata.validity : std::string(pending.channels.size(), kAbsent);
   for (size_t i = 0; i < pending.channels.size(); ++i)
     if (pending.channels[i]) metadata.validity[i] = kInvalid;
+    else if (before && before->metadata.image.fingerprint != image.fingerprint)
+      metadata.validity[i] = kAbsent;
+  metadata.image = image;
   return metadata;
 }
 
@@ -54,8 +60,8 @@ LevelMetadata TiffLevelStore::MetadataFor(unsigned level, const Pending& pending
 bool TiffLevelStore::CanPatch(const StoredLevel& stored, const LevelMetadata& metadata,
                               const LevelBuild& build) const {
   const LevelMetadata& old = stored.metadata;
-  if (old.method != metadata.method || old.sourceLevel != metadata.sourceLevel ||
-      old.program != metadata.program)
+  if (old.method != metadata.method || old.image != metadata.image ||
+      old.sourceLevel != metadata.sourceLevel || old.program != metadata.program)
     return false;
   const bool sharesTiles = !build.Coding().format.planar;
   if (sharesTiles && metadata.validity.find(kValid) != std::string::npos) return false;
@@ -114,12 +120,15 @@ void TiffLevelStore::AddDirectory(unsigned level, const LevelMetadata& metadata,
 }
 
 /// Puts the tiles of `planes` into the level's directory; its validity is turned on by nobody here.
-void TiffLevelStore::Store(unsigned level, Pending& pending, const std::vector<uint32_t>& planes) {
+/// \param image  that they were computed from; none: what the level remembers stays
+void TiffLevelStore::Store(unsigned level, Pending& pending, const std::vector<uint32_t>& planes,
+                           const std::optional<datasources::ImageRecord>& image) {
   const std::shared_ptr<LevelBuild> build = pending.build;
   file_->Sync();
   CatchUp();
   const StoredLevel* ours = FindOurs(level);
-  const LevelMetadata metadata = MetadataFor(level, pending, ours);
+  const datasources::ImageRecord kept = ours ? ours->metadata.image : datasources::ImageRecord();
+  const LevelMetadata metadata = MetadataFor(level, pending, ours, image.value_or(kept));
   if (ours && CanPatch(*ours, metadata, *build)) Patch(*ours, metadata, *build, planes);
   else AddDirectory(level, metadata, *build, planes);
   Reload();

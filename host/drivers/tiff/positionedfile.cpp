@@ -110,6 +110,22 @@ void PositionedFile::Truncate(uint64_t size) {
          "PositionedFile::Truncate(uint64_t)");
 }
 
+int64_t PositionedFile::SetModified(int64_t nanoseconds) {
+  constexpr int64_t kSecond = 1000000000;
+  int64_t seconds = nanoseconds / kSecond;
+  if (nanoseconds % kSecond < 0) --seconds;  // times before 1970
+  timespec times[2] = {};
+  times[0].tv_nsec = UTIME_OMIT;
+  times[1].tv_sec = seconds;
+  times[1].tv_nsec = nanoseconds - seconds * kSecond;
+  futimens(descriptor_, times);  // refused to those who do not own the file
+  struct stat status;
+  if (fstat(descriptor_, &status) != 0)
+    Fail(_("%s: cannot be looked at: %s."), path_, std::strerror(errno),
+         "PositionedFile::SetModified(int64_t)");
+  return status.st_mtim.tv_sec * kSecond + status.st_mtim.tv_nsec;
+}
+
 void PositionedFile::Rename(const std::string& path) {
   if (std::rename(path_.c_str(), path.c_str()) != 0)
     Fail(_("%s: cannot be renamed: %s."), path_, std::strerror(errno),

@@ -34,6 +34,9 @@ class PositionedFile {
   /// Returns when everything written is on the storage device.
   void Sync();
   void Truncate(uint64_t size);
+  /// Sets the modification time, nanoseconds since 1970, as finely as the file system keeps it.
+  /// \returns the time that it has then, which is another one where it may not be set
+  int64_t SetModified(int64_t nanoseconds);
   /// Keeps other programs that ask for it from changing the file, until this object goes.
   /// \throws orin::Exception  another one has it
   void Lock();

@@ -12,20 +12,23 @@ namespace orin::drivers {
 
 using datasources::LevelDescription;
 
-std::unique_ptr<datasources::ILevelStore> OpenInternalLevels(const std::string& file,
-                                                             const PixelFormat& image,
-                                                             bool update) {
+std::unique_ptr<datasources::ILevelStore> OpenInternalLevels(
+    const std::string& file, const PixelFormat& image, bool update,
+    std::shared_ptr<datasources::ImageWatch> watch) {
   auto levels = std::make_unique<LevelFile>(file, update);
   TiffLevelStore::Settings settings;
   settings.image = {image.width, image.height, image.samplesPerPixel, image.type, true};
   settings.coding =
       CodingOf(levels->File(), levels->Structure(), levels->Structure().directories[0], image);
   settings.usualSource = 1;
+  settings.watch = std::move(watch);
   return std::make_unique<TiffLevelStore>(std::move(levels), std::move(settings));
 }
 
 TiffLevelStore::TiffLevelStore(std::unique_ptr<LevelFile> file, Settings settings)
-    : file_(std::move(file)), settings_(std::move(settings)) {
+    : file_(std::move(file)),
+      settings_(std::move(settings)),
+      freshness_(settings_.watch, settings_.place == datasources::LevelPlace::kInternal) {
   Reload();
 }
 
@@ -40,6 +43,7 @@ void TiffLevelStore::CatchUp() {
   file_->ToAppend();
   file_->Refresh();
   Reload();
+  freshness_.BeginChange(levels_);
 }
 
 void TiffLevelStore::Fail(const char* format, unsigned level, const char* operation) const {
@@ -64,7 +68,9 @@ const StoredLevel* TiffLevelStore::Find(unsigned level) const {
   return found == levels_.end() ? nullptr : &*found;
 }
 
-LevelDescription TiffLevelStore::Describe(const StoredLevel& stored) const {
+LevelDescription TiffLevelStore::Describe(const StoredLevel& stored,
+                                          datasources::LevelStatus status) const {
+  const bool isStale = status == datasources::LevelStatus::kStale;
   LevelDescription entry;
   entry.level = stored.level;
   entry.width = stored.format.width;
@@ -72,14 +78,16 @@ LevelDescription TiffLevelStore::Describe(const StoredLevel& stored) const {
   entry.place = settings_.place;
   entry.file = file_->Path();
   entry.method = stored.metadata.method;
+  entry.status = status;
   const std::string& validity = stored.metadata.validity;
   for (uint32_t i = 0; i < settings_.image.samples; ++i) {
     entry.presentChannels.push_back(!stored.isOurs || validity[i] != kAbsent);
-    entry.validChannels.push_back(!stored.isOurs || validity[i] == kValid);
+    entry.validChannels.push_back(!stored.isOurs || (validity[i] == kValid && !isStale));
   }
   if (!stored.isOurs) return entry;
   entry.sourceLevel = stored.metadata.sourceLevel;
   entry.program = stored.metadata.program;
+  entry.image = stored.metadata.image;
   return entry;
 }
 
@@ -97,6 +105,7 @@ void TiffLevelStore::AddPending(unsigned level, const Pending& pending,
     entry->file = file_->Path();
     entry->method = pending.method;
     entry->program = ProgramName();
+    entry->status = datasources::LevelStatus::kUnfinished;
     entry->presentChannels = pending.channels;
     entry->validChannels.assign(pending.channels.size(), false);
   }
@@ -107,8 +116,11 @@ void TiffLevelStore::AddPending(unsigned level, const Pending& pending,
 std::vector<LevelDescription> TiffLevelStore::List() const {
   const std::lock_guard lock(mutex_);
   std::vector<LevelDescription> list;
-  for (const StoredLevel& stored : levels_)
-    if (Find(stored.level) == &stored) list.push_back(Describe(stored));
+  const LevelFreshness::Judgement judgement = freshness_.Judge(levels_);
+  if (file_->MayChange()) Keep(judgement);
+  for (size_t i = 0; i < levels_.size(); ++i)
+    if (Find(levels_[i].level) == &levels_[i])
+      list.push_back(Describe(levels_[i], judgement.statuses[i]));
   for (const auto& [level, pending] : pending_) AddPending(level, pending, list);
   std::sort(list.begin(), list.end(),
             [](const LevelDescription& a, const LevelDescription& b) { return a.level < b.level; });
@@ -134,6 +146,7 @@ void TiffLevelStore::Create(unsigned level, const std::vector<unsigned>& channel
   if (entry == pending_.end()) {
     const StoredLevel* ours = FindOurs(level);
     Pending pending;
+    pending.imageAtStart = freshness_.Now();
     pending.channels.resize(settings_.image.samples);
     pending.coding =
         ours ? CodingOfStored(*ours) : CodingOfLevel(settings_.coding, level, file_->Path());
@@ -142,6 +155,7 @@ void TiffLevelStore::Create(unsigned level, const std::vector<unsigned>& channel
   for (const unsigned channel : channels) entry->second.channels.at(channel - 1) = true;
   entry->second.method = method;
   lastRead_ = 0;
+  source_.reset();
 }
 
 std::unique_ptr<datasources::IRasterWriter> TiffLevelStore::OpenWriter(
@@ -160,7 +174,7 @@ std::unique_ptr<PixelReader> TiffLevelStore::OpenPixels(unsigned level,
   const std::lock_guard lock(mutex_);
   const StoredLevel* stored = Find(level);
   if (!stored) Fail(_("%s: level %u is not finished and cannot be read."), level, "OpenPixels");
-  if (!pending_.contains(level)) lastRead_ = level;
+  if (!pending_.contains(level)) NoteSource(*stored, channels);
   return std::make_unique<PixelReader>(
       file_->Path(), file_->Structure().directories[stored->index].offset, channels);
 }
@@ -190,6 +204,7 @@ TiffLevelStore::Pending& TiffLevelStore::Reopen(unsigned level,
   }
   if (entry != pending_.end()) return entry->second;
   Pending pending;
+  pending.imageAtStart = freshness_.Now();
   pending.channels.resize(settings_.image.samples);
   pending.method = ours->metadata.method;
   pending.coding = CodingOfStored(*ours);
@@ -218,6 +233,7 @@ std::shared_ptr<LevelBuild> TiffLevelStore::BeginWriting(unsigned level,
   if (!valid.empty()) Mark(*ours, valid, kInvalid);
   if (!pending.build)
     pending.build = std::make_shared<LevelBuild>(pending.coding, file_->ToAppend().End());
+  if (!source_) freshness_.Prepare(pending.imageAtStart);
   ++pending.build->writers;
   return pending.build;
 }
@@ -244,13 +260,13 @@ void TiffLevelStore::EndWriting(unsigned level, LevelBuild& build) noexcept {
   if (--build.writers > 0 || build.isClosed) return;
   try {
     if (!build.IsEmpty() && build.HasOnlyCompletePlanes())
-      Store(level, pending_.at(level), CompletePlanes(build));
+      Store(level, pending_.at(level), CompletePlanes(build), std::nullopt);
   } catch (const std::exception&) {
     // deliberate: a destructor calls this; the level stays what it was in the file
   }
-  if (build.isClosed) return;
   try {
-    GiveUp(level, build);
+    if (!build.isClosed) GiveUp(level, build);
+    Settle();
   } catch (const std::exception&) {
     // deliberate: what was appended stays behind unused
   }
@@ -264,7 +280,7 @@ void TiffLevelStore::SetValid(unsigned level, const std::vector<unsigned>& chann
     for (const uint32_t plane : planes)
       if (!pending->second.build->IsComplete(plane))
         Fail(_("%s: level %u is not complete and cannot be marked valid."), level, "SetValid");
-    Store(level, pending->second, planes);
+    Store(level, pending->second, planes, RecordOrGiveUp(level, pending->second));
   } else if (file_->Exists()) {
     CatchUp();
   }
@@ -273,6 +289,7 @@ void TiffLevelStore::SetValid(unsigned level, const std::vector<unsigned>& chann
   if (stored->isOurs) Mark(*stored, channels, valid ? kValid : kInvalid);
   else if (!valid)
     Fail(_("%s: level %u is another program's and cannot be marked."), level, "SetValid");
+  Settle();
 }
 
 void TiffLevelStore::RequireStored(const StoredLevel* stored, unsigned level,

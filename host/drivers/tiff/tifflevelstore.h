@@ -13,6 +13,7 @@
 #include "host/drivers/tiff/levelcoding.h"
 #include "host/drivers/tiff/leveldirectories.h"
 #include "host/drivers/tiff/levelfile.h"
+#include "host/drivers/tiff/levelfreshness.h"
 #include "host/drivers/tiff/pixelreader.h"
 
 namespace orin::drivers {
@@ -20,9 +21,11 @@ namespace orin::drivers {
 /// The levels inside the TIFF file of an image.
 /// \param image   format of the file's first directory
 /// \param update  levels may be made and changed
+/// \param watch   of the image
 /// \throws orin::Exception  the file's structure cannot be read
-std::unique_ptr<datasources::ILevelStore> OpenInternalLevels(const std::string& file,
-                                                             const PixelFormat& image, bool update);
+std::unique_ptr<datasources::ILevelStore> OpenInternalLevels(
+    const std::string& file, const PixelFormat& image, bool update,
+    std::shared_ptr<datasources::ImageWatch> watch);
 
 /// A level appears in the file when it is complete: tiles first, then its directory, then the link
 /// to it, then its validity, each durable before the next. Until then it is pending here; a pending
@@ -36,6 +39,7 @@ class TiffLevelStore final : public datasources::ILevelStore {
     LevelCoding coding;  ///< of the image, from which new levels take theirs
     datasources::LevelPlace place = datasources::LevelPlace::kInternal;
     unsigned usualSource = 0;  ///< recorded as a level's source when no level was read for it
+    std::shared_ptr<datasources::ImageWatch> watch;  ///< of the image
   };
   /// \throws orin::Exception  the file cannot be read
   TiffLevelStore(std::unique_ptr<LevelFile> file, Settings settings);
@@ -46,6 +50,8 @@ class TiffLevelStore final : public datasources::ILevelStore {
   std::unique_ptr<datasources::IRasterWriter> OpenWriter(
       unsigned level, const std::vector<unsigned>& channels) override;
   void SetValid(unsigned level, const std::vector<unsigned>& channels, bool valid) override;
+  void SetSource(const datasources::LevelDescription& source) override;
+  void KeepAnswers() override;
 
   // For the level writers.
 
@@ -68,27 +74,35 @@ class TiffLevelStore final : public datasources::ILevelStore {
     std::string method;
     LevelCoding coding;
     std::shared_ptr<LevelBuild> build;  ///< null until the first write
+    std::optional<datasources::ImageStamp> imageAtStart;
   };
 
   const StoredLevel* Find(unsigned level) const;
   const StoredLevel* FindOurs(unsigned level) const;
   void Reload();
   void CatchUp();
-  datasources::LevelDescription Describe(const StoredLevel& stored) const;
+  datasources::LevelDescription Describe(const StoredLevel& stored,
+                                         datasources::LevelStatus status) const;
   void AddPending(unsigned level, const Pending& pending,
                   std::vector<datasources::LevelDescription>& list) const;
   LevelCoding CodingOfStored(const StoredLevel& stored) const;
   Pending& Reopen(unsigned level, const std::vector<unsigned>& channels);
   void Mark(const StoredLevel& stored, const std::vector<unsigned>& channels, char validity);
 
-  LevelMetadata MetadataFor(unsigned level, const Pending& pending,
-                            const StoredLevel* before) const;
+  datasources::ImageRecord RecordOrGiveUp(unsigned level, const Pending& pending);
+  void NoteSource(const StoredLevel& stored, const std::vector<unsigned>& channels);
+  void Settle();
+  void Keep(const LevelFreshness::Judgement& judgement) const;
+
+  LevelMetadata MetadataFor(unsigned level, const Pending& pending, const StoredLevel* before,
+                            const datasources::ImageRecord& image) const;
   std::vector<uint32_t> PlanesOf(const LevelCoding& coding,
                                  const std::vector<unsigned>& channels) const;
   std::vector<uint32_t> CompletePlanes(const LevelBuild& build) const;
   void RequireStored(const StoredLevel* stored, unsigned level,
                      const std::vector<unsigned>& channels) const;
-  void Store(unsigned level, Pending& pending, const std::vector<uint32_t>& planes);
+  void Store(unsigned level, Pending& pending, const std::vector<uint32_t>& planes,
+             const std::optional<datasources::ImageRecord>& image);
   bool CanPatch(const StoredLevel& stored, const LevelMetadata& metadata,
                 const LevelBuild& build) const;
   void Patch(const StoredLevel& stored, const LevelMetadata& metadata, const LevelBuild& build,
@@ -101,9 +115,12 @@ class TiffLevelStore final : public datasources::ILevelStore {
   mutable std::mutex mutex_;
   std::unique_ptr<LevelFile> file_;
   Settings settings_;
+  mutable LevelFreshness freshness_;
+  mutable std::optional<datasources::ImageStamp> kept_;  ///< of the last answer that was kept
   std::vector<StoredLevel> levels_;
   std::map<unsigned, Pending> pending_;
   unsigned lastRead_ = 0;  ///< level whose pixels were read since the last Create; 0 none
+  std::optional<datasources::ImageRecord> source_;  ///< of that level; blank where it is unknown
 };
 
 }  // namespace orin::drivers

@@ -11,6 +11,7 @@
 
 #include "host/datasources/nodatavalue.h"
 #include "host/drivers/tiff/pixelreader.h"
+#include "host/drivers/tiff/tifffingerprint.h"
 #include "host/drivers/tiff/tifflevelstore.h"
 #include "host/services/exception.h"
 #include "host/services/text.h"
@@ -84,7 +85,9 @@ TiffSource::TiffSource(std::string file, datasources::AccessMode access) : file_
       [](const MetadataItem& item) { return item.domain.empty() && item.name == kNoDataKey; });
   if (!declared && datasources::ParseNoData(format_.noData))
     metadata_.push_back({kNoDataKey, std::nullopt, "", "", format_.noData});
-  levels_ = OpenInternalLevels(file_, format_, access == datasources::kUpdate);
+  watch_ = std::make_shared<datasources::ImageWatch>(
+      file_, [path = file_](const std::stop_token& stop) { return FingerprintOfTiff(path, stop); });
+  levels_ = OpenInternalLevels(file_, format_, access == datasources::kUpdate, watch_);
 }
 
 TiffSource::~TiffSource() = default;

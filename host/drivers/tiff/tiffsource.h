@@ -33,11 +33,13 @@ class TiffSource final : public datasources::IRasterSource {
   std::unique_ptr<datasources::IRasterReader> OpenReader(
       const std::vector<unsigned>& channels) override;
   datasources::ILevelStore* Levels() override { return levels_.get(); }
+  std::shared_ptr<datasources::ImageWatch> Watch() override { return watch_; }
 
  private:
   std::string file_;
   PixelFormat format_;
   std::vector<MetadataItem> metadata_;
+  std::shared_ptr<datasources::ImageWatch> watch_;
   std::unique_ptr<datasources::ILevelStore> levels_;
 };
 
