@@ -4,12 +4,19 @@
 
 #include <map>
 #include <string>
+#include <utility>
 #include <vector>
 
 namespace orin::datasources {
 
 /// The key of the no-data value: a decimal number in text.
 inline constexpr char kNoDataKey[] = "NO_DATA_VALUE";
+/// File item of a reader whose blocks carry a validity, whatever its text.
+inline constexpr char kValidityKey[] = "VALIDITY";
+/// File item: the file's no-data value is a fill only, no pixel is no data for being equal to it.
+inline constexpr char kFillOnlyKey[] = "NO_DATA_VALUE_IS_FILL";
+/// Channel item: the channel is alpha, and no part of what a no-data value is compared with.
+inline constexpr char kAlphaKey[] = "ALPHA";
 
 class AuxiliaryData {
  public:
@@ -24,6 +31,14 @@ class AuxiliaryData {
   /// \param channel  1-based within the reader's channels. Empty when it has no such item.
   std::string GetChanMetadataValue(const std::string& key, unsigned channel) const {
     return channel < 1 || channel > channels_.size() ? "" : ValueOf(channels_[channel - 1], key);
+  }
+  void SetFileMetadataValue(const std::string& key, std::string value) {
+    file_[key] = std::move(value);
+  }
+  /// \param channel  1-based within the reader's channels
+  void SetChanMetadataValue(const std::string& key, unsigned channel, std::string value) {
+    if (channel > channels_.size()) channels_.resize(channel);
+    channels_[channel - 1][key] = std::move(value);
   }
 
  private:

@@ -15,12 +15,16 @@ namespace {
 
 using orin::datasources::AuxiliaryData;
 using orin::datasources::IRasterReader;
+using orin::datasources::kAlphaKey;
+using orin::datasources::kFillOnlyKey;
+using orin::datasources::kNoDataKey;
 using orin::gobs::Mask;
 using orin::gobs::Raster;
 
 /// A no-data value as its channel can hold it.
 template <class T>
 struct Declared {
+  bool counts = true;       ///< false for alpha, which may hold anything
   bool comparable = false;  ///< false: no pixel of the type can equal it
   T value{};
 };
@@ -65,9 +69,11 @@ class EqualsNoData final : public orin::gobs::IMaskDecision {
   EqualsNoData(std::vector<Declared<T>> values, uint32_t componentsPerSample)
       : components_(componentsPerSample) {
     for (const Declared<T>& channel : values) {
-      possible_ = possible_ && channel.comparable;
-      pixel_.push_back(channel.value);
-      for (uint32_t i = 1; i < components_; ++i) pixel_.push_back(T{0});
+      possible_ = possible_ && (channel.comparable || !channel.counts);
+      for (uint32_t i = 0; i < components_; ++i) {
+        if (channel.counts) compared_.push_back(pixel_.size());
+        pixel_.push_back(i == 0 ? channel.value : T{0});
+      }
     }
   }
 
@@ -81,14 +87,30 @@ class EqualsNoData final : public orin::gobs::IMaskDecision {
 
  private:
   bool IsNoData(const T* sample) const {
-    for (size_t i = 0; i < pixel_.size(); ++i)
+    for (const size_t i : compared_)
       if (sample[i] != pixel_[i]) return false;
     return true;
   }
 
   uint32_t components_;
   std::vector<T> pixel_;
+  std::vector<size_t> compared_;  ///< samples of the pixel
   bool possible_ = true;
+};
+
+/// No data where `declared` (null: nowhere) says so, or the block's own validity.
+class WithBlockValidity final : public orin::gobs::IMaskDecision {
+ public:
+  explicit WithBlockValidity(std::unique_ptr<orin::gobs::IMaskDecision> declared)
+      : declared_(std::move(declared)) {}
+
+  void Decide(const Raster& block, Mask& mask) const override {
+    if (declared_) declared_->Decide(block, mask);
+    if (block.validity) mask.Intersect(*block.validity);
+  }
+
+ private:
+  std::unique_ptr<orin::gobs::IMaskDecision> declared_;
 };
 
 /// Without blanks around it and without a plus sign, which number parsing does not take.
@@ -100,32 +122,50 @@ std::string Trimmed(const std::string& text) {
   return text.substr(start, text.find_last_not_of(kBlanks) + 1 - start);
 }
 
+bool IsAlpha(const AuxiliaryData& metadata, unsigned channel) {
+  return !metadata.GetChanMetadataValue(kAlphaKey, channel).empty();
+}
+
 /// The reader's no-data texts, one a channel; nothing when no channel has one.
 std::optional<std::vector<std::string>> DeclaredTexts(const IRasterReader& reader) {
   const AuxiliaryData metadata = reader.GetAuxiliaryData();
-  const std::string file = metadata.GetFileMetadataValue(orin::datasources::kNoDataKey);
+  const bool isFillOnly = !metadata.GetFileMetadataValue(kFillOnlyKey).empty();
+  const std::string file = isFillOnly ? "" : metadata.GetFileMetadataValue(kNoDataKey);
   std::vector<std::string> texts;
   bool any = false;
   for (unsigned channel = 1; channel <= reader.GetChannelCount(); ++channel) {
-    std::string own = metadata.GetChanMetadataValue(orin::datasources::kNoDataKey, channel);
+    std::string own = metadata.GetChanMetadataValue(kNoDataKey, channel);
     texts.push_back(Trimmed(own.empty() ? file : own));
-    any = any || IsFiniteNumber(texts.back());
+    any = any || (!IsAlpha(metadata, channel) && IsFiniteNumber(texts.back()));
   }
   if (!any) return std::nullopt;
   return texts;
 }
 
-}  // namespace
-
-orin::gobs::IMaskDecision* GetFileMetadataSrcMask(orin::datasources::IRasterReader* reader) {
-  const auto texts = DeclaredTexts(*reader);
+/// The decision of the values that the reader's file declares, or null.
+std::unique_ptr<orin::gobs::IMaskDecision> DeclaredDecision(const IRasterReader& reader) {
+  const auto texts = DeclaredTexts(reader);
   if (!texts) return nullptr;
-  const orin::gobs::DataType type = reader->GetDataType();
+  const AuxiliaryData metadata = reader.GetAuxiliaryData();
+  const orin::gobs::DataType type = reader.GetDataType();
   std::unique_ptr<orin::gobs::IMaskDecision> decision;
   orin::typedispatch::WithPixelType(type, [&]<class T>(std::type_identity<T>) {
     std::vector<Declared<T>> values;
-    for (const std::string& text : *texts) values.push_back(Parse<T>(text));
+    for (const std::string& text : *texts) {
+      values.push_back(Parse<T>(text));
+      values.back().counts = !IsAlpha(metadata, static_cast<unsigned>(values.size()));
+    }
     decision = std::make_unique<EqualsNoData<T>>(std::move(values), ComponentsPerSample(type));
   });
+  return decision;
+}
+
+}  // namespace
+
+orin::gobs::IMaskDecision* GetFileMetadataSrcMask(orin::datasources::IRasterReader* reader) {
+  std::unique_ptr<orin::gobs::IMaskDecision> decision = DeclaredDecision(*reader);
+  const std::string validity =
+      reader->GetAuxiliaryData().GetFileMetadataValue(orin::datasources::kValidityKey);
+  if (!validity.empty()) decision = std::make_unique<WithBlockValidity>(std::move(decision));
   return decision.release();
 }
