@@ -4,6 +4,7 @@
 #include <limits>
 
 #include "basic/gobs/blockmemory.h"
+#include "basic/gobs/mask/mask.h"
 #include "host/services/exception.h"
 
 namespace orin::gobs {

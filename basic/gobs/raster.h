@@ -3,12 +3,15 @@
 #pragma once
 
 #include <cstdint>
+#include <memory>
 
 #include "basic/gobs/bufferlayout.h"
 #include "basic/gobs/datatype.h"
 #include "basic/gobs/processwindow.h"
 
 namespace orin::gobs {
+
+class Mask;
 
 /// Describes a block without owning pixels.
 class RasterInfo {
@@ -57,6 +60,11 @@ class Raster : public RasterInfo, public RasterContext {
 
   /// The margin quadruple that the block was made with.
   parallelio::ProcessWindow Window() const { return {marginX, marginY, x, y}; }
+
+  /// What is known of the pixels beside their values, geometry of the block: in a block that was
+  /// read, the masks and the alpha channel of its raster; in one that was computed, where the
+  /// method put data. Null when nothing is known. No kernel reads it.
+  std::unique_ptr<Mask> validity;
 };
 
 /// Bytes between neighbouring pixels of a line. Not for the bit type.

@@ -4,12 +4,19 @@
 
 #include <map>
 #include <string>
+#include <utility>
 #include <vector>
 
 namespace orin::datasources {
 
 /// The key of the no-data value: a decimal number in text.
 inline constexpr char kNoDataKey[] = "NO_DATA_VALUE";
+/// File item of a reader whose blocks carry a validity, whatever its text.
+inline constexpr char kValidityKey[] = "VALIDITY";
+/// File item: the file's no-data value is a fill only, no pixel is no data for being equal to it.
+inline constexpr char kFillOnlyKey[] = "NO_DATA_VALUE_IS_FILL";
+/// Channel item: the channel is alpha, and no part of what a no-data value is compared with.
+inline constexpr char kAlphaKey[] = "ALPHA";
 
 class AuxiliaryData {
  public:

@@ -59,6 +59,12 @@ class ISideCarFormat {
   /// \param image  the image; outlives the store
   /// \throws orin::Exception  a side-car exists and cannot be read
   virtual std::unique_ptr<ILevelStore> Open(const std::string& imageFile, IRasterSource& image) = 0;
+  /// A reader of the mask file beside an image of that size; null when there is none, or none that
+  /// can serve, of which the user is warned.
+  virtual std::unique_ptr<IValidityReader> OpenMaskBeside(const std::string& /*imageFile*/,
+                                                          unsigned /*width*/, unsigned /*height*/) {
+    return nullptr;
+  }
 };
 
 /// The registered drivers. Filled by the application before work starts.

@@ -4,6 +4,7 @@
 #include <algorithm>
 #include <utility>
 
+#include "host/datasources/validityreader.h"
 #include "host/services/exception.h"
 #include "host/services/text.h"
 
@@ -61,7 +62,12 @@ class GenericSource final : public IRasterSource {
  public:
   GenericSource(std::unique_ptr<IRasterSource> image, ISideCarFormat& format,
                 const std::string& file)
-      : image_(std::move(image)), levels_(image_->Levels(), format.Open(file, *image_)) {}
+      : image_(std::move(image)),
+        levels_(image_->Levels(), format.Open(file, *image_)),
+        format_(format),
+        file_(file) {
+    hasMaskBeside_ = !image_->DeliversValidity() && OpenMaskBeside();
+  }
 
   unsigned Width() const override { return image_->Width(); }
   unsigned Height() const override { return image_->Height(); }
@@ -71,14 +77,34 @@ class GenericSource final : public IRasterSource {
     return image_->MetadataOf(channels);
   }
   std::unique_ptr<IRasterReader> OpenReader(const std::vector<unsigned>& channels) override {
-    return image_->OpenReader(channels);
+    auto reader = image_->OpenReader(channels);
+    if (image_->DeliversValidity()) return reader;
+    return WithValidity(std::move(reader), {OpenMask(), AlphaChannel(), [this] {
+                                              return image_->OpenReader({AlphaChannel()});
+                                            }});
   }
+  unsigned AlphaChannel() const override { return image_->AlphaChannel(); }
+  bool HasMask() const override { return hasMaskBeside_ || image_->HasMask(); }
+  std::unique_ptr<IValidityReader> OpenMask() override {
+    ValidityReaders masks;
+    masks.push_back(image_->OpenMask());
+    if (hasMaskBeside_) masks.push_back(OpenMaskBeside());
+    return AllOf(std::move(masks));
+  }
+  bool DeliversValidity() const override { return true; }
   ILevelStore* Levels() override { return &levels_; }
   std::shared_ptr<ImageWatch> Watch() override { return image_->Watch(); }
 
  private:
+  std::unique_ptr<IValidityReader> OpenMaskBeside() {
+    return format_.OpenMaskBeside(file_, image_->Width(), image_->Height());
+  }
+
   std::unique_ptr<IRasterSource> image_;
   BothPlaces levels_;
+  ISideCarFormat& format_;
+  std::string file_;
+  bool hasMaskBeside_ = false;
 };
 
 }  // namespace

@@ -12,6 +12,7 @@
 #include "host/datasources/overviewinfo.h"
 #include "host/datasources/rasterreader.h"
 #include "host/datasources/rasterwriter.h"
+#include "host/datasources/validity.h"
 
 namespace orin::datasources {
 
@@ -65,6 +66,16 @@ class IRasterSource {
   /// A reader of full-resolution pixels on a handle of its own; it must not outlive the source.
   /// \throws orin::Exception  the channels differ in type, or the file cannot be read
   virtual std::unique_ptr<IRasterReader> OpenReader(const std::vector<unsigned>& channels) = 0;
+
+  /// The 1-based number of the channel that holds opacity, 0 when none does.
+  virtual unsigned AlphaChannel() const { return 0; }
+  /// Whether a mask inside the file or beside it says which pixels hold data.
+  virtual bool HasMask() const { return false; }
+  /// A reader of that mask at full resolution on a handle of its own, null when there is none.
+  /// \throws orin::Exception  it cannot be read
+  virtual std::unique_ptr<IValidityReader> OpenMask() { return nullptr; }
+  /// Whether the blocks of its readers carry the validity that mask and alpha channel give.
+  virtual bool DeliversValidity() const { return false; }
 
   /// The levels kept with this raster, or null when its format holds none. Owned by the source.
   virtual ILevelStore* Levels() = 0;

@@ -5,6 +5,7 @@
 #include <memory>
 #include <optional>
 #include <string>
+#include <utility>
 #include <vector>
 
 #include "basic/core/typedispatch/pixeltypes.h"
@@ -15,21 +16,38 @@ namespace {
 
 using orin::datasources::AuxiliaryData;
 using orin::datasources::IRasterReader;
+using orin::datasources::kAlphaKey;
+using orin::datasources::kDeclaredNoDataKey;
+using orin::datasources::kFillOnlyKey;
+using orin::datasources::kNoDataKey;
 using orin::datasources::NoDataValue;
+using orin::gobs::IMaskDecision;
 using orin::gobs::Mask;
 using orin::gobs::Raster;
 
-/// A pixel is no data when every channel equals its value.
+/// What one channel declares.
+struct ChannelText {
+  std::string text;      ///< empty without a value
+  bool isAlpha = false;  ///< may hold anything in a pixel without data
+};
+
+/// A channel's value in its type.
 template <class T>
-class EqualsNoData final : public orin::gobs::IMaskDecision {
+struct ChannelValue {
+  NoDataValue<T> value;
+  bool counts = true;  ///< false for alpha
+};
+
+/// A pixel is no data when every channel that counts equals its value.
+template <class T>
+class EqualsNoData final : public IMaskDecision {
  public:
-  /// \param values  one for each channel; nothing where no pixel can equal the declared one
-  EqualsNoData(const std::vector<std::optional<NoDataValue<T>>>& values,
-               uint32_t componentsPerSample)
+  EqualsNoData(const std::vector<ChannelText>& channels, uint32_t componentsPerSample)
       : components_(componentsPerSample) {
-    for (const std::optional<NoDataValue<T>>& channel : values) {
-      possible_ = possible_ && channel;
-      values_.push_back(channel.value_or(NoDataValue<T>()));
+    for (const ChannelText& channel : channels) {
+      const auto value = orin::datasources::NoDataValueOf<T>(channel.text);
+      possible_ = possible_ && (value || channel.isAlpha);
+      channels_.push_back({value.value_or(NoDataValue<T>()), !channel.isAlpha});
     }
   }
 
@@ -37,15 +55,16 @@ class EqualsNoData final : public orin::gobs::IMaskDecision {
     if (!possible_) return;  // a new mask is all valid
     const T* sample = reinterpret_cast<const T*>(block.data);
     const uint64_t pixels = uint64_t{block.stride} * block.bufferLines;
-    const uint64_t size = values_.size() * components_;
+    const uint64_t size = channels_.size() * components_;
     for (uint64_t pixel = 0; pixel < pixels; ++pixel, sample += size)
       if (IsNoData(sample)) mask.begin[pixel / 8] &= static_cast<uint8_t>(~(0x80u >> (pixel % 8)));
   }
 
  private:
   bool IsNoData(const T* sample) const {
-    for (const NoDataValue<T>& value : values_) {
-      if (!(components_ == 1 ? value.Matches(*sample) : MatchesPair(value, sample))) return false;
+    for (const auto& [value, counts] : channels_) {
+      if (counts && !(components_ == 1 ? value.Matches(*sample) : MatchesPair(value, sample)))
+        return false;
       sample += components_;
     }
     return true;
@@ -59,8 +78,23 @@ class EqualsNoData final : public orin::gobs::IMaskDecision {
   }
 
   uint32_t components_;
-  std::vector<NoDataValue<T>> values_;
-  bool possible_ = true;
+  std::vector<ChannelValue<T>> channels_;
+  bool possible_ = true;  ///< false: the type cannot hold one of the values
+};
+
+/// No data where `declared` (null: nowhere) says so, or the block's own validity.
+class WithBlockValidity final : public IMaskDecision {
+ public:
+  explicit WithBlockValidity(std::unique_ptr<IMaskDecision> declared)
+      : declared_(std::move(declared)) {}
+
+  void Decide(const Raster& block, Mask& mask) const override {
+    if (declared_) declared_->Decide(block, mask);
+    if (block.validity) mask.Intersect(*block.validity);
+  }
+
+ private:
+  std::unique_ptr<IMaskDecision> declared_;
 };
 
 /// The declared text where another one is answered for it.
@@ -68,37 +102,44 @@ std::string Declared(const std::string& answered, const std::string& declared) {
   return declared.empty() ? answered : declared;
 }
 
-/// The reader's no-data texts, one a channel; nothing when no channel has one.
-std::optional<std::vector<std::string>> DeclaredTexts(const IRasterReader& reader) {
-  using orin::datasources::kDeclaredNoDataKey;
-  using orin::datasources::kNoDataKey;
+/// What the reader's channels declare; nothing when none of those that count declares a number.
+std::optional<std::vector<ChannelText>> DeclaredTexts(const IRasterReader& reader) {
   const AuxiliaryData metadata = reader.GetAuxiliaryData();
-  const std::string file = Declared(metadata.GetFileMetadataValue(kNoDataKey),
-                                    metadata.GetFileMetadataValue(kDeclaredNoDataKey));
-  std::vector<std::string> texts;
+  const bool isFillOnly = !metadata.GetFileMetadataValue(kFillOnlyKey).empty();
+  const std::string file = isFillOnly ? ""
+                                      : Declared(metadata.GetFileMetadataValue(kNoDataKey),
+                                                 metadata.GetFileMetadataValue(kDeclaredNoDataKey));
+  std::vector<ChannelText> texts;
   bool any = false;
   for (unsigned channel = 1; channel <= reader.GetChannelCount(); ++channel) {
     const std::string own = Declared(metadata.GetChanMetadataValue(kNoDataKey, channel),
                                      metadata.GetChanMetadataValue(kDeclaredNoDataKey, channel));
-    texts.push_back(own.empty() ? file : own);
-    any = any || orin::datasources::ParseNoData(texts.back());
+    const bool isAlpha = !metadata.GetChanMetadataValue(kAlphaKey, channel).empty();
+    texts.push_back({own.empty() ? file : own, isAlpha});
+    any = any || (!isAlpha && orin::datasources::ParseNoData(texts.back().text));
   }
   if (!any) return std::nullopt;
   return texts;
 }
 
+/// The decision of the values that the reader's file declares, or null.
+std::unique_ptr<IMaskDecision> DeclaredDecision(const IRasterReader& reader) {
+  const auto texts = DeclaredTexts(reader);
+  if (!texts) return nullptr;
+  const orin::gobs::DataType type = reader.GetDataType();
+  std::unique_ptr<IMaskDecision> decision;
+  orin::typedispatch::WithPixelType(type, [&]<class T>(std::type_identity<T>) {
+    decision = std::make_unique<EqualsNoData<T>>(*texts, ComponentsPerSample(type));
+  });
+  return decision;
+}
+
 }  // namespace
 
-orin::gobs::IMaskDecision* GetFileMetadataSrcMask(orin::datasources::IRasterReader* reader) {
-  const auto texts = DeclaredTexts(*reader);
-  if (!texts) return nullptr;
-  const orin::gobs::DataType type = reader->GetDataType();
-  std::unique_ptr<orin::gobs::IMaskDecision> decision;
-  orin::typedispatch::WithPixelType(type, [&]<class T>(std::type_identity<T>) {
-    std::vector<std::optional<NoDataValue<T>>> values;
-    for (const std::string& text : *texts)
-      values.push_back(orin::datasources::NoDataValueOf<T>(text));
-    decision = std::make_unique<EqualsNoData<T>>(values, ComponentsPerSample(type));
-  });
+IMaskDecision* GetFileMetadataSrcMask(IRasterReader* reader) {
+  std::unique_ptr<IMaskDecision> decision = DeclaredDecision(*reader);
+  const std::string validity =
+      reader->GetAuxiliaryData().GetFileMetadataValue(orin::datasources::kValidityKey);
+  if (!validity.empty()) decision = std::make_unique<WithBlockValidity>(std::move(decision));
   return decision.release();
 }

@@ -37,6 +37,11 @@ void Mask::SetValid(int64_t pixelX, int64_t pixelY, bool valid) {
   byte = valid ? static_cast<uint8_t>(byte | bit) : static_cast<uint8_t>(byte & ~bit);
 }
 
+void Mask::Intersect(const Mask& other) {
+  std::transform(begin, end, other.begin, begin,
+                 [](uint8_t a, uint8_t b) { return static_cast<uint8_t>(a & b); });
+}
+
 void Mask::RetrieveRaster(Raster* out) const {
   if (out->dataType == eDT_BIT) {
     const auto bytes = std::min<uint64_t>(static_cast<uint64_t>(end - begin), out->byteSize);

@@ -50,6 +50,8 @@ class Mask {
     return MaskBits{begin, LayoutOf(*this)}(pixelX, pixelY);
   }
   void SetValid(int64_t pixelX, int64_t pixelY, bool valid);
+  /// Leaves valid what is valid in `other`, too, which has the same geometry.
+  void Intersect(const Mask& other);
 
   uint32_t width;
   uint32_t height;

@@ -25,8 +25,10 @@ void LevelBuild::Forget(uint64_t tile) {
 }
 
 bool LevelBuild::HasOnlyCompletePlanes() const {
-  return std::all_of(written_.begin(), written_.end(),
-                     [this](uint64_t tiles) { return tiles == 0 || tiles == tilesPerPlane_; });
+  const bool isMaskComplete = !mask || mask->IsComplete(0);
+  return isMaskComplete && std::all_of(written_.begin(), written_.end(), [this](uint64_t tiles) {
+           return tiles == 0 || tiles == tilesPerPlane_;
+         });
 }
 
 bool LevelBuild::IsEmpty() const {

@@ -3,6 +3,7 @@
 #pragma once
 
 #include <cstdint>
+#include <memory>
 #include <vector>
 
 #include "host/drivers/tiff/levelcoding.h"
@@ -28,7 +29,7 @@ class LevelBuild {
   /// The tile is being written anew, and not complete until it is recorded again.
   void Forget(uint64_t tile);
   bool IsComplete(uint32_t plane) const { return written_[plane] == tilesPerPlane_; }
-  /// True when there is nothing, or nothing but complete planes.
+  /// True when there is nothing, or nothing but complete planes, the mask included.
   bool HasOnlyCompletePlanes() const;
   bool IsEmpty() const;
   /// The tiles of one plane. \pre IsComplete(plane)
@@ -37,7 +38,8 @@ class LevelBuild {
   /// The plane's tiles are in the directory now.
   void Release(uint32_t plane);
 
-  int writers = 0;        ///< writers at work
+  std::unique_ptr<LevelBuild> mask;  ///< tiles of the level's mask; null when it gets none
+  int writers = 0;                   ///< writers at work
   bool isClosed = false;  ///< all is stored or given up: a writer that goes on starts another build
 
  private:

@@ -179,7 +179,7 @@ std::vector<NewEntry> EntriesOf(const LevelCoding& coding) {
   const auto add = [&](uint16_t tag, uint16_t type, std::vector<uint64_t> numbers) {
     entries.push_back(NumbersEntry(tag, type, numbers));
   };
-  add(TIFFTAG_SUBFILETYPE, TIFF_LONG, {FILETYPE_REDUCEDIMAGE});
+  add(TIFFTAG_SUBFILETYPE, TIFF_LONG, {coding.subfileType});
   add(TIFFTAG_IMAGEWIDTH, TIFF_LONG, {format.width});
   add(TIFFTAG_IMAGELENGTH, TIFF_LONG, {format.height});
   add(TIFFTAG_BITSPERSAMPLE, TIFF_SHORT, forEachSample(format.bitsPerSample));

@@ -16,6 +16,7 @@ struct LevelCoding {
   PixelFormat format;  ///< size, grid and samples; always tiled
   ByteOrder byteOrder;
   uint16_t predictor = 1;
+  uint16_t subfileType = FILETYPE_REDUCEDIMAGE;
   uint16_t subsamplingX = 2;  ///< of YCbCr
   uint16_t subsamplingY = 2;
   int jpegQuality = 90;

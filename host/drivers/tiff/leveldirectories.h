@@ -24,8 +24,9 @@ struct ImageShape {
 
 struct StoredLevel {
   unsigned level = 0;
-  size_t index = 0;     ///< in the chain
-  bool isOurs = false;  ///< it carries a validity for every channel
+  size_t index = 0;            ///< in the chain
+  std::optional<size_t> mask;  ///< index of its mask in the chain
+  bool isOurs = false;         ///< it carries a validity for every channel
   PixelFormat format;
   LevelMetadata metadata;
   uint64_t validityPosition = 0;  ///< in the file

@@ -59,6 +59,7 @@ LevelMetadata TiffLevelStore::MetadataFor(unsigned level, const Pending& pending
 /// channel that stays valid has its tiles in the part that changes: that takes several writes.
 bool TiffLevelStore::CanPatch(const StoredLevel& stored, const LevelMetadata& metadata,
                               const LevelBuild& build) const {
+  if (build.mask || stored.mask) return false;
   const LevelMetadata& old = stored.metadata;
   if (old.method != metadata.method || old.image != metadata.image ||
       old.sourceLevel != metadata.sourceLevel || old.program != metadata.program)
@@ -113,10 +114,37 @@ void TiffLevelStore::AddDirectory(unsigned level, const LevelMetadata& metadata,
   }
   entries.push_back(TextEntry(TIFFTAG_GDAL_METADATA, ComposeLevelMetadata(metadata)));
   const PixelFormat& format = build.Coding().format;
-  const Place place =
+  Place place =
       before ? PlaceOf(structure, before->index)
              : PlaceOfNew(file_->File(), structure, settings_.image, format.width, format.height);
+  std::optional<uint64_t> strayMask;
+  if (before && before->mask) {
+    const TiffDirectory& mask = structure.directories[*before->mask];
+    if (*before->mask == before->index + 1) place.next = mask.next;
+    else strayMask = mask.offset;
+  }
+  if (build.mask) {
+    const bool isFirst = place.linkPosition == structure.HeadLinkPosition();
+    place.next = file_->ToAppend().AppendDirectory(
+        MaskEntriesOf(*build.mask, structure.isBig, isFirst), place.next);
+  }
   file_->Link(place, file_->ToAppend().AppendDirectory(std::move(entries), place.next));
+  TidyMasks(strayMask);
+}
+
+/// Takes the mask of a level that is no more out of the chain, and has the masks of a side-car say
+/// of themselves what their places ask for.
+void TiffLevelStore::TidyMasks(std::optional<uint64_t> strayMask) {
+  const auto& directories = file_->Structure().directories;
+  for (size_t i = 1; strayMask && i < directories.size(); ++i)
+    if (directories[i].offset == *strayMask) {
+      file_->Link({directories[i - 1].linkPosition, 0}, directories[i].next);
+      break;
+    }
+  if (settings_.image.isInFile) return;
+  const auto changes = MaskTypeChanges(file_->File(), file_->Structure());
+  for (const TypeChange& change : changes) file_->Overwrite(change.position, change.bytes);
+  if (!changes.empty()) file_->Sync();
 }
 
 /// Puts the tiles of `planes` into the level's directory; its validity is turned on by nobody here.
@@ -133,6 +161,7 @@ void TiffLevelStore::Store(unsigned level, Pending& pending, const std::vector<u
   else AddDirectory(level, metadata, *build, planes);
   Reload();
   for (const uint32_t plane : planes) build->Release(plane);
+  build->mask.reset();
   if (!build->IsEmpty()) return;
   build->isClosed = true;
   pending_.erase(level);

@@ -7,6 +7,7 @@
 #include <numeric>
 #include <utility>
 
+#include "basic/gobs/mask/mask.h"
 #include "host/drivers/tiff/sparsesample.h"
 #include "host/drivers/tiff/tifflevelstore.h"
 
@@ -35,13 +36,19 @@ datasources::AuxiliaryData LevelWriter::GetAuxiliaryData() const {
 void LevelWriter::Read(Raster& block) {
   RequireFittingBlock(block, *this, file_);
   if (!reader_) reader_ = store_.OpenPixels(level_, channels_);
+  if (!validity_)
+    validity_ = std::make_unique<LevelValidity>(store_.OpenValidity(level_, channels_));
   reader_->Read(block);
+  if (validity_->alphaPosition) datasources::AddOpacity(*validity_->alphaPosition, block);
+  if (validity_->reader) datasources::AddValidity(*validity_->reader, block);
 }
 
 void LevelWriter::Begin() {
   if (build_) store_.EndWriting(level_, *build_);
   build_.reset();
   tiles_.clear();
+  mask_.reset();
+  hasAskedForMask_ = false;
   build_ = store_.BeginWriting(level_, channels_);
   const LevelCoding& coding = build_->Coding();
   encoder_ = std::make_unique<TileEncoder>(coding, file_);
@@ -54,6 +61,7 @@ void LevelWriter::Begin() {
 void LevelWriter::Write(const Raster& block) {
   RequireFittingBlock(block, *this, file_);
   if (!build_ || build_->isClosed) Begin();
+  if (block.validity) WriteMask(block);
   const uint32_t tileWidth = format_.tileWidth;
   const uint32_t tileHeight = format_.tileHeight;
   for (uint32_t y = block.y; y < block.y + block.height;) {
@@ -70,6 +78,30 @@ void LevelWriter::Write(const Raster& block) {
     }
     y += height;
   }
+}
+
+void LevelWriter::WriteMask(const Raster& block) {
+  if (!hasAskedForMask_) mask_ = store_.BeginMask(level_, channels_, *build_);
+  hasAskedForMask_ = true;
+  if (mask_) mask_->Write(block);
+}
+
+/// Opacity of pixels without data is 0, whatever value their channels were filled with.
+void LevelWriter::ClearAlpha(const Raster& block, const Piece& piece,
+                             const std::vector<unsigned>& positions, OpenTile& to) const {
+  const auto isAlpha = [this](unsigned position) {
+    return channels_[position] == store_.AlphaChannel();
+  };
+  const auto alpha = std::find_if(positions.begin(), positions.end(), isAlpha);
+  if (!block.validity || alpha == positions.end()) return;
+  const uint64_t sample = format_.SampleBytes();
+  const uint64_t inTile = format_.planar ? 0 : channels_[*alpha] - 1;
+  for (uint32_t y = piece.y; y < piece.y + piece.height; ++y)
+    for (uint32_t x = piece.x; x < piece.x + piece.width; ++x) {
+      if (block.validity->IsValid(int64_t{x} - block.x, int64_t{y} - block.y)) continue;
+      const uint64_t pixel = uint64_t{y - piece.tileY} * format_.tileWidth + (x - piece.tileX);
+      std::memset(&to.samples[(pixel * format_.TileSamples() + inTile) * sample], 0, sample);
+    }
 }
 
 void LevelWriter::WritePiece(const Raster& block, const Piece& piece) {
@@ -92,6 +124,7 @@ void LevelWriter::WriteInto(const Raster& block, const Piece& piece, uint32_t pl
     open = tiles_.emplace(tile, MakeTile(tile, piece)).first;
   }
   CopyPixels(block, piece, positions, open->second);
+  ClearAlpha(block, piece, positions, open->second);
   Cover(piece, format_.tileWidth, open->second);
   if (open->second.missing > 0) return;
   Finish(tile, plane, piece, open->second.samples);

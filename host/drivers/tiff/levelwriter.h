@@ -9,6 +9,7 @@
 
 #include "host/datasources/rasterwriter.h"
 #include "host/drivers/tiff/levelbuild.h"
+#include "host/drivers/tiff/levelmask.h"
 #include "host/drivers/tiff/pixelreader.h"
 #include "host/drivers/tiff/samplecopy.h"
 #include "host/drivers/tiff/tileencoder.h"
@@ -76,11 +77,19 @@ class LevelWriter final : public datasources::ReaderState<datasources::IRasterWr
   std::vector<unsigned> channels_;
   PixelFormat format_;
 
-  std::unique_ptr<PixelReader> reader_;  // opened by the first Read
+  void WriteMask(const gobs::Raster& block);
+  void ClearAlpha(const gobs::Raster& block, const Piece& piece,
+                  const std::vector<unsigned>& positions, OpenTile& tile) const;
+
+  // opened by the first Read
+  std::unique_ptr<PixelReader> reader_;
+  std::unique_ptr<LevelValidity> validity_;
 
   // from the first Write on
   std::shared_ptr<LevelBuild> build_;
   std::unique_ptr<TileEncoder> encoder_;
+  std::unique_ptr<LevelMaskWriter> mask_;  ///< null when the level gets none
+  bool hasAskedForMask_ = false;
   std::unique_ptr<PixelReader>
       storedTiles_;  ///< where other channels come from; null when not needed
   CopySamples copy_ = nullptr;

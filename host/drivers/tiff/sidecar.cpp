@@ -4,7 +4,9 @@
 #include <filesystem>
 #include <utility>
 
+#include "host/drivers/tiff/levelmask.h"
 #include "host/drivers/tiff/tifflevelstore.h"
+#include "host/drivers/tiff/tiffmask.h"
 #include "host/drivers/tiff/tiffsource.h"
 #include "host/services/exception.h"
 #include "host/services/text.h"
@@ -56,7 +58,29 @@ std::unique_ptr<LevelFile> OpenExisting(const std::string& path) {
   }
 }
 
+/// The validity of an image whose driver leaves the mask file beside it to others.
+ImageValidity ValidityBeside(const std::string& imageFile, IRasterSource& image) {
+  ImageValidity validity = ValidityOf(image);
+  const auto openMask = [imageFile, width = image.Width(), height = image.Height()] {
+    return OpenMaskBeside(imageFile, width, height);
+  };
+  if (validity.hasMask || !openMask()) return validity;
+  validity.hasMask = true;
+  validity.open = [openMask, openRest = validity.open] {
+    datasources::ValidityReaders readers;
+    readers.push_back(openMask());
+    if (openRest) readers.push_back(openRest());
+    return datasources::AllOf(std::move(readers));
+  };
+  return validity;
+}
+
 }  // namespace
+
+std::unique_ptr<datasources::IValidityReader> TiffSideCar::OpenMaskBeside(
+    const std::string& imageFile, unsigned width, unsigned height) {
+  return drivers::OpenMaskBeside(imageFile, width, height);
+}
 
 std::unique_ptr<datasources::ILevelStore> TiffSideCar::Open(const std::string& imageFile,
                                                             IRasterSource& image) {
@@ -69,6 +93,8 @@ std::unique_ptr<datasources::ILevelStore> TiffSideCar::Open(const std::string& i
   settings.usualSource = 1;
   settings.watch = image.Watch();
   if (!settings.watch) settings.watch = std::make_shared<datasources::ImageWatch>(imageFile);
+  settings.validity =
+      image.DeliversValidity() ? ValidityOf(image) : ValidityBeside(imageFile, image);
   std::error_code ignored;
   auto file = std::filesystem::exists(path, ignored)
                   ? OpenExisting(path)

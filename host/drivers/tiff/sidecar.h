@@ -13,6 +13,9 @@ class TiffSideCar final : public datasources::ISideCarFormat {
  public:
   std::unique_ptr<datasources::ILevelStore> Open(const std::string& imageFile,
                                                  datasources::IRasterSource& image) override;
+  std::unique_ptr<datasources::IValidityReader> OpenMaskBeside(const std::string& imageFile,
+                                                               unsigned width,
+                                                               unsigned height) override;
 };
 
 }  // namespace orin::drivers

@@ -14,12 +14,13 @@ using datasources::LevelDescription;
 
 std::unique_ptr<datasources::ILevelStore> OpenInternalLevels(
     const std::string& file, const PixelFormat& image, bool update,
-    std::shared_ptr<datasources::ImageWatch> watch) {
+    std::shared_ptr<datasources::ImageWatch> watch, ImageValidity validity) {
   auto levels = std::make_unique<LevelFile>(file, update);
   TiffLevelStore::Settings settings;
   settings.image = {image.width, image.height, image.samplesPerPixel, image.type, true};
   settings.coding =
       CodingOf(levels->File(), levels->Structure(), levels->Structure().directories[0], image);
+  settings.validity = std::move(validity);
   settings.usualSource = 1;
   settings.watch = std::move(watch);
   return std::make_unique<TiffLevelStore>(std::move(levels), std::move(settings));
@@ -34,7 +35,9 @@ TiffLevelStore::TiffLevelStore(std::unique_ptr<LevelFile> file, Settings setting
 
 void TiffLevelStore::Reload() {
   levels_.clear();
-  if (file_->Exists()) levels_ = FindLevels(file_->File(), file_->Structure(), settings_.image);
+  if (!file_->Exists()) return;
+  levels_ = FindLevels(file_->File(), file_->Structure(), settings_.image);
+  FindLevelMasks(file_->File(), file_->Structure(), settings_.image, levels_);
 }
 
 /// Opens the file for changes and looks again where everything stands: another program may have
@@ -80,9 +83,11 @@ LevelDescription TiffLevelStore::Describe(const StoredLevel& stored,
   entry.method = stored.metadata.method;
   entry.status = status;
   const std::string& validity = stored.metadata.validity;
+  const bool lacksMask = settings_.validity.hasMask && !stored.mask;
   for (uint32_t i = 0; i < settings_.image.samples; ++i) {
     entry.presentChannels.push_back(!stored.isOurs || validity[i] != kAbsent);
-    entry.validChannels.push_back(!stored.isOurs || (validity[i] == kValid && !isStale));
+    entry.validChannels.push_back(!stored.isOurs ||
+                                  (validity[i] == kValid && !isStale && !lacksMask));
   }
   if (!stored.isOurs) return entry;
   entry.sourceLevel = stored.metadata.sourceLevel;
@@ -280,6 +285,8 @@ void TiffLevelStore::SetValid(unsigned level, const std::vector<unsigned>& chann
     for (const uint32_t plane : planes)
       if (!pending->second.build->IsComplete(plane))
         Fail(_("%s: level %u is not complete and cannot be marked valid."), level, "SetValid");
+    if (const LevelBuild* mask = pending->second.build->mask.get(); mask && !mask->IsComplete(0))
+      Fail(_("%s: level %u is not complete and cannot be marked valid."), level, "SetValid");
     Store(level, pending->second, planes, RecordOrGiveUp(level, pending->second));
   } else if (file_->Exists()) {
     CatchUp();

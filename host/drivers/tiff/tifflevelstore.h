@@ -5,6 +5,7 @@
 #include <map>
 #include <memory>
 #include <mutex>
+#include <optional>
 #include <string>
 #include <vector>
 
@@ -14,6 +15,7 @@
 #include "host/drivers/tiff/leveldirectories.h"
 #include "host/drivers/tiff/levelfile.h"
 #include "host/drivers/tiff/levelfreshness.h"
+#include "host/drivers/tiff/levelmask.h"
 #include "host/drivers/tiff/pixelreader.h"
 
 namespace orin::drivers {
@@ -25,7 +27,7 @@ namespace orin::drivers {
 /// \throws orin::Exception  the file's structure cannot be read
 std::unique_ptr<datasources::ILevelStore> OpenInternalLevels(
     const std::string& file, const PixelFormat& image, bool update,
-    std::shared_ptr<datasources::ImageWatch> watch);
+    std::shared_ptr<datasources::ImageWatch> watch, ImageValidity validity = {});
 
 /// A level appears in the file when it is complete: tiles first, then its directory, then the link
 /// to it, then its validity, each durable before the next. Until then it is pending here; a pending
@@ -38,6 +40,7 @@ class TiffLevelStore final : public datasources::ILevelStore {
     ImageShape image;
     LevelCoding coding;  ///< of the image, from which new levels take theirs
     datasources::LevelPlace place = datasources::LevelPlace::kInternal;
+    ImageValidity validity;
     unsigned usualSource = 0;  ///< recorded as a level's source when no level was read for it
     std::shared_ptr<datasources::ImageWatch> watch;  ///< of the image
   };
@@ -64,6 +67,14 @@ class TiffLevelStore final : public datasources::ILevelStore {
   std::shared_ptr<LevelBuild> BeginWriting(unsigned level, const std::vector<unsigned>& channels);
   /// Adds a tile to the file. \returns where it is
   TilePlace AppendTile(const std::vector<uint8_t>& bytes);
+  /// A writer of the mask of a level that is being written; null when levels get none, or the build
+  /// has one already.
+  std::unique_ptr<LevelMaskWriter> BeginMask(unsigned level, const std::vector<unsigned>& channels,
+                                             LevelBuild& build);
+  /// What says which pixels of a level in the file hold data.
+  LevelValidity OpenValidity(unsigned level, const std::vector<unsigned>& channels);
+  /// 1-based, 0 when no channel of the image holds opacity.
+  unsigned AlphaChannel() const { return settings_.validity.alphaChannel; }
   /// A writer leaves: when it is the last one, complete planes are stored, not valid; else all that
   /// was written is given up.
   void EndWriting(unsigned level, LevelBuild& build) noexcept;
@@ -109,6 +120,7 @@ class TiffLevelStore final : public datasources::ILevelStore {
              const std::vector<uint32_t>& planes);
   void AddDirectory(unsigned level, const LevelMetadata& metadata, const LevelBuild& build,
                     const std::vector<uint32_t>& planes);
+  void TidyMasks(std::optional<uint64_t> strayMask);
   void GiveUp(unsigned level, LevelBuild& build);
   [[noreturn]] void Fail(const char* format, unsigned level, const char* operation) const;
 
@@ -119,6 +131,7 @@ class TiffLevelStore final : public datasources::ILevelStore {
   mutable std::optional<datasources::ImageStamp> kept_;  ///< of the last answer that was kept
   std::vector<StoredLevel> levels_;
   std::map<unsigned, Pending> pending_;
+  std::map<unsigned, std::vector<unsigned>> maskedChannels_;  ///< whose passes a mask has joined
   unsigned lastRead_ = 0;  ///< level whose pixels were read since the last Create; 0 none
   std::optional<datasources::ImageRecord> source_;  ///< of that level; blank where it is unknown
 };

@@ -10,9 +10,11 @@
 #include <unistd.h>
 
 #include "host/datasources/nodatavalue.h"
+#include "host/datasources/validityreader.h"
 #include "host/drivers/tiff/pixelreader.h"
 #include "host/drivers/tiff/tifffingerprint.h"
 #include "host/drivers/tiff/tifflevelstore.h"
+#include "host/drivers/tiff/tiffmask.h"
 #include "host/services/exception.h"
 #include "host/services/text.h"
 
@@ -64,6 +66,17 @@ void RequireWritable(const std::string& file) {
   close(descriptor);
 }
 
+/// The first extra sample that is declared as opacity, 1-based; 0 without one.
+unsigned AlphaChannelOf(const TiffHandle& tiff, const PixelFormat& format) {
+  uint16_t count = 0;
+  uint16_t* meanings = nullptr;
+  if (TIFFGetField(tiff.Get(), TIFFTAG_EXTRASAMPLES, &count, &meanings) != 1) return 0;
+  for (uint16_t i = 0; i < count && count <= format.samplesPerPixel; ++i)
+    if (meanings[i] == EXTRASAMPLE_ASSOCALPHA || meanings[i] == EXTRASAMPLE_UNASSALPHA)
+      return format.samplesPerPixel - count + i + 1;
+  return 0;
+}
+
 /// Items of the file (no sample) or of one of its channels.
 AuxiliaryData::Items ItemsOf(const std::vector<MetadataItem>& metadata,
                              std::optional<unsigned> sample) {
@@ -87,7 +100,23 @@ TiffSource::TiffSource(std::string file, datasources::AccessMode access) : file_
     metadata_.push_back({kNoDataKey, std::nullopt, "", "", format_.noData});
   watch_ = std::make_shared<datasources::ImageWatch>(
       file_, [path = file_](const std::stop_token& stop) { return FingerprintOfTiff(path, stop); });
-  levels_ = OpenInternalLevels(file_, format_, access == datasources::kUpdate, watch_);
+  alphaChannel_ = AlphaChannelOf(tiff, format_);
+  FindMasks();
+  const ImageValidity validity = ValidityOf(*this);
+  levels_ = OpenInternalLevels(file_, format_, access == datasources::kUpdate, watch_, validity);
+}
+
+void TiffSource::FindMasks() {
+  const PositionedFile file(file_, PositionedFile::Mode::kRead);
+  maskOffset_ = FindImageMask(file, ParseStructure(file));
+  hasMaskBeside_ = OpenMaskBeside(file_, format_.width, format_.height) != nullptr;
+}
+
+std::unique_ptr<datasources::IValidityReader> TiffSource::OpenMask() {
+  datasources::ValidityReaders masks;
+  if (maskOffset_) masks.push_back(OpenTiffMask(file_, *maskOffset_));
+  if (hasMaskBeside_) masks.push_back(OpenMaskBeside(file_, format_.width, format_.height));
+  return datasources::AllOf(std::move(masks));
 }
 
 TiffSource::~TiffSource() = default;
@@ -100,7 +129,11 @@ AuxiliaryData TiffSource::MetadataOf(const std::vector<unsigned>& channels) cons
 
 std::unique_ptr<datasources::IRasterReader> TiffSource::OpenReader(
     const std::vector<unsigned>& channels) {
-  return std::make_unique<TiffReader>(file_, channels, MetadataOf(channels));
+  const auto open = [this](const std::vector<unsigned>& numbers) {
+    return std::make_unique<TiffReader>(file_, numbers, MetadataOf(numbers));
+  };
+  return datasources::WithValidity(
+      open(channels), {OpenMask(), alphaChannel_, [&] { return open({alphaChannel_}); }});
 }
 
 }  // namespace orin::drivers

@@ -3,6 +3,7 @@
 #pragma once
 
 #include <memory>
+#include <optional>
 #include <string>
 #include <vector>
 
@@ -32,14 +33,23 @@ class TiffSource final : public datasources::IRasterSource {
   datasources::AuxiliaryData MetadataOf(const std::vector<unsigned>& channels) const override;
   std::unique_ptr<datasources::IRasterReader> OpenReader(
       const std::vector<unsigned>& channels) override;
+  unsigned AlphaChannel() const override { return alphaChannel_; }
+  bool HasMask() const override { return maskOffset_ || hasMaskBeside_; }
+  std::unique_ptr<datasources::IValidityReader> OpenMask() override;
+  bool DeliversValidity() const override { return true; }
   datasources::ILevelStore* Levels() override { return levels_.get(); }
   std::shared_ptr<datasources::ImageWatch> Watch() override { return watch_; }
 
  private:
+  void FindMasks();
+
   std::string file_;
   PixelFormat format_;
   std::vector<MetadataItem> metadata_;
   std::shared_ptr<datasources::ImageWatch> watch_;
+  unsigned alphaChannel_ = 0;
+  std::optional<uint64_t> maskOffset_;  ///< of the mask inside the file
+  bool hasMaskBeside_ = false;
   std::unique_ptr<datasources::ILevelStore> levels_;
 };
 

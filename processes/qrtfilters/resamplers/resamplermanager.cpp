@@ -1,6 +1,8 @@
 // SPDX-License-Identifier: MIT
 #include "processes/qrtfilters/resamplers/resamplermanager.h"
 
+#include <algorithm>
+#include <cstring>
 #include <memory>
 
 #include "host/services/exception.h"
@@ -28,6 +30,26 @@ void ResamplerManager::ProcessBlock(gobs::Raster* in, gobs::Raster* out) {
   if (!resampler || !(in->dataType == dataType)) RenewKernel(in->dataType);
   const std::unique_ptr<gobs::Mask> mask(maskBuilder ? maskBuilder->BuildMask(*in) : nullptr);
   resampler->Resample(in, mask.get(), out);
+  if (mask && in->validity) FindFilled(*in, *mask, *out);
+}
+
+/// Runs the method once more over pixels of 255, so that a fill of 0 tells. Deliberate: two
+/// channels stand for more, but never one, of which methods make an exception; nor is a complex
+/// sample replaced by a real one.
+void ResamplerManager::FindFilled(const gobs::Raster& in, gobs::Mask& mask,
+                                  gobs::Raster& out) const {
+  const gobs::DataType bytes = gobs::DataTypeOf<uint8_t>(in.dataType.isComplex);
+  const uint32_t channels = std::min(in.channelCount, 2u);
+  gobs::Raster constant({in.width, in.height, channels, bytes}, in.Window());
+  gobs::Raster filled({out.width, out.height, channels, bytes}, out.Window());
+  std::memset(constant.data, 255, constant.byteSize);
+  const std::unique_ptr<IRasterResampler> kernel(factory->CreateResampler(bytes));
+  Configure(*kernel, 0.0);
+  kernel->Resample(&constant, &mask, &filled);
+  out.validity = std::make_unique<gobs::Mask>(out.width, out.height, out.Window());
+  for (uint32_t y = 0; y < out.height; ++y)
+    for (uint32_t x = 0; x < out.width; ++x)
+      if (*PixelAddress(filled, x, y) == 0) out.validity->SetValid(x, y, false);
 }
 
 void ResamplerManager::RenewKernel(const gobs::DataType& type) {
@@ -39,9 +61,13 @@ void ResamplerManager::RenewKernel(const gobs::DataType& type) {
         _("There is no resampler for the processing target that ORIN_TARGET names. Unset "
           "it, or set it to CPU."),
         kSource, kProcessBlock, 0);
-  resampler->SetRatio(xRatio, yRatio);
-  resampler->SetNoDataValue(noDataValue);
-  resampler->SetComplex(complex);
+  Configure(*resampler, noDataValue);
+}
+
+void ResamplerManager::Configure(IRasterResampler& kernel, double fill) const {
+  kernel.SetRatio(xRatio, yRatio);
+  kernel.SetNoDataValue(fill);
+  kernel.SetComplex(complex);
 }
 
 }  // namespace orin::resamplers

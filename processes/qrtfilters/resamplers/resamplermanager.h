@@ -5,6 +5,7 @@
 #include "basic/gobs/datatype.h"
 #include "basic/gobs/mask/maskdecision.h"
 #include "basic/gobs/raster.h"
+#include "processes/qrtfilters/resamplers/rasterresampler.h"
 #include "processes/qrtfilters/resamplers/resamplerfactory.h"
 
 namespace orin::resamplers {
@@ -19,7 +20,8 @@ class ResamplerManager {
   virtual ~ResamplerManager();
 
   /// Resamples `in`, which carries the margin that the kernel needs, into `out`; both stay the
-  /// caller's.
+  /// caller's. Where `in` carries a validity and there is a mask builder, `out` gets one, too: no
+  /// data exactly where the kernel wrote the no-data value for want of valid pixels.
   /// \throws orin::Exception  there is no factory, or it gives no kernel; what the factory,
   ///                          the kernel and the mask builder throw passes through
   void ProcessBlock(gobs::Raster* in, gobs::Raster* out);
@@ -35,6 +37,8 @@ class ResamplerManager {
 
  private:
   void RenewKernel(const gobs::DataType& type);
+  void Configure(IRasterResampler& kernel, double fill) const;
+  void FindFilled(const gobs::Raster& in, gobs::Mask& mask, gobs::Raster& out) const;
 };
 
 }  // namespace orin::resamplers

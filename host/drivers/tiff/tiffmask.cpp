@@ -1,0 +1,115 @@
+// SPDX-License-Identifier: MIT
+#include "host/drivers/tiff/tiffmask.h"
+
+#include <cstdlib>
+#include <filesystem>
+#include <utility>
+#include <vector>
+
+#include <tiff.h>
+
+#include "host/drivers/tiff/gdalmetadata.h"
+#include "host/drivers/tiff/pixelreader.h"
+#include "host/services/exception.h"
+#include "host/services/text.h"
+#include "host/services/warning.h"
+
+namespace orin::drivers {
+namespace {
+
+using datasources::IValidityReader;
+
+class TiffMaskReader final : public IValidityReader {
+ public:
+  TiffMaskReader(const std::string& path, uint64_t directoryOffset)
+      : pixels_(path, directoryOffset, {1}) {}
+
+  const PixelFormat& Format() const { return pixels_.Format(); }
+
+  uint32_t Width() const override { return Format().width; }
+  uint32_t Height() const override { return Format().height; }
+  void Read(uint32_t x, uint32_t y, uint32_t width, uint32_t height, uint8_t* bytes) override {
+    // the reader delivers bits as bytes
+    gobs::Raster block({width, height, 1, gobs::eDT_8U}, {0, 0, x, y}, bytes);
+    pixels_.Read(block);
+  }
+
+ private:
+  PixelReader pixels_;
+};
+
+bool IsMaskFormat(const PixelFormat& format) {
+  return format.samplesPerPixel == 1 && format.SampleBytes() == 1;
+}
+
+/// What keeps the file from being a mask of the image, empty when nothing does.
+std::string ReasonAgainst(const std::string& path, unsigned width, unsigned height) {
+  const TiffHandle tiff = TiffHandle::OpenAt(path, 0);
+  const PixelFormat format = FormatOf(tiff);
+  if (format.width != width || format.height != height)
+    return FormatString(_("it has %u x %u pixels"), format.width, format.height);
+  constexpr unsigned kPerDataset = 2;
+  std::string flags;
+  for (const MetadataItem& item : ParseMetadata(tiff.TextOf(TIFFTAG_GDAL_METADATA)))
+    if (item.name == "INTERNAL_MASK_FLAGS_1") flags = item.text;
+  if (flags.empty()) return _("it does not say how it applies (INTERNAL_MASK_FLAGS_1)");
+  if ((std::strtoul(flags.c_str(), nullptr, 10) & kPerDataset) == 0 || !IsMaskFormat(format))
+    return _("only one mask for all channels, of one byte or bit a pixel, is supported");
+  return "";
+}
+
+/// The name of the mask file, empty when there is none.
+std::string MaskFileOf(const std::string& imageFile) {
+  const std::string path = imageFile + ".msk";
+  std::error_code ignored;
+  return std::filesystem::is_regular_file(path, ignored) ? path : "";
+}
+
+std::string ReasonOrFailure(const std::string& path, unsigned width, unsigned height) {
+  try {
+    return ReasonAgainst(path, width, height);
+  } catch (const Exception& failure) {
+    return failure.GetMessage();
+  }
+}
+
+}  // namespace
+
+std::unique_ptr<IValidityReader> OpenTiffMask(const std::string& path, uint64_t directoryOffset) {
+  auto reader = std::make_unique<TiffMaskReader>(path, directoryOffset);
+  if (!IsMaskFormat(reader->Format()))
+    throw Exception(FormatString(_("%s: cannot be read: its mask has not one byte or bit a pixel."),
+                                 path.c_str()),
+                    "host/drivers/tiff/tiffmask", "OpenTiffMask(const std::string&, uint64_t)", 0);
+  return reader;
+}
+
+std::optional<uint64_t> FindImageMask(const PositionedFile& file, const TiffStructure& structure) {
+  const auto& directories = structure.directories;
+  const auto number = [&](size_t index, uint16_t tag) {
+    return NumberOf(file, structure, directories[index], tag, 0);
+  };
+  for (size_t i = 1; i < directories.size(); ++i) {
+    const uint64_t subfile = number(i, TIFFTAG_SUBFILETYPE);
+    if ((subfile & (FILETYPE_MASK | FILETYPE_REDUCEDIMAGE)) == 0) break;  // another image
+    const bool isWhole = (subfile & FILETYPE_REDUCEDIMAGE) == 0;
+    if (isWhole && number(i, TIFFTAG_IMAGEWIDTH) == number(0, TIFFTAG_IMAGEWIDTH) &&
+        number(i, TIFFTAG_IMAGELENGTH) == number(0, TIFFTAG_IMAGELENGTH))
+      return directories[i].offset;
+  }
+  return std::nullopt;
+}
+
+std::unique_ptr<IValidityReader> OpenMaskBeside(const std::string& imageFile, unsigned width,
+                                                unsigned height) {
+  const std::string path = MaskFileOf(imageFile);
+  if (path.empty()) return nullptr;
+  const std::string reason = ReasonOrFailure(path, width, height);
+  if (reason.empty()) return OpenTiffMask(path, 0);
+  tarn::Warning::Warn(FormatString(_("%s: is not used as the mask of its image: %s."), path.c_str(),
+                                   reason.c_str()),
+                      "host/drivers/tiff/tiffmask", 0);
+  return nullptr;
+}
+
+}  // namespace orin::drivers
