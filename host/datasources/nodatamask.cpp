@@ -91,12 +91,14 @@ class EqualsNoData final : public orin::gobs::IMaskDecision {
   bool possible_ = true;
 };
 
-/// Without blanks around it and without a plus sign, which number parsing does not take.
+/// Without blanks around it and without a plus sign, which number parsing does not take; a second
+/// sign is left to be refused.
 std::string Trimmed(const std::string& text) {
   constexpr char kBlanks[] = " \t\r\n";
   const size_t first = text.find_first_not_of(kBlanks);
   if (first == std::string::npos) return "";
-  const size_t start = text[first] == '+' ? first + 1 : first;
+  const bool isPlus = text[first] == '+' && text.compare(first + 1, 1, "-") != 0;
+  const size_t start = isPlus ? first + 1 : first;
   return text.substr(start, text.find_last_not_of(kBlanks) + 1 - start);
 }
 

@@ -21,16 +21,6 @@ unsigned NumberIn(const std::string& text) {
   return error == std::errc() && end == text.data() + text.size() ? number : 0;
 }
 
-/// Where the text of the validity item starts, or npos.
-size_t FindValidity(const std::string& text, const std::string& validity) {
-  const size_t name = text.find(std::string("name=\"") + kValidity + '"');
-  if (name == text.npos) return name;
-  const size_t start = text.find('>', name);
-  const bool isThere =
-      start != text.npos && text.compare(start + 1, validity.size(), validity) == 0;
-  return isThere ? start + 1 : text.npos;
-}
-
 }  // namespace
 
 std::string ProgramName() { return "Orin Overviews " ORIN_VERSION; }
@@ -51,17 +41,26 @@ std::string ComposeLevelMetadata(const LevelMetadata& metadata) {
 
 LevelMetadata ParseLevelMetadata(const std::string& text) {
   LevelMetadata metadata;
-  for (const MetadataItem& item : ParseMetadata(text)) {
+  std::vector<size_t> textAt;
+  const std::vector<MetadataItem> items = ParseMetadata(text, &textAt);
+  for (size_t i = 0; i < items.size(); ++i) {
+    const MetadataItem& item = items[i];
     if (item.name == kMethod && !item.sample) metadata.method = item.text;
     if (item.name == kFactor) metadata.level = NumberIn(item.text);
     if (item.name == kSource) metadata.sourceLevel = NumberIn(item.text);
     if (item.name == kProgram) metadata.program = item.text;
-    if (item.name == kValidity) metadata.validity = item.text;
+    if (item.name == kValidity) {
+      metadata.validity = item.text;
+      metadata.validityAt = textAt[i];
+    }
   }
-  const size_t at = FindValidity(text, metadata.validity);
-  const bool isWhole = metadata.validity.find_first_not_of("-01") == std::string::npos;
-  if (at == text.npos || !isWhole) metadata.validity.clear();
-  else metadata.validityAt = at;
+  const std::string& validity = metadata.validity;
+  const bool isKnown = validity.find_first_not_of("-01") == validity.npos;
+  const bool isAsWritten = text.compare(metadata.validityAt, validity.size(), validity) == 0;
+  if (validity.empty() || !isKnown || !isAsWritten) {
+    metadata.validity.clear();
+    metadata.validityAt = 0;
+  }
   return metadata;
 }
 

@@ -42,7 +42,7 @@ T ValueOf(std::string_view text) {
 std::vector<uint8_t> SparseSample(const std::string& noData, const gobs::DataType& type) {
   std::vector<uint8_t> sample(BytesPerComponent(type) * ComponentsPerSample(type));
   std::string_view text = noData;
-  if (text.substr(0, 1) == "+") text.remove_prefix(1);
+  if (text.starts_with('+') && !text.starts_with("+-")) text.remove_prefix(1);
   if (type == gobs::eDT_BIT) sample[0] = ValueOf<uint8_t>(text) == 1;
   typedispatch::WithPixelType(type, [&]<class T>(std::type_identity<T>) {
     const T value = ValueOf<T>(text);
