@@ -1,8 +1,9 @@
 # SPDX-License-Identifier: MIT
 # The flags that every translation unit of the project is built with, in one target.
 
-set(ORIN_SANITIZE "" CACHE STRING "Sanitizers: empty, address (with undefined) or thread")
-set_property(CACHE ORIN_SANITIZE PROPERTY STRINGS "" address thread)
+set(ORIN_SANITIZE "" CACHE STRING
+  "Sanitizers: empty, address (with undefined), thread or fuzzer (address with its engine)")
+set_property(CACHE ORIN_SANITIZE PROPERTY STRINGS "" address thread fuzzer)
 option(ORIN_COVERAGE "Count which lines run" OFF)
 
 add_library(orin_flags INTERFACE)
@@ -17,8 +18,11 @@ if(ORIN_SANITIZE STREQUAL "address")
   set(orin_sanitizers -fsanitize=address,undefined,float-cast-overflow)
 elseif(ORIN_SANITIZE STREQUAL "thread")
   set(orin_sanitizers -fsanitize=thread)
+elseif(ORIN_SANITIZE STREQUAL "fuzzer")   # needs clang; targets link the engine's main themselves
+  set(orin_sanitizers -fsanitize=fuzzer-no-link,address,undefined,float-cast-overflow)
 elseif(ORIN_SANITIZE)
-  message(FATAL_ERROR "ORIN_SANITIZE is \"${ORIN_SANITIZE}\"; it may be empty, address or thread.")
+  message(FATAL_ERROR "ORIN_SANITIZE is \"${ORIN_SANITIZE}\"; it may be empty, address, thread or "
+    "fuzzer.")
 endif()
 if(ORIN_SANITIZE)
   target_compile_options(orin_flags INTERFACE

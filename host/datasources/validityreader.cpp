@@ -6,6 +6,8 @@
 #include <utility>
 #include <vector>
 
+#include "host/datasources/nodatavalue.h"
+
 namespace orin::datasources {
 namespace {
 

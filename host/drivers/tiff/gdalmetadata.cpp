@@ -113,8 +113,10 @@ class Scanner {
   bool Text(std::string& text) {
     text.clear();
     SkipBlanks();
+    bytesFromTextOn_ = 0;
     if (Skip("/>")) return true;
     if (!Skip(">")) return false;
+    bytesFromTextOn_ = rest_.size();
     for (;;) {
       const size_t end = rest_.find('<');
       if (end == rest_.npos) return false;
@@ -124,6 +126,9 @@ class Scanner {
       if (!SkipMarkup(text)) return false;
     }
   }
+
+  /// From the start of the last item's text to the end of all; 0 when the item had no place for it.
+  size_t BytesFromTextOn() const { return bytesFromTextOn_; }
 
  private:
   static constexpr std::string_view kItem = "<Item";
@@ -158,6 +163,7 @@ class Scanner {
   }
 
   std::string_view rest_;
+  size_t bytesFromTextOn_ = 0;
 };
 
 void SetAttribute(MetadataItem& item, const std::string& name, std::string value) {
@@ -173,14 +179,17 @@ void SetAttribute(MetadataItem& item, const std::string& name, std::string value
 
 }  // namespace
 
-std::vector<MetadataItem> ParseMetadata(const std::string& xml) {
+std::vector<MetadataItem> ParseMetadata(const std::string& xml, std::vector<size_t>* textAt) {
   std::vector<MetadataItem> items;
-  Scanner scanner(xml);
+  const std::string_view text(xml.data(), std::min(xml.find('\0'), xml.size()));
+  Scanner scanner(text);
   while (scanner.ToItem()) {
     MetadataItem item;
     std::string name, value;
     while (scanner.Attribute(name, value)) SetAttribute(item, name, std::move(value));
-    if (scanner.Text(item.text) && !item.name.empty()) items.push_back(std::move(item));
+    if (!scanner.Text(item.text) || item.name.empty()) continue;
+    items.push_back(std::move(item));
+    if (textAt) textAt->push_back(text.size() - scanner.BytesFromTextOn());
   }
   return items;
 }

@@ -18,8 +18,11 @@ struct MetadataItem {
   friend bool operator==(const MetadataItem&, const MetadataItem&) = default;
 };
 
-/// The items of a tag's text, in their order. Never fails: what is no item is passed over.
-std::vector<MetadataItem> ParseMetadata(const std::string& xml);
+/// The items of a tag's text, in their order, up to its first NUL. Never fails: what is no item is
+/// passed over.
+/// \param textAt  receives, if given, where in `xml` the text of each item starts, as it is written
+std::vector<MetadataItem> ParseMetadata(const std::string& xml,
+                                        std::vector<size_t>* textAt = nullptr);
 
 /// The tag's text for `items`, which ParseMetadata reads back.
 std::string ComposeMetadata(const std::vector<MetadataItem>& items);

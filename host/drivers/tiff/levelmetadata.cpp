@@ -22,13 +22,9 @@ unsigned NumberIn(const std::string& text) {
   return error == std::errc() && end == text.data() + text.size() ? number : 0;
 }
 
-/// Where the text of an item starts that is written as it is read, or npos.
-size_t FindPlain(const std::string& text, const char* item, const std::string& plain) {
-  const size_t name = text.find(std::string("name=\"") + item + '"');
-  if (name == text.npos) return name;
-  const size_t start = text.find('>', name);
-  const bool isThere = start != text.npos && text.compare(start + 1, plain.size(), plain) == 0;
-  return isThere ? start + 1 : text.npos;
+/// Whether an item's text stands in the tag as it is read: only then is it changed in place.
+bool IsAsWritten(const std::string& tag, size_t at, const std::string& text) {
+  return !text.empty() && tag.compare(at, text.size(), text) == 0;
 }
 
 }  // namespace
@@ -53,22 +49,31 @@ std::string ComposeLevelMetadata(const LevelMetadata& metadata) {
 LevelMetadata ParseLevelMetadata(const std::string& text) {
   LevelMetadata metadata;
   std::string image;
-  for (const MetadataItem& item : ParseMetadata(text)) {
+  std::vector<size_t> textAt;
+  const std::vector<MetadataItem> items = ParseMetadata(text, &textAt);
+  for (size_t i = 0; i < items.size(); ++i) {
+    const MetadataItem& item = items[i];
     if (item.name == kMethod && !item.sample) metadata.method = item.text;
     if (item.name == kFactor) metadata.level = NumberIn(item.text);
     if (item.name == kSource) metadata.sourceLevel = NumberIn(item.text);
     if (item.name == kProgram) metadata.program = item.text;
-    if (item.name == kValidity) metadata.validity = item.text;
-    if (item.name == kImage) image = item.text;
+    if (item.name == kValidity) {
+      metadata.validity = item.text;
+      metadata.validityAt = textAt[i];
+    }
+    if (item.name == kImage) {
+      image = item.text;
+      metadata.imageAt = textAt[i];
+    }
   }
-  const size_t at = FindPlain(text, kValidity, metadata.validity);
-  const bool isWhole = metadata.validity.find_first_not_of("-01") == std::string::npos;
-  if (at == text.npos || !isWhole) metadata.validity.clear();
-  else metadata.validityAt = at;
-  const size_t imageAt = FindPlain(text, kImage, image);
-  if (image.size() != datasources::kImageRecordLength || imageAt == text.npos) return metadata;
-  metadata.image = datasources::ParseImageRecord(image);
-  metadata.imageAt = imageAt;
+  const bool isKnown = metadata.validity.find_first_not_of("-01") == std::string::npos;
+  if (!isKnown || !IsAsWritten(text, metadata.validityAt, metadata.validity)) {
+    metadata.validity.clear();
+    metadata.validityAt = 0;
+  }
+  if (image.size() == datasources::kImageRecordLength && IsAsWritten(text, metadata.imageAt, image))
+    metadata.image = datasources::ParseImageRecord(image);
+  else metadata.imageAt = 0;
   return metadata;
 }
 

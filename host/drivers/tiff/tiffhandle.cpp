@@ -40,8 +40,12 @@ TIFF* Open(const std::string& path, std::string& errors) {
   return TIFFOpenExt(path.c_str(), kOpenMode, options.get());
 }
 
-bool IsText(TIFFDataType type) {
-  return type == TIFF_ASCII || type == TIFF_BYTE || type == TIFF_UNDEFINED;
+/// The tag's definition when its value is text. Of a tag that libtiff does not know, a file defines
+/// the type, which may be none: it is looked for by type, so that nobody reads such a value.
+const TIFFField* FindTextField(TIFF* tiff, uint32_t tag) {
+  for (const TIFFDataType type : {TIFF_ASCII, TIFF_BYTE, TIFF_UNDEFINED})
+    if (const TIFFField* field = TIFFFindField(tiff, tag, type)) return field;
+  return nullptr;
 }
 
 }  // namespace
@@ -74,8 +78,8 @@ void TiffHandle::MoveTo(uint64_t directoryOffset) {
 }
 
 std::string TiffHandle::TextOf(uint32_t tag) const {
-  const TIFFField* field = TIFFFindField(Get(), tag, TIFF_ANY);
-  if (!field || !IsText(TIFFFieldDataType(field))) return {};
+  const TIFFField* field = FindTextField(Get(), tag);
+  if (!field) return {};
   const char* text = nullptr;
   if (!TIFFFieldPassCount(field)) return TIFFGetField(Get(), tag, &text) == 1 && text ? text : "";
   uint32_t longCount = 0;

@@ -60,7 +60,8 @@ std::vector<bool> ValidityOf(const std::string& noData, const std::vector<T>& va
 }
 
 TEST(NoDataMask, ThereIsNoDecisionWithoutAFiniteNumber) {
-  for (const char* text : {"", "nan", "-nan", "inf", "-inf", "none", "12abc", "1,5", " "})
+  for (const char* text :
+       {"", "nan", "-nan", "inf", "-inf", "none", "12abc", "1,5", " ", "+-5", "+"})
     EXPECT_EQ(nullptr, DecisionOf(DataTypeOf<float>(), text, {""})) << text;
   EXPECT_EQ(nullptr, DecisionOf(orin::gobs::eDT_BIT, "0", {""}));
 }

@@ -79,6 +79,20 @@ TEST(Metadata, OfALevelIsReadBackAndItsValidityIsFound) {
   EXPECT_EQ("10-1", text.substr(read.validityAt, 4));
 }
 
+TEST(Metadata, HasItsValidityWhereTheItemStandsThatCounts) {
+  const char* texts[] = {
+      "<!-- <Item name=\"ORIN_VALID\">10</Item> --><Item name=\"ORIN_VALID\">10</Item>",
+      "<Item name=\"ORIN_VALID\">10</Item><Item name=\"ORIN_VALID\">10</Item>",
+      "<Item name=\"x\">name=\"ORIN_VALID\">10</Item><Item name='ORIN_VALID'>10</Item>",
+  };
+  for (std::string text : texts) {
+    const size_t last = text.rfind("10");
+    EXPECT_EQ(last, drivers::ParseLevelMetadata(text).validityAt) << text;
+    text.replace(last, 2, "01");
+    EXPECT_EQ("01", drivers::ParseLevelMetadata(text).validity) << text;
+  }
+}
+
 TEST(Metadata, WithoutAWholeValidityHasNone) {
   for (const char* text :
        {"", "<GDALMetadata>", "<GDALMetadata><Item name=\"ORIN_VALID\">12</Item></GDALMetadata>",
