@@ -44,6 +44,10 @@ class BothPlaces final : public ILevelStore {
   void SetValid(unsigned level, const std::vector<unsigned>& channels, bool valid) override {
     sideCar_->SetValid(level, channels, valid);
   }
+  LevelRoom RoomFor(const std::vector<unsigned>& levels,
+                    const std::vector<unsigned>& channels) const override {
+    return sideCar_->RoomFor(levels, channels);
+  }
 
  private:
   ILevelStore* internal_;

@@ -8,6 +8,7 @@
 
 #include "basic/gobs/datatype.h"
 #include "host/datasources/auxiliarydata.h"
+#include "host/datasources/levelroom.h"
 #include "host/datasources/overviewinfo.h"
 #include "host/datasources/rasterreader.h"
 #include "host/datasources/rasterwriter.h"
@@ -38,6 +39,14 @@ class ILevelStore {
   /// Marks `channels` of `level`. For true, everything written before is made durable first.
   /// \throws orin::Exception  no such level, its pixels are not complete, or it cannot be stored
   virtual void SetValid(unsigned level, const std::vector<unsigned>& channels, bool valid) = 0;
+
+  /// What it takes to make all of `levels` for `channels`, the ones that exist anew; those larger
+  /// than the image are left out. `Create` checks the same for its own level.
+  /// \throws orin::Exception  an option in force does not fit the raster
+  virtual LevelRoom RoomFor(const std::vector<unsigned>& /*levels*/,
+                            const std::vector<unsigned>& /*channels*/) const {
+    return {};
+  }
 };
 
 /// One opened raster as its driver sees it.
