@@ -99,9 +99,25 @@ ExitCode ReportFailure(const Outcome& outcome, const BuildPlan& plan, const Buil
   return CodeOfWarning(line);
 }
 
-ExitCode BuildFile(const BuildOptions& options, const std::string& file,
-                   const Interruption& interruption, Console& console) {
-  const BuildPlan plan = PlanBuild(options, file);
+/// The plan where its levels fit: beside a file that could not hold them, if the user leaves the
+/// choice. \throws orin::Exception  they fit nowhere, or not where the user wants them
+BuildPlan PlanWithRoom(BuildOptions& options, const std::string& file, Console& console) {
+  BuildPlan plan = PlanBuild(options, file);
+  if (!plan.room.obstacle.empty() && options.placement == Placement::kAutomatic &&
+      plan.room.file == file) {
+    console.Notice(
+        AfterFileName(file, plan.room.obstacle + " " + _("They go to a file beside it instead.")));
+    options.placement = Placement::kExternal;
+    plan = PlanBuild(options, file);
+  }
+  datasources::RequireRoom(plan.room);
+  return plan;
+}
+
+/// \param options  those of the command line; the placement is decided here
+ExitCode BuildFile(BuildOptions options, const std::string& file, const Interruption& interruption,
+                   Console& console) {
+  const BuildPlan plan = PlanWithRoom(options, file, console);
   CreateFileOverviews job = MakeJob(options, file);
   if (const std::string problem = ChannelProblem(job, plan, options); !problem.empty()) {
     console.Error(AfterFileName(file, problem));
@@ -134,6 +150,9 @@ ExitCode TryFile(const BuildOptions& options, const std::string& file,
     OpenForBuild(file, options.placement);
     code = kCannotBuild;
     return BuildFile(options, file, interruption, console);
+  } catch (const datasources::OptionException& error) {
+    console.Error(AfterFileName(file, error.GetMessage()));
+    code = kWrongUsage;
   } catch (const Exception& error) {
     console.Error(AfterFileName(file, error.GetMessage()));
   } catch (const std::exception& error) {
@@ -146,6 +165,7 @@ ExitCode TryFile(const BuildOptions& options, const std::string& file,
 
 ExitCode RunBuild(const BuildOptions& options, Console& console) {
   const Interruption interruption;
+  datasources::SetLevelOptions(options.storing);
   ExitCode result = kDone;
   for (size_t i = 0; i < options.files.size(); ++i) {
     if (interruption.Requested()) return kInterrupted;

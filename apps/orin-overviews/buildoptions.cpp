@@ -42,6 +42,33 @@ std::string ReadMethod(const std::string& text, QRTOverviewResampleType& method)
       text.c_str());
 }
 
+/// Reads every KEY=VALUE.
+void AddStoring(CLI::App& command, datasources::LevelOptions& storing) {
+  command
+      .add_option_function<std::vector<std::string>>(
+          "--co",
+          [&storing](const std::vector<std::string>& texts) {
+            std::string problem;
+            for (const std::string& text : texts)
+              if (problem.empty()) problem = datasources::ReadLevelOption(text, storing);
+            if (problem.empty()) problem = datasources::ContradictionIn(storing);
+            if (!problem.empty()) throw CLI::ValidationError("--co", problem);
+          },
+          _("How new levels are stored, such as COMPRESS=ZSTD; may be given again. Keys: COMPRESS, "
+            "PREDICTOR, TILE, LEVEL, QUALITY, BIGTIFF"))
+      ->allow_extra_args(false)
+      ->type_name(_("KEY=VALUE"));
+}
+
+/// With --force levels take the form asked for, which is one for all channels of a level.
+void FinishStoring(BuildOptions& options) {
+  options.storing.restores = options.force;
+  if (options.force && options.storing.SayCoding() && !options.channels.empty())
+    throw CLI::ValidationError(
+        "--co", _("cannot be used together with --force and --channels: all channels of a level "
+                  "are stored alike"));
+}
+
 void RefuseTogether(const CLI::Option& one, const CLI::Option& other) {
   if (one.count() && other.count())
     throw CLI::ValidationError(one.get_name(), FormatString(_("cannot be used together with %s"),
@@ -69,11 +96,13 @@ CLI::App* AddBuildCommand(CLI::App& app, BuildOptions& options) {
   const auto* external = command->add_flag_callback(
       "--external", [&] { options.placement = Placement::kExternal; },
       _("Keep the levels in a file beside it"));
+  AddStoring(*command, options.storing);
   command->add_flag("--force", options.force, _("Build levels again that are up to date"));
   command->add_flag("--quiet", options.quiet, _("Print warnings and errors only"));
-  command->final_callback([=] {
+  command->final_callback([=, &options] {
     RefuseTogether(*levels, *factor);
     RefuseTogether(*internal, *external);
+    FinishStoring(options);
   });
   return command;
 }

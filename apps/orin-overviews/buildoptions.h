@@ -6,6 +6,7 @@
 #include <string>
 #include <vector>
 
+#include "host/datasources/leveloptions.h"
 #include "processes/overviews/resampletype.h"
 
 namespace orin::app {
@@ -19,6 +20,7 @@ struct BuildOptions {
   QRTOverviewResampleType method = ResampleInvalid;  ///< ResampleInvalid: the user's preference
   std::vector<unsigned> channels;                    ///< empty: all that are wider than one bit
   Placement placement = Placement::kAutomatic;
+  datasources::LevelOptions storing;  ///< how new levels are stored
   bool force = false;
   bool quiet = false;
 };

@@ -2,29 +2,24 @@
 #include "apps/orin-overviews/buildplan.h"
 
 #include <algorithm>
+#include <optional>
 
-#include "host/datasources/datasetmanager.h"
+#include "host/datasources/levelstore.h"
 #include "host/datasources/pyramidlevels.h"
 #include "host/services/exception.h"
 #include "host/services/text.h"
 #include "processes/overviews/levelplanning.h"
-#include "processes/overviews/statusqueries.h"
+#include "processes/overviews/opening.h"
 
 namespace orin::app {
 namespace {
 
-using datasources::AccessMode;
-using datasources::DatasetManager;
 using datasources::IDataset;
 using datasources::IRasterDataset;
 using datasources::LevelDescription;
 
-std::unique_ptr<IDataset> Open(const std::string& file, AccessMode mode) {
-  return std::unique_ptr<IDataset>(DatasetManager::GetInstance()->Open(file, mode));
-}
-
-const IRasterDataset& RasterOf(const IDataset& dataset, const std::string& file) {
-  const auto* raster = dynamic_cast<const IRasterDataset*>(&dataset);
+IRasterDataset& RasterOf(IDataset& dataset, const std::string& file) {
+  auto* raster = dynamic_cast<IRasterDataset*>(&dataset);
   if (!raster || raster->GetChannelCount() == 0)
     throw Exception(FormatString(_("%s: holds no raster."), file.c_str()),
                     "apps/orin-overviews/buildplan", "orin::app::PlanBuild", 0);
@@ -69,6 +64,17 @@ bool IsValid(const std::vector<LevelDescription>& levels, unsigned level,
   return found != levels.end() && datasources::HoldsForAll(found->validChannels, channels);
 }
 
+/// What the levels to be built take, each once.
+datasources::LevelRoom RoomOf(IRasterDataset& raster, const BuildPlan& plan) {
+  const datasources::ILevelStore* store = raster.GetSource()->Levels();
+  std::vector<unsigned> levels;
+  for (const PlannedLevel& planned : plan.building)
+    if (!planned.empty && (levels.empty() || levels.back() != planned.level))
+      levels.push_back(planned.level);
+  if (!store || levels.empty()) return {};
+  return store->RoomFor(levels, plan.channels);
+}
+
 std::vector<unsigned> AscendingOnce(std::vector<unsigned> levels) {
   std::sort(levels.begin(), levels.end());
   levels.erase(std::unique(levels.begin(), levels.end()), levels.end());
@@ -78,26 +84,15 @@ std::vector<unsigned> AscendingOnce(std::vector<unsigned> levels) {
 }  // namespace
 
 std::unique_ptr<IDataset> OpenForBuild(const std::string& file, Placement placement) {
-  std::unique_ptr<IDataset> dataset;
-  AccessMode mode = AccessMode::kUpdate;
-  try {
-    dataset = Open(file, mode);
-  } catch (const Exception&) {
-    mode = AccessMode::kReadOnly;
-    dataset = Open(file, mode);
-  }
-  const bool beside =
-      placement == Placement::kExternal ||
-      (placement == Placement::kAutomatic &&
-       (mode == AccessMode::kReadOnly || !SupportsInternalOverviews(dataset.get())));
-  if (!beside) return dataset;
-  dataset.reset();
-  return std::unique_ptr<IDataset>(DatasetManager::GetInstance()->OpenFormat("ZMBALL", file, mode));
+  std::optional<bool> external;
+  if (placement != Placement::kAutomatic) external = placement == Placement::kExternal;
+  bool isReadOnly = false;
+  return OpenForOverviews(file, external, isReadOnly);
 }
 
 BuildPlan PlanBuild(const BuildOptions& options, const std::string& file) {
   const auto dataset = OpenForBuild(file, options.placement);
-  const IRasterDataset& raster = RasterOf(*dataset, file);
+  IRasterDataset& raster = RasterOf(*dataset, file);
   BuildPlan plan;
   plan.width = raster.GetWidth();
   plan.height = raster.GetHeight();
@@ -121,6 +116,7 @@ BuildPlan PlanBuild(const BuildOptions& options, const std::string& file) {
   for (const unsigned level : plan.kept)
     if (Has(existing, level, datasources::LevelStatus::kUnverified))
       plan.unverified.push_back(level);
+  plan.room = RoomOf(raster, plan);
   return plan;
 }
 

@@ -9,6 +9,7 @@
 #include "apps/orin-overviews/buildoptions.h"
 #include "apps/orin-overviews/progressmodel.h"
 #include "host/datasources/dataset.h"
+#include "host/datasources/levelroom.h"
 
 namespace orin::app {
 
@@ -29,6 +30,7 @@ struct BuildPlan {
   std::vector<PlannedLevel>
       building;  ///< the others in the order of building, repeated ones repeated
   LevelReport report = LevelReport::kWithinShare;
+  datasources::LevelRoom room;  ///< that the levels to be built take
 
   bool IsEmpty(unsigned level) const { return width / level == 0 || height / level == 0; }
 };

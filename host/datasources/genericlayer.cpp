@@ -52,6 +52,10 @@ class BothPlaces final : public ILevelStore {
     sideCar_->KeepAnswers();
     if (internal_) internal_->KeepAnswers();
   }
+  LevelRoom RoomFor(const std::vector<unsigned>& levels,
+                    const std::vector<unsigned>& channels) const override {
+    return sideCar_->RoomFor(levels, channels);
+  }
 
  private:
   ILevelStore* internal_;

@@ -3,41 +3,22 @@
 
 #include <algorithm>
 #include <numeric>
+#include <optional>
 
-#include "host/datasources/datasetmanager.h"
 #include "host/services/autoptr.h"
 #include "host/services/exception.h"
 #include "processes/overviews/levelplanning.h"
-#include "processes/overviews/statusqueries.h"
+#include "processes/overviews/opening.h"
 
 namespace {
 
 using orin::HAutoPtr;
-using orin::datasources::AccessMode;
-using orin::datasources::DatasetManager;
 using orin::datasources::IDataset;
 using orin::datasources::IRasterDataset;
 
 constexpr unsigned kDefaultFactor = 2;
 /// Marks that explicit levels are in force.
 constexpr unsigned kExplicitLevels = 0x7FFFFFFF;
-
-/// Null when the host refuses to open the file.
-HAutoPtr<IDataset> TryOpen(const std::string& name, AccessMode access) {
-  try {
-    return HAutoPtr<IDataset>(DatasetManager::GetInstance()->Open(name, access));
-  } catch (const orin::Exception&) {
-    return nullptr;
-  }
-}
-
-HAutoPtr<IDataset> TryOpenGenerically(const std::string& name, AccessMode access) {
-  try {
-    return HAutoPtr<IDataset>(DatasetManager::GetInstance()->OpenFormat("ZMBALL", name, access));
-  } catch (const orin::Exception&) {
-    return nullptr;
-  }
-}
 
 }  // namespace
 
@@ -85,20 +66,13 @@ void CreateFileOverviews::ShowProgress(bool on) { progress_ = on; }
 bool CreateFileOverviews::OpenDataset(const std::string& name, IDataset** out) const {
   if (!out) return false;
   *out = nullptr;
-  HAutoPtr<IDataset> dataset = TryOpen(name, orin::datasources::kUpdate);
-  const bool readOnly = !dataset;
-  if (readOnly) dataset = TryOpen(name, orin::datasources::kReadOnly);
-  if (!dataset) return readOnly;
-  const bool alreadyGeneric =
-      orin::datasources::FormatNameOf(*dataset).find("ZMB") != std::string::npos;
-  const bool outside =
-      automatic_ ? readOnly || !SupportsInternalOverviews(dataset.get()) : external_;
-  if (!alreadyGeneric && outside) {
-    dataset.reset();
-    dataset = TryOpenGenerically(
-        name, readOnly ? orin::datasources::kReadOnly : orin::datasources::kUpdate);
+  bool readOnly = false;
+  try {
+    const auto external = automatic_ ? std::nullopt : std::optional<bool>(external_);
+    *out = OpenForOverviews(name, external, readOnly).release();
+  } catch (const orin::Exception&) {
+    // deliberate: no dataset is the answer
   }
-  *out = dataset.release();
   return readOnly;
 }
 

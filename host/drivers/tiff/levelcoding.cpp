@@ -4,9 +4,12 @@
 #include <algorithm>
 #include <array>
 #include <cstdlib>
+#include <numeric>
+#include <tuple>
+#include <utility>
 
+#include "host/drivers/tiff/codingoptions.h"
 #include "host/drivers/tiff/jpegquality.h"
-#include "host/drivers/tiff/tileencoder.h"
 #include "host/services/exception.h"
 #include "host/services/text.h"
 
@@ -17,6 +20,8 @@ constexpr uint32_t kTileEdge = 256;
 constexpr uint64_t kMostTileBytes = 64 << 20;
 constexpr uint64_t kMostTiles = 1 << 26;
 constexpr uint64_t kMostTagBytes = 1 << 20;
+constexpr uint64_t kMostHeadBytes = 1 << 16;  // of a JPEG stream: its tables stand in front
+constexpr double kGuessedPart = 0.5;          // of a lossy image's samples, stored without loss
 
 constexpr std::array<uint16_t, 9> kInheritedTags = {TIFFTAG_COLORMAP,
                                                     TIFFTAG_INKSET,
@@ -41,26 +46,38 @@ void DropYCbCr(LevelCoding& coding) {
   });
 }
 
-/// DEFLATE without a predictor takes whatever a block can hold.
-void FallBackToDeflate(LevelCoding& coding) {
-  if (coding.format.photometric == PHOTOMETRIC_YCBCR &&
-      (coding.IsJpegYCbCr() || coding.format.compression == COMPRESSION_OJPEG)) {
-    coding.format.photometric = PHOTOMETRIC_RGB;  // as it is delivered
-    DropYCbCr(coding);
-  }
-  coding.format.compression = COMPRESSION_ADOBE_DEFLATE;
-  coding.predictor = PREDICTOR_NONE;
-  DropInherited(coding, [](uint16_t tag) { return tag == TIFFTAG_LERC_PARAMETERS; });
-}
-
-/// True when some tile or strip of the directory is not stored.
-bool HasSparseTiles(const PositionedFile& file, const TiffStructure& structure,
-                    const TiffDirectory& directory) {
+/// Learns from the stored sizes of all tiles or strips: whether some are left out, and how well the
+/// samples compress.
+void LookAtStoredSizes(const PositionedFile& file, const TiffStructure& structure,
+                       const TiffDirectory& directory, LevelCoding& coding) {
   const TiffEntry* counts = directory.Find(TIFFTAG_TILEBYTECOUNTS);
   if (!counts) counts = directory.Find(TIFFTAG_STRIPBYTECOUNTS);
-  if (!counts) return false;
+  if (!counts) return;
   const std::vector<uint64_t> numbers = ReadNumbers(file, structure, *counts);
-  return std::find(numbers.begin(), numbers.end(), 0) != numbers.end();
+  coding.mayBeSparse = std::find(numbers.begin(), numbers.end(), 0) != numbers.end();
+  const PixelFormat& format = coding.format;
+  const double samples = double(format.width) * format.height * format.samplesPerPixel;
+  const double stored = std::accumulate(numbers.begin(), numbers.end(), 0.0);
+  coding.storedPart = std::min(1.0, stored / (samples * format.SampleBytes()));
+  coding.imageBytes = std::min(file.Size(), static_cast<uint64_t>(stored));
+}
+
+/// The quality of a JPEG image: by its common tables, else by those of its first tile.
+int JpegQualityIn(const PositionedFile& file, const TiffStructure& structure,
+                  const TiffDirectory& directory, int otherwise) {
+  if (const TiffEntry* tables = directory.Find(TIFFTAG_JPEGTABLES))
+    if (const auto quality = JpegQualityOf(ReadBytes(file, structure, *tables))) return *quality;
+  for (const auto& [offsets, counts] : {std::pair{TIFFTAG_TILEOFFSETS, TIFFTAG_TILEBYTECOUNTS},
+                                        std::pair{TIFFTAG_STRIPOFFSETS, TIFFTAG_STRIPBYTECOUNTS}}) {
+    const uint64_t offset = NumberOf(file, structure, directory, uint16_t(offsets), 0);
+    const uint64_t count = NumberOf(file, structure, directory, uint16_t(counts), 0);
+    const uint64_t size = file.Size();
+    if (offset == 0 || offset >= size) continue;
+    std::vector<uint8_t> stream(std::min({count, size - offset, kMostHeadBytes}));
+    file.Read(offset, stream.data(), stream.size());
+    if (const auto quality = JpegQualityOf(stream)) return *quality;
+  }
+  return otherwise;
 }
 
 void Inherit(const PositionedFile& file, const TiffStructure& structure,
@@ -100,10 +117,9 @@ LevelCoding CodingOf(const PositionedFile& file, const TiffStructure& structure,
   }
   const auto lerc = NumbersIn(file, structure, directory, TIFFTAG_LERC_PARAMETERS);
   if (lerc.size() == 2) coding.lercExtra = static_cast<uint32_t>(lerc[1]);
-  if (const TiffEntry* tables = directory.Find(TIFFTAG_JPEGTABLES))
-    coding.jpegQuality =
-        JpegQualityOf(ReadBytes(file, structure, *tables)).value_or(coding.jpegQuality);
-  coding.mayBeSparse = HasSparseTiles(file, structure, directory);
+  if (format.compression == COMPRESSION_JPEG)
+    coding.jpegQuality = JpegQualityIn(file, structure, directory, coding.jpegQuality);
+  LookAtStoredSizes(file, structure, directory, coding);
   Inherit(file, structure, directory, coding);
   return coding;
 }
@@ -125,8 +141,7 @@ LevelCoding PlainCoding(uint32_t width, uint32_t height, uint32_t channels,
   format.compression = COMPRESSION_ADOBE_DEFLATE;
   format.photometric = PHOTOMETRIC_MINISBLACK;
   format.noData = noData;
-  const bool isPlainInteger = !type.isFloat && !type.isComplex && type.bits >= 8;
-  coding.predictor = isPlainInteger ? PREDICTOR_HORIZONTAL : PREDICTOR_NONE;
+  coding.predictor = UsualPredictor(format);
   if (channels > 1)
     coding.inherited.push_back(
         NumbersEntry(TIFFTAG_EXTRASAMPLES, TIFF_SHORT,
@@ -135,10 +150,32 @@ LevelCoding PlainCoding(uint32_t width, uint32_t height, uint32_t channels,
   return coding;
 }
 
-LevelCoding CodingOfLevel(const LevelCoding& image, unsigned level, const std::string& file) {
+uint16_t UsualPredictor(const PixelFormat& format) {
+  if (!format.WholeBytes() || format.type.isComplex || format.photometric == PHOTOMETRIC_PALETTE)
+    return PREDICTOR_NONE;
+  return format.type.isFloat ? PREDICTOR_FLOATINGPOINT : PREDICTOR_HORIZONTAL;
+}
+
+void FallBackToDeflate(LevelCoding& coding) {
+  if (coding.format.photometric == PHOTOMETRIC_YCBCR &&
+      (coding.IsJpegYCbCr() || coding.format.compression == COMPRESSION_OJPEG)) {
+    coding.format.photometric = PHOTOMETRIC_RGB;  // as it is delivered
+    DropYCbCr(coding);
+  }
+  coding.format.compression = COMPRESSION_ADOBE_DEFLATE;
+  coding.predictor = UsualPredictor(coding.format);
+  coding.storedPart = std::max(coding.storedPart, kGuessedPart);
+  coding.imageBytes.reset();
+  DropInherited(coding, [](uint16_t tag) { return tag == TIFFTAG_LERC_PARAMETERS; });
+}
+
+LevelCoding CodingOfLevel(const LevelCoding& image, unsigned level, const std::string& file,
+                          const datasources::LevelOptions& options) {
   const auto refuse = [&](const char* format) {
     throw Exception(FormatString(format, file.c_str(), level), "host/drivers/tiff/levelcoding",
-                    "CodingOfLevel(const LevelCoding&, unsigned int, const std::string&)", 0);
+                    "CodingOfLevel(const LevelCoding&, unsigned int, const std::string&, const "
+                    "datasources::LevelOptions&)",
+                    0);
   };
   LevelCoding coding = image;
   PixelFormat& format = coding.format;
@@ -153,21 +190,30 @@ LevelCoding CodingOfLevel(const LevelCoding& image, unsigned level, const std::s
     format.tileWidth = format.tileHeight = format.tileWidth / 2;
   format.tiled = true;
   format.fillOrder = FILLORDER_MSB2LSB;
+  ApplyOptions(options, file, kMostTileBytes, coding);
   if (format.TilesPerPlane() > kMostTiles / coding.Planes())
     refuse(_("%s: level %u would have too many tiles."));
-  if (!TileEncoder::CanEncode(coding)) FallBackToDeflate(coding);
   return coding;
 }
 
 LevelCoding InPlanes(LevelCoding coding) {
   if (coding.format.samplesPerPixel < 2) return coding;
   const bool needsChunks = coding.IsJpegYCbCr() || coding.format.compression == COMPRESSION_WEBP;
-  if (needsChunks) {
-    FallBackToDeflate(coding);
-    coding.predictor = PREDICTOR_HORIZONTAL;
-  }
+  if (needsChunks) FallBackToDeflate(coding);
   coding.format.planar = true;
   return coding;
+}
+
+bool HaveSameForm(const LevelCoding& one, const LevelCoding& other) {
+  const auto formOf = [](const LevelCoding& coding) {
+    const PixelFormat& format = coding.format;
+    return std::tuple(format.width, format.height, format.tileWidth, format.tileHeight,
+                      format.planar, format.compression, format.photometric, format.bitsPerSample,
+                      coding.predictor, coding.lercExtra);
+  };
+  const bool sameChroma = !one.IsJpegYCbCr() || (one.subsamplingX == other.subsamplingX &&
+                                                 one.subsamplingY == other.subsamplingY);
+  return formOf(one) == formOf(other) && sameChroma;
 }
 
 std::vector<NewEntry> EntriesOf(const LevelCoding& coding) {

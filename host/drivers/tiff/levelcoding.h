@@ -4,8 +4,11 @@
 #pragma once
 
 #include <cstdint>
+#include <optional>
+#include <string>
 #include <vector>
 
+#include "host/datasources/leveloptions.h"
 #include "host/drivers/tiff/appender.h"
 #include "host/drivers/tiff/pixelformat.h"
 #include "host/drivers/tiff/structure.h"
@@ -20,9 +23,13 @@ struct LevelCoding {
   uint16_t subsamplingX = 2;  ///< of YCbCr
   uint16_t subsamplingY = 2;
   int jpegQuality = 90;
-  uint32_t lercExtra = 0;           ///< compression on top of LERC
-  bool mayBeSparse = false;         ///< tiles that hold nothing but no data need not be stored
-  std::vector<NewEntry> inherited;  ///< tags that describe the samples, copied as they are
+  std::optional<int> webpQuality;      ///< none: without loss
+  int effort = 0;                      ///< of DEFLATE and ZSTD; 0: the codec's own
+  uint32_t lercExtra = 0;              ///< compression on top of LERC
+  bool mayBeSparse = false;            ///< tiles that hold nothing but no data need not be stored
+  std::vector<NewEntry> inherited;     ///< tags that describe the samples, copied as they are
+  double storedPart = 0.5;             ///< stored bytes / bytes of the samples, as far as is known
+  std::optional<uint64_t> imageBytes;  ///< stored, of the image in this very codec
 
   /// JPEG takes and gives RGB for stored YCbCr.
   bool IsJpegYCbCr() const;
@@ -40,12 +47,24 @@ LevelCoding PlainCoding(uint32_t width, uint32_t height, uint32_t channels,
                         const gobs::DataType& type, const std::string& noData);
 
 /// The coding for `level` of an image of coding `image`: its size, tiles of 16 pixels or more, and
-/// a compression that can be written here.
-/// \throws orin::Exception  the level has no pixel, or too many tiles; the text names `file`
-LevelCoding CodingOfLevel(const LevelCoding& image, unsigned level, const std::string& file);
+/// what `options` say; else the image's compression if that can be written here without more loss.
+/// \throws orin::Exception  the level has no pixel, or too many tiles, or an option does not suit
+///                          the image; the text names `file`
+LevelCoding CodingOfLevel(
+    const LevelCoding& image, unsigned level, const std::string& file,
+    const datasources::LevelOptions& options = datasources::CurrentLevelOptions());
 
 /// The same in planes of their own, one a channel.
 LevelCoding InPlanes(LevelCoding coding);
+
+/// DEFLATE, which takes whatever a block can hold.
+void FallBackToDeflate(LevelCoding& coding);
+
+/// The predictor that suits the samples in DEFLATE, LZW, ZSTD or LZMA.
+uint16_t UsualPredictor(const PixelFormat& format);
+
+/// True when tiles of one can stand in the directory of the other.
+bool HaveSameForm(const LevelCoding& one, const LevelCoding& other);
 
 /// The entries of a level's directory: all but those that locate its tiles and its metadata.
 std::vector<NewEntry> EntriesOf(const LevelCoding& coding);

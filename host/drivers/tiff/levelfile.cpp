@@ -32,11 +32,10 @@ LevelFile::LevelFile(std::string path, bool mayChange)
   structure_ = ParseStructure(*file_);
 }
 
-std::unique_ptr<LevelFile> LevelFile::NotYetMade(std::string path, bool isBig) {
+std::unique_ptr<LevelFile> LevelFile::NotYetMade(std::string path) {
   std::unique_ptr<LevelFile> file(new LevelFile());
   file->path_ = std::move(path);
   file->mayChange_ = true;
-  file->structure_.isBig = isBig;
   return file;
 }
 

@@ -19,8 +19,8 @@ class LevelFile {
  public:
   /// A file that is there. \throws orin::Exception  it cannot be read as TIFF
   LevelFile(std::string path, bool mayChange);
-  /// A file to be made. \param isBig  as BigTIFF
-  static std::unique_ptr<LevelFile> NotYetMade(std::string path, bool isBig);
+  /// A file to be made: a classic TIFF unless it becomes big.
+  static std::unique_ptr<LevelFile> NotYetMade(std::string path);
 
   /// The file's name, the final one.
   const std::string& Path() const { return path_; }
@@ -30,6 +30,10 @@ class LevelFile {
   /// \pre Exists() or something was appended
   const PositionedFile& File() const { return *file_; }
   const TiffStructure& Structure() const { return structure_; }
+  /// The file that will be made is a BigTIFF. \pre nothing was appended, and !Exists()
+  void BecomeBig() {
+    if (!appender_ && !isMade_) structure_.isBig = true;
+  }
   /// Reads the structure again.
   void Refresh();
 

@@ -95,15 +95,16 @@ void TiffLevelStore::Patch(const StoredLevel& stored, const LevelMetadata& metad
   file_->Sync();
 }
 
-void TiffLevelStore::AddDirectory(unsigned level, const LevelMetadata& metadata,
-                                  const LevelBuild& build, const std::vector<uint32_t>& planes) {
+void TiffLevelStore::AddDirectory(const Pending& pending, const LevelMetadata& metadata,
+                                  const std::vector<uint32_t>& planes) {
   const TiffStructure& structure = file_->Structure();
-  const StoredLevel* before = Find(level);
+  const LevelBuild& build = *pending.build;
+  const StoredLevel* before = Find(metadata.level);
   const uint64_t tiles = build.TilesPerPlane();
   std::vector<NewEntry> entries = EntriesOf(build.Coding());
   for (const TileTable& table : kTables) {
     std::vector<uint64_t> numbers;
-    if (before && before->isOurs)  // other planes keep their tiles
+    if (before && before->isOurs && !pending.isRecoded)  // other planes keep their tiles
       if (const TiffEntry* entry = structure.directories[before->index].Find(table.tag))
         numbers = ReadNumbers(file_->File(), structure, *entry);
     numbers.resize(tiles * build.Coding().Planes());
@@ -155,10 +156,12 @@ void TiffLevelStore::Store(unsigned level, Pending& pending, const std::vector<u
   file_->Sync();
   CatchUp();
   const StoredLevel* ours = FindOurs(level);
-  const datasources::ImageRecord kept = ours ? ours->metadata.image : datasources::ImageRecord();
-  const LevelMetadata metadata = MetadataFor(level, pending, ours, image.value_or(kept));
-  if (ours && CanPatch(*ours, metadata, *build)) Patch(*ours, metadata, *build, planes);
-  else AddDirectory(level, metadata, *build, planes);
+  const StoredLevel* before = pending.isRecoded ? nullptr : ours;
+  const datasources::ImageRecord kept = before ? before->metadata.image : datasources::ImageRecord();
+  const LevelMetadata metadata = MetadataFor(level, pending, before, image.value_or(kept));
+  if (before && CanPatch(*ours, metadata, *build)) Patch(*ours, metadata, *build, planes);
+  else AddDirectory(pending, metadata, planes);
+  pending.isRecoded = false;
   Reload();
   for (const uint32_t plane : planes) build->Release(plane);
   build->mask.reset();

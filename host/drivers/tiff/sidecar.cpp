@@ -29,6 +29,9 @@ LevelCoding CodingOfImage(const IRasterSource& image) {
     const PositionedFile file(tiff->File(), PositionedFile::Mode::kRead);
     const TiffStructure structure = ParseStructure(file);
     coding = CodingOf(file, structure, structure.directories[0], tiff->Format());
+    // What libtiff 4.5 reads there may be a NaN with digits, which LERC would drop.
+    if (coding.format.compression == COMPRESSION_LERC && structure.byteOrder.IsSwapped())
+      FallBackToDeflate(coding);
   } else {
     const auto metadata = image.MetadataOf({1});
     std::string noData = metadata.GetFileMetadataValue(datasources::kNoDataKey);
@@ -38,14 +41,6 @@ LevelCoding CodingOfImage(const IRasterSource& image) {
   }
   coding.byteOrder = ByteOrder();
   return InPlanes(std::move(coding));
-}
-
-/// Levels take less than the image, so that they fit where the image would.
-bool NeedsBig(const LevelCoding& image) {
-  constexpr double kClassicLimit = 4294967296.0;
-  return double(image.format.width) * image.format.height * image.format.samplesPerPixel *
-             image.format.SampleBytes() >=
-         kClassicLimit;
 }
 
 std::unique_ptr<LevelFile> OpenExisting(const std::string& path) {
@@ -96,9 +91,8 @@ std::unique_ptr<datasources::ILevelStore> TiffSideCar::Open(const std::string& i
   settings.validity =
       image.DeliversValidity() ? ValidityOf(image) : ValidityBeside(imageFile, image);
   std::error_code ignored;
-  auto file = std::filesystem::exists(path, ignored)
-                  ? OpenExisting(path)
-                  : LevelFile::NotYetMade(path, NeedsBig(settings.coding));
+  auto file =
+      std::filesystem::exists(path, ignored) ? OpenExisting(path) : LevelFile::NotYetMade(path);
   settings.coding.byteOrder = file->Structure().byteOrder;
   return std::make_unique<TiffLevelStore>(std::move(file), std::move(settings));
 }

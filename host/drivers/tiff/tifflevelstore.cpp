@@ -149,13 +149,9 @@ void TiffLevelStore::Create(unsigned level, const std::vector<unsigned>& channel
     Fail(_("%s: is open for reading only; level %u cannot be made."), level, "Create");
   auto entry = pending_.find(level);
   if (entry == pending_.end()) {
-    const StoredLevel* ours = FindOurs(level);
-    Pending pending;
-    pending.imageAtStart = freshness_.Now();
-    pending.channels.resize(settings_.image.samples);
-    pending.coding =
-        ours ? CodingOfStored(*ours) : CodingOfLevel(settings_.coding, level, file_->Path());
-    entry = pending_.emplace(level, std::move(pending)).first;
+    RequireRoomFor(level, channels);
+    entry = pending_.emplace(level, PendingFor(level)).first;
+    entry->second.imageAtStart = freshness_.Now();
   }
   for (const unsigned channel : channels) entry->second.channels.at(channel - 1) = true;
   entry->second.method = method;
@@ -187,7 +183,8 @@ std::unique_ptr<PixelReader> TiffLevelStore::OpenPixels(unsigned level,
 std::unique_ptr<PixelReader> TiffLevelStore::OpenStoredTiles(unsigned level) {
   const std::lock_guard lock(mutex_);
   const StoredLevel* ours = FindOurs(level);
-  if (!ours) return nullptr;
+  const auto pending = pending_.find(level);
+  if (!ours || (pending != pending_.end() && pending->second.isRecoded)) return nullptr;
   return std::make_unique<PixelReader>(
       file_->Path(), file_->Structure().directories[ours->index].offset, std::vector<unsigned>{1});
 }

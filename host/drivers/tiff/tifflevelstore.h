@@ -55,6 +55,8 @@ class TiffLevelStore final : public datasources::ILevelStore {
   void SetValid(unsigned level, const std::vector<unsigned>& channels, bool valid) override;
   void SetSource(const datasources::LevelDescription& source) override;
   void KeepAnswers() override;
+  datasources::LevelRoom RoomFor(const std::vector<unsigned>& levels,
+                                 const std::vector<unsigned>& channels) const override;
 
   // For the level writers.
 
@@ -84,6 +86,7 @@ class TiffLevelStore final : public datasources::ILevelStore {
     std::vector<bool> channels;  ///< created
     std::string method;
     LevelCoding coding;
+    bool isRecoded = false;             ///< stored tiles have another form and are given up
     std::shared_ptr<LevelBuild> build;  ///< null until the first write
     std::optional<datasources::ImageStamp> imageAtStart;
   };
@@ -97,6 +100,11 @@ class TiffLevelStore final : public datasources::ILevelStore {
   void AddPending(unsigned level, const Pending& pending,
                   std::vector<datasources::LevelDescription>& list) const;
   LevelCoding CodingOfStored(const StoredLevel& stored) const;
+  Pending PendingFor(unsigned level) const;
+  datasources::LevelRoom RoomOf(const std::vector<unsigned>& levels,
+                                const std::vector<unsigned>& channels) const;
+  void ExplainLimit(datasources::LevelRoom& room) const;
+  void RequireRoomFor(unsigned level, const std::vector<unsigned>& channels);
   Pending& Reopen(unsigned level, const std::vector<unsigned>& channels);
   void Mark(const StoredLevel& stored, const std::vector<unsigned>& channels, char validity);
 
@@ -118,7 +126,7 @@ class TiffLevelStore final : public datasources::ILevelStore {
                 const LevelBuild& build) const;
   void Patch(const StoredLevel& stored, const LevelMetadata& metadata, const LevelBuild& build,
              const std::vector<uint32_t>& planes);
-  void AddDirectory(unsigned level, const LevelMetadata& metadata, const LevelBuild& build,
+  void AddDirectory(const Pending& pending, const LevelMetadata& metadata,
                     const std::vector<uint32_t>& planes);
   void TidyMasks(std::optional<uint64_t> strayMask);
   void GiveUp(unsigned level, LevelBuild& build);

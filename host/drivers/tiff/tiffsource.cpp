@@ -4,6 +4,7 @@
 #include <algorithm>
 #include <cerrno>
 #include <cstring>
+#include <filesystem>
 #include <utility>
 
 #include <fcntl.h>
@@ -56,14 +57,14 @@ class TiffReader final : public datasources::ReaderState<datasources::IRasterRea
   PixelReader pixels_;
 };
 
-/// Opening for update changes nothing in the file, not even its times.
+/// Asks without opening the file for writing: that is left to the first change.
 void RequireWritable(const std::string& file) {
-  const int descriptor = open(file.c_str(), O_RDWR | O_CLOEXEC);
-  if (descriptor < 0)
-    throw Exception(FormatString(_("%s: cannot be opened for writing: %s."), file.c_str(),
-                                 std::strerror(errno)),
-                    "host/drivers/tiff/tiffsource", "RequireWritable(const std::string&)", 0);
-  close(descriptor);
+  std::error_code ignored;
+  const bool isFolder = std::filesystem::is_directory(file, ignored);
+  if (!isFolder && faccessat(AT_FDCWD, file.c_str(), W_OK, AT_EACCESS) == 0) return;
+  const char* reason = std::strerror(isFolder ? EISDIR : errno);
+  throw Exception(FormatString(_("%s: cannot be opened for writing: %s."), file.c_str(), reason),
+                  "host/drivers/tiff/tiffsource", "RequireWritable(const std::string&)", 0);
 }
 
 /// The first extra sample that is declared as opacity, 1-based; 0 without one.

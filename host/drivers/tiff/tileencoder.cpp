@@ -40,7 +40,13 @@ bool SetCodec(TIFF* tiff, const LevelCoding& coding) {
       return TIFFSetField(tiff, TIFFTAG_JPEGQUALITY, coding.jpegQuality) &&
              TIFFSetField(tiff, TIFFTAG_JPEGTABLESMODE, 0);  // every tile stands alone
     case COMPRESSION_WEBP:
+      if (coding.webpQuality) return TIFFSetField(tiff, TIFFTAG_WEBP_LEVEL, *coding.webpQuality);
       return TIFFSetField(tiff, TIFFTAG_WEBP_LOSSLESS, 1);
+    case COMPRESSION_DEFLATE:
+    case COMPRESSION_ADOBE_DEFLATE:
+      return coding.effort == 0 || TIFFSetField(tiff, TIFFTAG_ZIPQUALITY, coding.effort);
+    case COMPRESSION_ZSTD:
+      return coding.effort == 0 || TIFFSetField(tiff, TIFFTAG_ZSTD_LEVEL, coding.effort);
     case COMPRESSION_LERC:
       return TIFFSetField(tiff, TIFFTAG_LERC_ADD_COMPRESSION, coding.lercExtra) &&
              TIFFSetField(tiff, TIFFTAG_LERC_MAXZERROR, 0.0);
@@ -107,7 +113,10 @@ std::vector<uint8_t> TileEncoder::Encode(const std::vector<uint8_t>& samples,
   }
   if (ExchangesParts(coding_))
     for (size_t i = 0; i + 1 < packed.size(); i += 2) std::swap(packed[i], packed[i + 1]);
-  const MemoryTiff memory(coding_.byteOrder.order, file_);
+  // The floating point predictor has one order in every file, which libtiff 4.5 gets wrong in files
+  // of the other byte order.
+  const bool hasOwnOrder = coding_.predictor == PREDICTOR_FLOATINGPOINT;
+  const MemoryTiff memory(hasOwnOrder ? std::endian::native : coding_.byteOrder.order, file_);
   if (!SetLayout(memory.Get(), coding_) || !SetCodec(memory.Get(), coding_)) memory.Fail();
   const auto size = static_cast<tmsize_t>(packed.size());
   if (TIFFTileSize(memory.Get()) != size) memory.Fail();

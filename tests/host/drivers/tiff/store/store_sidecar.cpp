@@ -205,7 +205,7 @@ Seen PlainLevel(const std::string& name, PlainImage& image, unsigned level) {
   return DirectoriesOf(name + ".ovr").at(0);
 }
 
-TEST_F(SideCar, OfAnyOtherImageIsDeflatedWithAPredictorForIntegers) {
+TEST_F(SideCar, OfAnyOtherImageIsDeflatedWithThePredictorOfItsType) {
   PlainImage integers(300, 200, {gobs::DataTypeOf<int16_t>(), gobs::DataTypeOf<int16_t>()});
   const Seen ofIntegers = PlainLevel(folder_.File("a.png"), integers, 2);
   EXPECT_EQ(COMPRESSION_ADOBE_DEFLATE, ofIntegers.compression);
@@ -215,14 +215,14 @@ TEST_F(SideCar, OfAnyOtherImageIsDeflatedWithAPredictorForIntegers) {
   PlainImage floats(300, 200, {gobs::DataTypeOf<float>()});
   const Seen ofFloats = PlainLevel(folder_.File("b.png"), floats, 2);
   EXPECT_EQ(COMPRESSION_ADOBE_DEFLATE, ofFloats.compression);
-  EXPECT_EQ(1, ofFloats.predictor);
+  EXPECT_EQ(3, ofFloats.predictor);
 }
 
-TEST_F(SideCar, OfAnImageOfFourGiBIsABigTiff) {
-  PlainImage below(65535, 65537, {gobs::eDT_8U});
+TEST_F(SideCar, IsABigTiffWhenTheUsualPyramidsCouldPassFourGiB) {
+  PlainImage below(90000, 90000, {gobs::eDT_8U});  // level 2 has 2.0e9 samples, 3 has 0.9e9 ...
   PlainLevel(folder_.File("below.jp2"), below, 1024);
   EXPECT_EQ(42, BytesOf(folder_.File("below.jp2.ovr"))[2]);
-  PlainImage above(65536, 65536, {gobs::eDT_8U});
+  PlainImage above(100000, 100000, {gobs::eDT_8U});
   PlainLevel(folder_.File("above.jp2"), above, 1024);
   EXPECT_EQ(43, BytesOf(folder_.File("above.jp2.ovr"))[2]);
 }

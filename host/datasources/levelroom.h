@@ -1,0 +1,24 @@
+/// What it takes to make levels, known before the first byte is written.
+// SPDX-License-Identifier: MIT
+#pragma once
+
+#include <cstdint>
+#include <string>
+
+namespace orin::datasources {
+
+struct LevelRoom {
+  std::string file;    ///< that grows, or is made; empty: the levels take no room in a file
+  uint64_t bytes = 0;  ///< expected: exact without compression, else from how the image compresses
+  std::string obstacle;  ///< why the file's format may not hold them, naming it; empty: it does
+  std::string advice;    ///< what to do about the obstacle
+};
+
+/// Why the file system cannot take the levels, naming what is needed and what is free; empty when
+/// it can, or does not tell how much is free.
+std::string SpaceProblem(const LevelRoom& room);
+
+/// \throws orin::Exception  there is an obstacle or a problem of space
+void RequireRoom(const LevelRoom& room);
+
+}  // namespace orin::datasources

@@ -1,0 +1,95 @@
+/// Looks, before a level is made, whether the file and its file system can take it.
+// SPDX-License-Identifier: MIT
+#include <algorithm>
+
+#include "host/datasources/levelroom.h"
+#include "host/drivers/tiff/storedsize.h"
+#include "host/drivers/tiff/tifflevelstore.h"
+#include "host/services/text.h"
+
+namespace orin::drivers {
+
+using datasources::BigTiff;
+using datasources::LevelRoom;
+
+namespace {
+
+/// What the user wishes, else whether the usual pyramids and this level could pass the limit.
+bool BecomesBig(const ImageShape& image, const LevelCoding& level) {
+  constexpr uint64_t kSaferBytes = uint64_t{1} << 31;
+  const BigTiff wish = datasources::CurrentLevelOptions().bigTiff;
+  if (wish == BigTiff::kYes || wish == BigTiff::kNo) return wish == BigTiff::kYes;
+  const uint64_t most = MostBytesOfPyramids(image.width, image.height, level) +
+                        StoredSizeOf(level, level.Planes(), true).most;
+  return most > (wish == BigTiff::kIfSafer ? kSaferBytes : kClassicBytes);
+}
+
+}  // namespace
+
+/// A stored level of ours keeps its form unless the user's options give it another.
+TiffLevelStore::Pending TiffLevelStore::PendingFor(unsigned level) const {
+  Pending pending;
+  pending.channels.resize(settings_.image.samples);
+  const datasources::LevelOptions& options = datasources::CurrentLevelOptions();
+  const StoredLevel* ours = FindOurs(level);
+  const bool isRestored = ours && options.restores && options.SayCoding();
+  if (!ours || isRestored) pending.coding = CodingOfLevel(settings_.coding, level, file_->Path());
+  if (!ours) return pending;
+  const LevelCoding stored = CodingOfStored(*ours);
+  if (!isRestored) pending.coding = stored;
+  pending.isRecoded = !HaveSameForm(stored, pending.coding);
+  return pending;
+}
+
+/// Explains why the file cannot grow by `most` bytes. \pre it is a classic TIFF
+void TiffLevelStore::ExplainLimit(LevelRoom& room) const {
+  const char* name = file_->Path().c_str();
+  if (settings_.place == datasources::LevelPlace::kInternal) {
+    room.obstacle = FormatString(
+        _("%s: could pass 4 GiB, the limit of a classic TIFF, with the levels inside."), name);
+    room.advice = _("Use --external: the levels then go to a file beside it.");
+  } else if (file_->Exists()) {
+    room.obstacle = FormatString(
+        _("%s: could pass 4 GiB, the limit of a classic TIFF, with more levels."), name);
+    room.advice =
+        _("Delete the side-car, or move it away, and run again: the new one has no such limit.");
+  } else {
+    room.obstacle = FormatString(_("%s: could pass 4 GiB, the limit that BIGTIFF=NO sets."), name);
+    room.advice = _("Leave that option out.");
+  }
+}
+
+LevelRoom TiffLevelStore::RoomFor(const std::vector<unsigned>& levels,
+                                  const std::vector<unsigned>& channels) const {
+  const std::lock_guard lock(mutex_);
+  return RoomOf(levels, channels);
+}
+
+LevelRoom TiffLevelStore::RoomOf(const std::vector<unsigned>& levels,
+                                 const std::vector<unsigned>& channels) const {
+  LevelRoom room;
+  StoredSize size;
+  const TiffStructure& structure = file_->Structure();
+  for (const unsigned level : levels) {
+    if (settings_.image.width / level == 0 || settings_.image.height / level == 0) continue;
+    const LevelCoding coding = PendingFor(level).coding;
+    const auto planes = static_cast<uint32_t>(PlanesOf(coding, channels).size());
+    size += StoredSizeOf(coding, planes, structure.isBig);
+  }
+  if (size.most == 0) return room;
+  room.file = file_->Path();
+  room.bytes = size.expected;
+  const bool mayBecomeBig =
+      !file_->Exists() && datasources::CurrentLevelOptions().bigTiff != BigTiff::kNo;
+  const uint64_t end = file_->Exists() ? file_->File().Size() : structure.HeaderBytes();
+  if (!structure.isBig && !mayBecomeBig && end + size.most > kClassicBytes) ExplainLimit(room);
+  return room;
+}
+
+/// Makes sure, or throws; a file not yet made becomes a BigTIFF where that is needed.
+void TiffLevelStore::RequireRoomFor(unsigned level, const std::vector<unsigned>& channels) {
+  datasources::RequireRoom(RoomOf({level}, channels));
+  if (!file_->Exists() && BecomesBig(settings_.image, PendingFor(level).coding)) file_->BecomeBig();
+}
+
+}  // namespace orin::drivers

@@ -1,0 +1,128 @@
+/// What levels will take, told before they are made.
+// SPDX-License-Identifier: MIT
+#include <filesystem>
+
+#include "host/datasources/leveloptions.h"
+#include "host/drivers/tiff/storedsize.h"
+#include "host/services/exception.h"
+#include "tests/host/drivers/tiff/store/storesupport.h"
+
+namespace orin::tests {
+namespace {
+
+using datasources::LevelRoom;
+
+constexpr uint64_t kDirectories = 20000;  // more than those of a few levels take
+
+LevelRoom RoomFor(IRasterDataset& dataset, const std::vector<unsigned>& levels) {
+  return dataset.GetSource()->Levels()->RoomFor(levels, ChannelsOf(dataset));
+}
+
+/// Bytes by which the file grows when the levels are built.
+uint64_t GrowthOf(const std::string& file, const Layout& image,
+                  const std::vector<unsigned>& levels) {
+  const uint64_t before = std::filesystem::file_size(file);
+  for (const unsigned level : levels) Build(file, image, {.level = level});
+  return std::filesystem::file_size(file) - before;
+}
+
+TEST_F(TiffStore, RoomOfUncompressedLevelsIsThatOfTheirTiles) {
+  const Layout image{.width = 1000, .height = 700, .samples = 2, .bits = 16, .tile = 64};
+  const std::string file = folder_.File("image.tif");
+  WriteImage(file, image);
+  const uint64_t expected = RoomFor(*Open(file, datasources::kReadOnly), {2, 4, 2000}).bytes;
+  const uint64_t tiles = (8 * 6 + 4 * 3) * 64 * 64 * 4;
+  EXPECT_LE(tiles, expected);
+  EXPECT_GE(tiles + kDirectories, expected);
+  const uint64_t growth = GrowthOf(file, image, {2, 4});
+  EXPECT_LE(growth, expected);
+  EXPECT_GE(growth + kDirectories, expected);
+}
+
+TEST_F(TiffStore, RoomOfCompressedLevelsFollowsTheImage) {
+  const std::string file = folder_.File("image.tif");
+  uint64_t rooms[2];
+  for (const uint16_t bits : {8, 16}) {
+    const Layout image{.width = 1024,
+                       .height = 1024,
+                       .bits = bits,
+                       .tile = 64,
+                       .compression = COMPRESSION_ADOBE_DEFLATE};
+    WriteImage(file, image);
+    const double part = double(std::filesystem::file_size(file)) / (1024 * 1024 * bits / 8);
+    rooms[bits / 8 - 1] = RoomFor(*Open(file, datasources::kReadOnly), {2}).bytes;
+    EXPECT_NEAR(512 * 512 * bits / 8 * part, double(rooms[bits / 8 - 1]), kDirectories);
+  }
+  EXPECT_LT(rooms[0], rooms[1]);
+}
+
+TEST_F(TiffStore, RoomOfOneChannelBesideTheFileIsItsPlanes) {
+  const Layout image{.width = 1024, .height = 1024, .samples = 4, .tile = 64};
+  const std::string file = folder_.File("image.tif");
+  WriteImage(file, image);
+  const auto dataset = OpenGeneric(file);
+  const auto levels = dataset->GetSource()->Levels();
+  const uint64_t one = levels->RoomFor({2}, {3}).bytes;
+  const uint64_t all = levels->RoomFor({2}, {1, 2, 3, 4}).bytes;
+  EXPECT_NEAR(512 * 512, double(one), kDirectories);
+  EXPECT_NEAR(4 * 512 * 512, double(all), kDirectories);
+  EXPECT_EQ(file + ".ovr", levels->RoomFor({2}, {1}).file);
+  EXPECT_EQ("", levels->RoomFor({5000}, {1}).file);  // nothing would be made
+}
+
+TEST_F(TiffStore, LevelsThatCouldPassFourGiBAreAnObstacleInAClassicFileOnly) {
+  const Layout image{.width = 1024, .height = 1024, .tile = 64};
+  Layout big = image;
+  big.mode = "w8";
+  const std::string file = folder_.File("image.tif");
+  for (const auto& [layout, room, isRefused] :
+       {std::tuple{image, 400000u, false}, {image, 200000u, true}, {big, 200000u, false}}) {
+    WriteImage(file, layout);
+    std::filesystem::resize_file(file, (uint64_t{1} << 32) - room);
+    const std::string obstacle = RoomFor(*Open(file, datasources::kReadOnly), {2}).obstacle;
+    EXPECT_EQ(isRefused, obstacle.starts_with(file + ": could pass 4 GiB")) << obstacle;
+  }
+}
+
+TEST_F(TiffStore, ClassicSideCarThatCouldPassFourGiBSaysWhatToDo) {
+  const Layout image{.width = 1024, .height = 1024, .tile = 64};
+  const std::string file = folder_.File("image.tif");
+  WriteImage(file, image);
+  Build(*OpenGeneric(file), image, {.level = 8});
+  const uint64_t size = std::filesystem::file_size(file + ".ovr");
+  std::filesystem::resize_file(file + ".ovr", 0xFFFFFF00);
+  const auto dataset = OpenGeneric(file);
+  try {
+    Build(*dataset, image, {.level = 2});
+    ADD_FAILURE() << "the side-car took it";
+  } catch (const Exception& refusal) {
+    EXPECT_TRUE(refusal.GetMessage().starts_with(file + ".ovr: could pass 4 GiB"));
+    EXPECT_NE(std::string::npos, refusal.GetMessage().find("Delete the side-car"));
+  }
+  EXPECT_EQ(0xFFFFFF00, std::filesystem::file_size(file + ".ovr"));
+  std::filesystem::resize_file(file + ".ovr", size);
+  EXPECT_EQ("", WrongTile(file + ".ovr", 0, LevelLayout(image, 8)));
+}
+
+/// A level of that many samples without compression, 256 x 256 in a tile.
+drivers::LevelCoding CodingOfSquare(uint32_t edge, uint16_t compression) {
+  auto coding = drivers::PlainCoding(edge, edge, 1, gobs::eDT_8U, "");
+  coding.format.compression = compression;
+  coding.format.tiled = true;
+  coding.format.tileWidth = coding.format.tileHeight = 256;
+  return coding;
+}
+
+TEST_F(TiffStore, NoLevelIsTakenToNeedMoreThanItsImageInTheSameCodec) {
+  auto coding = CodingOfSquare(1024, COMPRESSION_LZW);
+  const uint64_t worst = drivers::StoredSizeOf(coding, 1, false).most;
+  EXPECT_LE(1024u * 1024 * 3 / 2, worst);  // LZW may make more of it
+  coding.imageBytes = 5000;
+  EXPECT_GE(5000 + kDirectories, drivers::StoredSizeOf(coding, 1, false).most);
+  coding = CodingOfSquare(1024, COMPRESSION_NONE);
+  coding.imageBytes = 5000;
+  EXPECT_LE(1024u * 1024, drivers::StoredSizeOf(coding, 1, false).most);
+}
+
+}  // namespace
+}  // namespace orin::tests
