@@ -39,11 +39,14 @@ class BothPlaces final : public ILevelStore {
   std::unique_ptr<IRasterWriter> OpenWriter(unsigned level,
                                             const std::vector<unsigned>& channels) override {
     const bool inside = internal_ && !Holds(sideCar_->List(), level);
-    return (inside ? *internal_ : *sideCar_).OpenWriter(level, channels);
+    if (!inside) return sideCar_->OpenWriter(level, channels);
+    sideCar_->NameSource(level);
+    return internal_->OpenWriter(level, channels);
   }
   void SetValid(unsigned level, const std::vector<unsigned>& channels, bool valid) override {
     sideCar_->SetValid(level, channels, valid);
   }
+  void Remove(const std::vector<unsigned>& levels) override { sideCar_->Remove(levels); }
 
  private:
   ILevelStore* internal_;

@@ -38,6 +38,14 @@ class ILevelStore {
   /// Marks `channels` of `level`. For true, everything written before is made durable first.
   /// \throws orin::Exception  no such level, its pixels are not complete, or it cannot be stored
   virtual void SetValid(unsigned level, const std::vector<unsigned>& channels, bool valid) = 0;
+
+  /// Removes the levels named, those of other programs too, as far as there are such; their masks
+  /// go with them, the image's pixels stay. None of them is being written.
+  /// \throws orin::Exception  they cannot be removed; the text names the file
+  virtual void Remove(const std::vector<unsigned>& levels) = 0;
+
+  /// The level that is to be written next is computed from `level` of another store.
+  virtual void NameSource(unsigned /*level*/) {}
 };
 
 /// One opened raster as its driver sees it.

@@ -139,6 +139,11 @@ class RecordedStore final : public ILevelStore {
                                          valid ? "true" : "false"));
     inner_.SetValid(level, channels, valid);
   }
+  void Remove(const std::vector<unsigned>& levels) override {
+    recorder_->Call("Remove", name_ + ".Remove(" + ListText(levels) + ")");
+    inner_.Remove(levels);
+  }
+  void NameSource(unsigned level) override { inner_.NameSource(level); }
 
  private:
   RecorderPtr recorder_;

@@ -66,8 +66,7 @@ std::unique_ptr<datasources::ILevelStore> TiffSideCar::Open(const std::string& i
   settings.image = {image.Width(), image.Height(), image.ChannelCount(),
                     settings.coding.format.type, false};
   settings.place = datasources::LevelPlace::kSideCar;
-  const bool mayReadElsewhere = image.Levels() && !image.Levels()->List().empty();
-  settings.usualSource = mayReadElsewhere ? 0 : 1;
+  settings.usualSource = 1;
   std::error_code ignored;
   auto file = std::filesystem::exists(path, ignored)
                   ? OpenExisting(path)

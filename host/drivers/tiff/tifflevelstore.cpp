@@ -29,6 +29,19 @@ TiffLevelStore::TiffLevelStore(std::unique_ptr<LevelFile> file, Settings setting
   Reload();
 }
 
+TiffLevelStore::~TiffLevelStore() {
+  try {
+    file_->GiveBackSpace();
+  } catch (const std::exception&) {
+    // deliberate: nothing is lost but space, which the next change finds again
+  }
+}
+
+void TiffLevelStore::NameSource(unsigned level) {
+  const std::lock_guard lock(mutex_);
+  lastRead_ = level;
+}
+
 void TiffLevelStore::Reload() {
   levels_.clear();
   if (file_->Exists()) levels_ = FindLevels(file_->File(), file_->Structure(), settings_.image);

@@ -39,6 +39,8 @@ class TiffLevelStore final : public datasources::ILevelStore {
   };
   /// \throws orin::Exception  the file cannot be read
   TiffLevelStore(std::unique_ptr<LevelFile> file, Settings settings);
+  /// Gives back the space of levels that were replaced, where it is at the file's end.
+  ~TiffLevelStore() override;
 
   std::vector<datasources::LevelDescription> List() const override;
   void Create(unsigned level, const std::vector<unsigned>& channels,
@@ -46,6 +48,8 @@ class TiffLevelStore final : public datasources::ILevelStore {
   std::unique_ptr<datasources::IRasterWriter> OpenWriter(
       unsigned level, const std::vector<unsigned>& channels) override;
   void SetValid(unsigned level, const std::vector<unsigned>& channels, bool valid) override;
+  void Remove(const std::vector<unsigned>& levels) override;
+  void NameSource(unsigned level) override;
 
   // For the level writers.
 
@@ -89,12 +93,11 @@ class TiffLevelStore final : public datasources::ILevelStore {
   void RequireStored(const StoredLevel* stored, unsigned level,
                      const std::vector<unsigned>& channels) const;
   void Store(unsigned level, Pending& pending, const std::vector<uint32_t>& planes);
-  bool CanPatch(const StoredLevel& stored, const LevelMetadata& metadata,
-                const LevelBuild& build) const;
-  void Patch(const StoredLevel& stored, const LevelMetadata& metadata, const LevelBuild& build,
-             const std::vector<uint32_t>& planes);
   void AddDirectory(unsigned level, const LevelMetadata& metadata, const LevelBuild& build,
                     const std::vector<uint32_t>& planes);
+  std::vector<size_t> DirectoriesOf(const std::vector<unsigned>& levels) const;
+  void RemoveStored(const std::vector<unsigned>& levels);
+  void Unlink(const std::vector<size_t>& indices);
   void GiveUp(unsigned level, LevelBuild& build);
   [[noreturn]] void Fail(const char* format, unsigned level, const char* operation) const;
 
