@@ -37,7 +37,7 @@ std::string ProblemOf(const CLI::ParseError& error, const CLI::App& app) {
   if (dynamic_cast<const CLI::ExtrasError*>(&error))
     return FormatString(_("unknown argument: %s"), NamesOf(app.remaining(true)).c_str());
   if (dynamic_cast<const CLI::RequiredError*>(&error))
-    return app.get_subcommands().empty() ? _("a sub-command is needed: build or info")
+    return app.get_subcommands().empty() ? _("a sub-command is needed: build, info or clean")
                                          : _("a FILE is needed");
   if (dynamic_cast<const CLI::ArgumentMismatch*>(&error))
     return FormatString(_("%s: takes exactly one value"), text.substr(0, text.find(':')).c_str());
@@ -67,8 +67,10 @@ std::optional<int> ParseCommandLine(int argc, const char* const* argv, Invocatio
       ->type_name(_("FILE"));
   CLI::App* build = AddBuildCommand(app, invocation.build);
   CLI::App* info = AddInfoCommand(app, invocation.info);
+  CLI::App* clean = AddCleanCommand(app, invocation.clean);
   build->group(_("Sub-commands"));
   info->group(_("Sub-commands"));
+  clean->group(_("Sub-commands"));
   try {
     app.parse(argc, argv);
   } catch (const CLI::Success& answer) {  // help or version
@@ -76,7 +78,9 @@ std::optional<int> ParseCommandLine(int argc, const char* const* argv, Invocatio
   } catch (const CLI::ParseError& error) {
     return Refuse(error, app);
   }
-  invocation.command = app.got_subcommand(info) ? Command::kInfo : Command::kBuild;
+  invocation.command = app.got_subcommand(info)    ? Command::kInfo
+                       : app.got_subcommand(clean) ? Command::kClean
+                                                   : Command::kBuild;
   return std::nullopt;
 }
 

@@ -6,11 +6,12 @@
 #include <string>
 
 #include "apps/orin-overviews/buildoptions.h"
+#include "apps/orin-overviews/cleanoptions.h"
 #include "apps/orin-overviews/infooptions.h"
 
 namespace orin::app {
 
-enum class Command { kBuild, kInfo };
+enum class Command { kBuild, kInfo, kClean };
 
 /// A command line that was understood.
 struct Invocation {
@@ -19,6 +20,7 @@ struct Invocation {
   std::string logFile;  ///< empty: none
   BuildOptions build;
   InfoOptions info;
+  CleanOptions clean;
 };
 
 /// Reads the command line into `invocation`. Help and version go to standard output, a wrong usage

@@ -8,6 +8,7 @@
 #include <cstring>
 
 #include "apps/orin-overviews/build.h"
+#include "apps/orin-overviews/clean.h"
 #include "apps/orin-overviews/commandline.h"
 #include "apps/orin-overviews/console.h"
 #include "apps/orin-overviews/exitcode.h"
@@ -26,9 +27,25 @@ namespace {
 
 using namespace orin::app;
 
+bool IsQuiet(const Invocation& invocation) {
+  return (invocation.command == Command::kBuild && invocation.build.quiet) ||
+         (invocation.command == Command::kClean && invocation.clean.quiet);
+}
+
+ExitCode RunCommand(const Invocation& invocation, Console& console) {
+  switch (invocation.command) {
+    case Command::kInfo:
+      return RunInfo(invocation.info, console);
+    case Command::kClean:
+      return RunClean(invocation.clean, console);
+    case Command::kBuild:
+      break;
+  }
+  return RunBuild(invocation.build, console);
+}
+
 int Run(const Invocation& invocation) {
-  const bool quiet = invocation.command == Command::kBuild && invocation.build.quiet;
-  Console console({quiet, invocation.verbose, invocation.logFile});
+  Console console({IsQuiet(invocation), invocation.verbose, invocation.logFile});
   const LibraryReports reports(console);
   orin::drivers::RegisterMemoryDriver();
   orin::drivers::RegisterTiffDriver();
@@ -36,8 +53,7 @@ int Run(const Invocation& invocation) {
   orin::drivers::RegisterGdalDriver();  // after it: local TIFF files are the TIFF driver's
 #endif
   PreferenceRegistry::Install(orin::LoadPreferences(orin::PreferenceFilePath()));
-  const ExitCode code = invocation.command == Command::kBuild ? RunBuild(invocation.build, console)
-                                                              : RunInfo(invocation.info, console);
+  const ExitCode code = RunCommand(invocation, console);
   if (std::fflush(stdout) == 0 && !std::ferror(stdout)) return code;
   console.Error(FormatString(_("The output cannot be written: %s."), std::strerror(errno)));
   return code == kDone ? kCannotBuild : code;

@@ -56,6 +56,7 @@ class BothPlaces final : public ILevelStore {
                     const std::vector<unsigned>& channels) const override {
     return sideCar_->RoomFor(levels, channels);
   }
+  void Remove(const std::vector<unsigned>& levels) override { sideCar_->Remove(levels); }
 
  private:
   ILevelStore* internal_;

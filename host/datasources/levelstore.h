@@ -57,6 +57,11 @@ class ILevelStore {
                             const std::vector<unsigned>& /*channels*/) const {
     return {};
   }
+
+  /// Removes the levels named, those of other programs too, as far as there are such; their masks
+  /// go with them, the image's pixels stay. None of them is being written.
+  /// \throws orin::Exception  they cannot be removed; the text names the file
+  virtual void Remove(const std::vector<unsigned>& levels) = 0;
 };
 
 /// One opened raster as its driver sees it.

@@ -139,6 +139,10 @@ class RecordedStore final : public ILevelStore {
                                          valid ? "true" : "false"));
     inner_.SetValid(level, channels, valid);
   }
+  void Remove(const std::vector<unsigned>& levels) override {
+    recorder_->Call("Remove", name_ + ".Remove(" + ListText(levels) + ")");
+    inner_.Remove(levels);
+  }
 
  private:
   RecorderPtr recorder_;

@@ -206,4 +206,10 @@ void MemoryLevels::SetValid(unsigned level, const std::vector<unsigned>& channel
   for (const unsigned channel : channels) stored.channels[channel - 1].valid = valid;
 }
 
+void MemoryLevels::Remove(const std::vector<unsigned>& levels) {
+  RequireWritable("MemoryLevels::Remove(const std::vector<unsigned int>&)");
+  const std::lock_guard lock(table_->mutex);
+  for (const unsigned level : levels) table_->levels.erase(level);
+}
+
 }  // namespace orin::drivers

@@ -53,6 +53,7 @@ class MemoryLevels final : public datasources::ILevelStore {
   /// True needs every pixel of the channels written since the level was created or since the first
   /// write to it after it was complete.
   void SetValid(unsigned level, const std::vector<unsigned>& channels, bool valid) override;
+  void Remove(const std::vector<unsigned>& levels) override;
 
  private:
   void RequireWritable(const char* function) const;

@@ -5,6 +5,7 @@
 #include <cstring>
 #include <limits>
 #include <string>
+#include <utility>
 
 #include <tiff.h>
 
@@ -82,20 +83,57 @@ NewEntry TextEntry(uint16_t tag, const std::string& text) {
           std::vector<uint8_t>(text.c_str(), text.c_str() + text.size() + 1)};
 }
 
-Appender::Appender(PositionedFile& file, bool isBig, ByteOrder byteOrder)
-    : file_(file), isBig_(isBig), byteOrder_(byteOrder), end_(file.Size()) {}
+Appender::Appender(PositionedFile& file, bool isBig, ByteOrder byteOrder, OwnSpace space)
+    : file_(file),
+      isBig_(isBig),
+      byteOrder_(byteOrder),
+      end_(file.Size()),
+      space_(std::move(space)) {}
+
+void Appender::RequireRoom(uint64_t position, uint64_t bytes) const {
+  if (isBig_ || (position <= kClassicLimit && bytes <= kClassicLimit - position)) return;
+  throw Exception(
+      FormatString(_("%s: would pass 4 GiB, the limit of a classic TIFF; use --external, "
+                     "or delete the side-car if this is one and build it again."),
+                   file_.Path().c_str()),
+      "host/drivers/tiff/appender", "Appender::Reserve(uint64_t)", 0);
+}
+
+void Appender::EndStretch() {
+  std::vector<Stretch>& stretches = space_.stretches;
+  if (stretches.empty() || stretches.back().end != 0) return;
+  stretches.back().end = end_;
+  space_.unclosed.push_back(stretches.back());
+}
+
+/// Bytes of another program end the stretch.
+void Appender::NoticeOthers() {
+  const uint64_t size = file_.Size();
+  if (size <= end_) return;
+  EndStretch();
+  end_ = kept_ = size;
+}
+
+void Appender::BeginStretch(uint64_t bytes) {
+  std::vector<Stretch>& stretches = space_.stretches;
+  if (!stretches.empty() && stretches.back().end == 0) return;
+  const Stretch stretch = StretchAt(end_, stretches.empty() ? 0 : stretches.back().marker);
+  RequireRoom(stretch.Body(), bytes);
+  stretches.push_back(stretch);
+  end_ = stretch.Body();
+  file_.Write(stretch.marker, ComposeMarker(stretch).data(), kMarkerBytes);
+}
 
 uint64_t Appender::Reserve(uint64_t bytes) {
   const std::lock_guard lock(mutex_);
-  const uint64_t size = file_.Size();
-  if (size > end_) end_ = kept_ = size;  // the bytes of another program
+  NoticeOthers();
+  if (const auto position = space_.free.Take(bytes)) {
+    taken_.Add({*position, *position + bytes});
+    return *position;
+  }
+  BeginStretch(bytes);
   const uint64_t position = EvenFrom(end_);
-  if (!isBig_ && (position > kClassicLimit || bytes > kClassicLimit - position))
-    throw Exception(
-        FormatString(_("%s: would pass 4 GiB, the limit of a classic TIFF; use --external, "
-                       "or delete the side-car if this is one and build it again."),
-                     file_.Path().c_str()),
-        "host/drivers/tiff/appender", "Appender::Reserve(uint64_t)", 0);
+  RequireRoom(position, bytes);
   end_ = position + bytes;
   return position;
 }
@@ -106,14 +144,54 @@ uint64_t Appender::Append(const std::vector<uint8_t>& bytes) {
   return position;
 }
 
-uint64_t Appender::AppendDirectory(std::vector<NewEntry> entries, uint64_t next) {
+uint64_t Appender::MarkerFor(uint64_t position) const {
+  const std::lock_guard lock(mutex_);
+  for (const Stretch& stretch : space_.stretches)
+    if (position >= stretch.Body() && (stretch.end == 0 || position < stretch.end))
+      return stretch.marker;
+  return 0;
+}
+
+std::optional<uint64_t> Appender::ReserveBelow(uint64_t bytes, uint64_t limit) {
+  const std::lock_guard lock(mutex_);
+  const auto position = space_.free.Take(bytes, limit);
+  if (position) taken_.Add({*position, *position + bytes});
+  return position;
+}
+
+std::optional<uint64_t> Appender::AppendBelow(const std::vector<uint8_t>& bytes, uint64_t limit) {
+  const auto position = ReserveBelow(bytes.size(), limit);
+  if (position) file_.Write(*position, bytes.data(), bytes.size());
+  return position;
+}
+
+std::optional<uint64_t> Appender::ReserveDirectoryBelow(const std::vector<NewEntry>& entries,
+                                                        uint64_t limit) {
+  return ReserveBelow(kPointerBytes + Layout(isBig_, byteOrder_).SizeOf(entries), limit);
+}
+
+uint64_t Appender::WriteDirectory(std::vector<NewEntry> entries, uint64_t next, uint64_t reserved) {
   std::sort(entries.begin(), entries.end(),
             [](const NewEntry& a, const NewEntry& b) { return a.tag < b.tag; });
-  const Layout layout(isBig_, byteOrder_);
-  const uint64_t position = Reserve(layout.SizeOf(entries));
-  const std::vector<uint8_t> directory = layout.Compose(entries, position, next);
-  file_.Write(position, directory.data(), directory.size());
+  const uint64_t position = reserved + kPointerBytes;
+  std::vector<uint8_t> bytes = ComposePointer(MarkerFor(position), position);
+  const auto directory = Layout(isBig_, byteOrder_).Compose(entries, position, next);
+  bytes.insert(bytes.end(), directory.begin(), directory.end());
+  file_.Write(reserved, bytes.data(), bytes.size());
   return position;
+}
+
+uint64_t Appender::AppendDirectory(std::vector<NewEntry> entries, uint64_t next) {
+  const uint64_t size = Layout(isBig_, byteOrder_).SizeOf(entries);
+  return WriteDirectory(std::move(entries), next, Reserve(kPointerBytes + size));
+}
+
+void Appender::Close() {
+  const std::lock_guard lock(mutex_);
+  EndStretch();
+  for (const Stretch& stretch : space_.unclosed)
+    file_.Write(stretch.marker, ComposeMarker(stretch).data(), kMarkerBytes);
+  space_.unclosed.clear();
 }
 
 void Appender::Link(uint64_t linkPosition, uint64_t target) {
@@ -131,13 +209,23 @@ uint64_t Appender::End() const {
 void Appender::Keep() {
   const std::lock_guard lock(mutex_);
   kept_ = end_;
+  taken_ = {};
 }
 
 void Appender::CutBackTo(uint64_t end) {
   const std::lock_guard lock(mutex_);
+  for (const auto& [start, stop] : taken_) space_.free.Add({start, stop});
+  taken_ = {};
   if (end < kept_ || file_.Size() > end_) return;
   file_.Truncate(end);
   end_ = end;
+  const auto isGone = [end](const Stretch& stretch) { return stretch.start >= end; };
+  std::erase_if(space_.stretches, isGone);
+  std::erase_if(space_.unclosed, isGone);
+  if (space_.stretches.empty() || space_.stretches.back().end <= end) return;
+  const Stretch cut = space_.stretches.back();  // goes on where it was cut
+  std::erase_if(space_.unclosed, [&](const Stretch& s) { return s.marker == cut.marker; });
+  space_.stretches.back().end = 0;
 }
 
 }  // namespace orin::drivers

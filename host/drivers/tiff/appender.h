@@ -1,11 +1,13 @@
-/// Adds pixels and directories at the end of a TIFF file, and links them in with one write.
+/// Adds pixels and directories to a TIFF file, and links them in with one write.
 // SPDX-License-Identifier: MIT
 #pragma once
 
 #include <cstdint>
 #include <mutex>
+#include <optional>
 #include <vector>
 
+#include "host/drivers/tiff/ownspace.h"
 #include "host/drivers/tiff/positionedfile.h"
 #include "host/drivers/tiff/structure.h"
 
@@ -24,31 +26,50 @@ NewEntry NumbersEntry(uint16_t tag, uint16_t type, const std::vector<uint64_t>& 
 /// An entry of text, with its closing zero.
 NewEntry TextEntry(uint16_t tag, const std::string& text);
 
-/// Nothing that the file holds is changed, but for `Link`: bytes that another program adds
-/// meanwhile are left alone too. Appending is safe from several threads.
+/// Nothing that the file holds is changed, but for `Link`: bytes go into space of this program that
+/// was free from the start, else to the file's end. What is added is never written over by the same
+/// appender, and bytes that another program adds meanwhile are left alone. Adding is safe from
+/// several threads.
 class Appender {
  public:
-  /// \param file  open for update; outlives the appender
-  Appender(PositionedFile& file, bool isBig, ByteOrder byteOrder);
+  /// \param file   open for update; outlives the appender
+  /// \param space  as it is now
+  Appender(PositionedFile& file, bool isBig, ByteOrder byteOrder, OwnSpace space = {});
 
-  /// Writes `bytes` at the file's end. \returns their position, which is even
+  /// Adds `bytes`. \returns their position, which is even
   /// \throws orin::Exception  a classic file would pass 4 GiB, or the bytes cannot be written
   uint64_t Append(const std::vector<uint8_t>& bytes);
-  /// Writes a directory at the file's end, its entries sorted by tag; nothing points at it yet.
+  /// The same in free space before `limit` only. \returns none: there is no room
+  std::optional<uint64_t> AppendBelow(const std::vector<uint8_t>& bytes, uint64_t limit);
+  /// Adds a directory, its entries sorted by tag; nothing points at it yet.
   /// \param next  the directory that follows it in the chain, or 0. \returns its position
   uint64_t AppendDirectory(std::vector<NewEntry> entries, uint64_t next);
+  /// Keeps free space before `limit` for a directory. \returns its place; none: there is no room
+  std::optional<uint64_t> ReserveDirectoryBelow(const std::vector<NewEntry>& entries,
+                                                uint64_t limit);
+  /// Writes the directory into the place kept for it. \returns its position
+  uint64_t WriteDirectory(std::vector<NewEntry> entries, uint64_t next, uint64_t reserved);
+  /// Records whose space it is that was added so far. Before the sync that precedes a `Link`.
+  void Close();
   /// Makes the link at `linkPosition` point at `target`, in one write.
   void Link(uint64_t linkPosition, uint64_t target);
 
-  /// Where the next bytes go.
+  /// Where the file ends.
   uint64_t End() const;
-  /// Something in the file refers to what was appended so far: it is never given up.
+  /// Something in the file refers to what was added so far: it is never given up.
   void Keep();
-  /// Gives up everything from `end` on, unless some of it is kept or another program's.
+  /// Gives up what was added and not kept: everything from `end` on, unless it is another
+  /// program's, and the space taken elsewhere.
   void CutBackTo(uint64_t end);
 
  private:
   uint64_t Reserve(uint64_t bytes);
+  std::optional<uint64_t> ReserveBelow(uint64_t bytes, uint64_t limit);
+  void NoticeOthers();
+  void EndStretch();
+  void BeginStretch(uint64_t bytes);
+  void RequireRoom(uint64_t position, uint64_t bytes) const;
+  uint64_t MarkerFor(uint64_t position) const;
 
   PositionedFile& file_;
   bool isBig_;
@@ -56,6 +77,8 @@ class Appender {
   mutable std::mutex mutex_;
   uint64_t end_;
   uint64_t kept_ = 0;  ///< the file is never cut before this
+  OwnSpace space_;     ///< `free`: what may be taken; the last stretch may be open
+  ExtentSet taken_;    ///< of the free space, since the last Keep
 };
 
 }  // namespace orin::drivers

@@ -2,7 +2,9 @@
 #include "host/drivers/tiff/levelfile.h"
 
 #include <algorithm>
+#include <array>
 #include <cstdio>
+#include <filesystem>
 #include <utility>
 #include <vector>
 
@@ -57,12 +59,39 @@ void LevelFile::OpenForChange() {
   } else {
     Make();
   }
-  appender_ = std::make_unique<Appender>(*file_, structure_.isBig, structure_.byteOrder);
+  StartAppending();
+}
+
+void LevelFile::StartAppending() {
+  appender_ = std::make_unique<Appender>(*file_, structure_.isBig, structure_.byteOrder,
+                                         isMade_ ? FindOwnSpace(*file_, structure_) : OwnSpace());
+}
+
+/// What bears the name already was begun by this program: a header without a directory, then a
+/// marker, as far as it was written.
+void LevelFile::RequireOursOrNew(const PositionedFile& partial) const {
+  const uint64_t size = partial.Size();
+  std::array<char, 2> order{};
+  if (size >= order.size()) partial.Read(0, order.data(), order.size());
+  const bool hasHeader = order[0] == order[1] && (order[0] == 'I' || order[0] == 'M');
+  const bool isBegun = size < 2 * kMarkerBytes || ReadMarker(partial, kMarkerBytes).has_value();
+  if (size > 0 && !(hasHeader && isBegun))
+    throw Exception(FormatString(_("%s: is no side-car that a build left behind. Delete it, or "
+                                   "move it away, and run again."),
+                                 partial.Path().c_str()),
+                    "host/drivers/tiff/levelfile", "LevelFile::Make()", 0);
 }
 
 void LevelFile::Make() {
   auto made = std::make_unique<PositionedFile>(path_ + kPartial, PositionedFile::Mode::kCreate);
   made->Lock();
+  RequireOursOrNew(*made);
+  if (std::error_code ignored; std::filesystem::exists(path_, ignored)) {
+    made->Remove();
+    throw Exception(
+        FormatString(_("%s: was made by another program just now. Run again."), path_.c_str()),
+        "host/drivers/tiff/levelfile", "LevelFile::Make()", 0);
+  }
   made->Truncate(0);  // what a build that was killed left behind
   file_ = std::move(made);
   const std::vector<uint8_t> header = EmptyHeader(structure_);
@@ -106,6 +135,7 @@ void LevelFile::DeclareEdited() {
 
 void LevelFile::Link(const Place& place, uint64_t directory) {
   OpenForChange();
+  appender_->Close();
   file_->Sync();
   if (isMade_) DeclareEdited();
   Keep();  // first: a link that fails half-way may point there already
@@ -131,6 +161,31 @@ void LevelFile::CutBackTo(uint64_t end) {
   std::remove(file_->Path().c_str());
   appender_.reset();
   file_.reset();
+}
+
+void LevelFile::Delete() {
+  OpenForChange();
+  file_->Remove();
+  appender_.reset();
+  file_.reset();
+  isMade_ = false;
+  structure_.directories.clear();
+}
+
+void LevelFile::DeleteUnfinished() {
+  std::error_code ignored;
+  if (isMade_ || file_ || !std::filesystem::exists(path_ + kPartial, ignored)) return;
+  PositionedFile partial(path_ + kPartial, PositionedFile::Mode::kUpdate);
+  partial.Lock();
+  RequireOursOrNew(partial);
+  partial.Remove();
+}
+
+void LevelFile::Relink(uint64_t position, uint64_t offset) {
+  OpenForChange();
+  DeclareEdited();
+  appender_->Link(position, offset);
+  file_->Sync();
 }
 
 }  // namespace orin::drivers

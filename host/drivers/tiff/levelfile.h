@@ -14,7 +14,8 @@
 namespace orin::drivers {
 
 /// Opened for writing by the first change only. A file that is made bears the name `PATH.partial`
-/// until its first directory is linked.
+/// until its first directory is linked. What a build that was killed left of such a file is written
+/// over.
 class LevelFile {
  public:
   /// A file that is there. \throws orin::Exception  it cannot be read as TIFF
@@ -27,6 +28,8 @@ class LevelFile {
   bool MayChange() const { return mayChange_; }
   /// False while there is nothing under the final name.
   bool Exists() const { return isMade_; }
+  /// Something was written to a file that is there.
+  bool IsChanged() const { return appender_ && isMade_; }
   /// \pre Exists() or something was appended
   const PositionedFile& File() const { return *file_; }
   const TiffStructure& Structure() const { return structure_; }
@@ -51,15 +54,32 @@ class LevelFile {
 
   /// Something in the file refers to what was appended so far.
   void Keep();
-  /// Gives up everything from `end` on unless some of it is kept; a file that is not yet made goes
-  /// altogether.
+  /// Gives up what was appended and not kept, everything from `end` on; a file that is not yet made
+  /// goes altogether.
   void CutBackTo(uint64_t end);
+
+  /// Moves levels of this program into its free space and shortens the file by what is free at its
+  /// end; not while others have the file open, which may still read levels that were replaced.
+  void GiveBackSpace();
+  /// The same whoever has it open, and by `given` as well, which nothing refers to any more.
+  void GiveBackSpace(const ExtentSet& given);
+  /// Takes the file away; it counts as not yet made afterwards.
+  void Delete();
+  /// Takes away what a build that was killed left of a file that is not yet made.
+  void DeleteUnfinished();
+  /// Makes the link at `position` point at the directory at `offset`, or at none for 0, durably.
+  void Relink(uint64_t position, uint64_t offset);
 
  private:
   LevelFile() = default;
   void OpenForChange();
   void Make();
+  void StartAppending();
   void DeclareEdited();
+  bool MoveDown();
+  bool MoveDown(size_t index, uint64_t end);
+  void Shorten(const OwnSpace& space, uint64_t end);
+  void RequireOursOrNew(const PositionedFile& partial) const;
 
   std::string path_;
   bool mayChange_ = false;

@@ -1,5 +1,4 @@
-/// How a complete level gets into the file: its directory added and linked, or its tile table
-/// patched.
+/// How a complete level gets into the file: by a directory that is added, then linked.
 // SPDX-License-Identifier: MIT
 #include <algorithm>
 
@@ -53,46 +52,6 @@ LevelMetadata TiffLevelStore::MetadataFor(unsigned level, const Pending& pending
       metadata.validity[i] = kAbsent;
   metadata.image = image;
   return metadata;
-}
-
-/// What is in the directory already stays there: size of numbers, texts, and all but validity. No
-/// channel that stays valid has its tiles in the part that changes: that takes several writes.
-bool TiffLevelStore::CanPatch(const StoredLevel& stored, const LevelMetadata& metadata,
-                              const LevelBuild& build) const {
-  if (build.mask || stored.mask) return false;
-  const LevelMetadata& old = stored.metadata;
-  if (old.method != metadata.method || old.image != metadata.image ||
-      old.sourceLevel != metadata.sourceLevel || old.program != metadata.program)
-    return false;
-  const bool sharesTiles = !build.Coding().format.planar;
-  if (sharesTiles && metadata.validity.find(kValid) != std::string::npos) return false;
-  const TiffStructure& structure = file_->Structure();
-  return std::all_of(std::begin(kTables), std::end(kTables), [&](const TileTable& table) {
-    const TiffEntry* entry = structure.directories[stored.index].Find(table.tag);
-    return entry && entry->type == (structure.isBig ? TIFF_LONG8 : TIFF_LONG) &&
-           entry->count == build.TilesPerPlane() * build.Coding().Planes();
-  });
-}
-
-void TiffLevelStore::Patch(const StoredLevel& stored, const LevelMetadata& metadata,
-                           const LevelBuild& build, const std::vector<uint32_t>& planes) {
-  const TiffStructure& structure = file_->Structure();
-  const unsigned width = structure.LinkBytes();
-  const uint64_t tiles = build.TilesPerPlane();
-  file_->Overwrite(stored.validityPosition, metadata.validity);
-  file_->Sync();
-  file_->Keep();
-  for (const TileTable& table : kTables) {
-    const TiffEntry* entry = structure.directories[stored.index].Find(table.tag);
-    for (const uint32_t plane : planes) {
-      std::string bytes(tiles * width, '\0');
-      for (uint64_t i = 0; i < tiles; ++i)
-        structure.byteOrder.Put(build.PlacesOf(plane)[i].*table.field, width,
-                                reinterpret_cast<uint8_t*>(&bytes[i * width]));
-      file_->Overwrite(entry->position + plane * tiles * width, bytes);
-    }
-  }
-  file_->Sync();
 }
 
 void TiffLevelStore::AddDirectory(const Pending& pending, const LevelMetadata& metadata,
@@ -155,12 +114,9 @@ void TiffLevelStore::Store(unsigned level, Pending& pending, const std::vector<u
   const std::shared_ptr<LevelBuild> build = pending.build;
   file_->Sync();
   CatchUp();
-  const StoredLevel* ours = FindOurs(level);
-  const StoredLevel* before = pending.isRecoded ? nullptr : ours;
+  const StoredLevel* before = pending.isRecoded ? nullptr : FindOurs(level);
   const datasources::ImageRecord kept = before ? before->metadata.image : datasources::ImageRecord();
-  const LevelMetadata metadata = MetadataFor(level, pending, before, image.value_or(kept));
-  if (before && CanPatch(*ours, metadata, *build)) Patch(*ours, metadata, *build, planes);
-  else AddDirectory(pending, metadata, planes);
+  AddDirectory(pending, MetadataFor(level, pending, before, image.value_or(kept)), planes);
   pending.isRecoded = false;
   Reload();
   for (const uint32_t plane : planes) build->Release(plane);

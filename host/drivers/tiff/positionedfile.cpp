@@ -2,6 +2,7 @@
 #include "host/drivers/tiff/positionedfile.h"
 
 #include <cerrno>
+#include <csignal>
 #include <cstdio>
 #include <cstring>
 #include <filesystem>
@@ -12,6 +13,7 @@
 #include <sys/stat.h>
 #include <unistd.h>
 
+#include "host/drivers/tiff/lockholder.h"
 #include "host/services/exception.h"
 #include "host/services/text.h"
 
@@ -41,10 +43,37 @@ int FlagsOf(PositionedFile::Mode mode) {
   return O_RDWR | O_CREAT;
 }
 
+/// The call's answer, once no signal interrupts it.
+int Repeated(const auto& call) {
+  int answer = call();
+  while (answer != 0 && errno == EINTR) answer = call();
+  return answer;
+}
+
+/// A descriptor, or -1.
+int Open(const std::string& path, int flags) {
+  int descriptor = open(path.c_str(), flags | O_CLOEXEC, 0666);
+  while (descriptor < 0 && errno == EINTR) descriptor = open(path.c_str(), flags | O_CLOEXEC, 0666);
+  return descriptor;
+}
+
+bool HasNoLocks(int error) {
+  return error == ENOLCK || error == ENOSYS || error == EOPNOTSUPP || error == EINVAL;
+}
+
+/// Makes the names in the folder durable; not every file system lets them be.
+void SyncFolderOf(const std::string& path) {
+  const std::string folder = std::filesystem::path(path).parent_path().string();
+  const int directory = Open(folder.empty() ? "." : folder, O_RDONLY | O_DIRECTORY);
+  if (directory < 0) return;
+  fsync(directory);
+  close(directory);
+}
+
 }  // namespace
 
 PositionedFile::PositionedFile(std::string path, Mode mode)
-    : path_(std::move(path)), descriptor_(open(path_.c_str(), FlagsOf(mode) | O_CLOEXEC, 0666)) {
+    : path_(std::move(path)), descriptor_(Open(path_, FlagsOf(mode))) {
   if (descriptor_ < 0)
     Fail(mode == Mode::kRead ? _("%s: cannot be opened: %s.")
                              : _("%s: cannot be opened for writing: %s."),
@@ -54,12 +83,30 @@ PositionedFile::PositionedFile(std::string path, Mode mode)
 PositionedFile::~PositionedFile() { close(descriptor_); }
 
 void PositionedFile::Lock() {
-  // A file system without locks is none to refuse work on.
-  if (flock(descriptor_, LOCK_EX | LOCK_NB) == 0 || errno != EWOULDBLOCK) return;
-  throw Exception(FormatString(_("%s: another build is writing levels into it. Wait until it is "
-                                 "finished, then run again."),
-                               path_.c_str()),
-                  "host/drivers/tiff/positionedfile", "PositionedFile::Lock()", 0);
+  constexpr char kFunction[] = "PositionedFile::Lock()";
+  const auto lock = [this] { return flock(descriptor_, LOCK_EX | LOCK_NB); };
+  struct stat own {};
+  struct stat named {};
+  if (Repeated(lock) != 0 && !HasNoLocks(errno)) {  // no locks are no reason to refuse work
+    if (errno != EWOULDBLOCK)
+      Fail(_("%s: cannot be locked: %s."), path_, std::strerror(errno), kFunction);
+    const std::string holder = fstat(descriptor_, &own) == 0 ? LockHolderOf(own) : std::string();
+    throw Exception(
+        holder.empty()
+            ? FormatString(_("%s: another build is writing levels into it. Wait until it is "
+                             "finished, then run again."),
+                           path_.c_str())
+            : FormatString(_("%s: another build is writing levels into it: %s. Wait until it is "
+                             "finished, then run again."),
+                           path_.c_str(), holder.c_str()),
+        "host/drivers/tiff/positionedfile", kFunction, 0);
+  }
+  const bool isNamed = fstat(descriptor_, &own) == 0 && stat(path_.c_str(), &named) == 0 &&
+                       own.st_dev == named.st_dev && own.st_ino == named.st_ino;
+  if (!isNamed)
+    throw Exception(
+        FormatString(_("%s: was replaced by another program just now. Run again."), path_.c_str()),
+        "host/drivers/tiff/positionedfile", kFunction, 0);
 }
 
 uint64_t PositionedFile::Size() const {
@@ -100,12 +147,12 @@ void PositionedFile::Write(uint64_t position, const void* bytes, size_t count) {
 }
 
 void PositionedFile::Sync() {
-  if (fsync(descriptor_) != 0)
+  if (Repeated([this] { return fsync(descriptor_); }) != 0)
     Fail(_(kCannotWrite), path_, std::strerror(errno), "PositionedFile::Sync()");
 }
 
 void PositionedFile::Truncate(uint64_t size) {
-  if (ftruncate(descriptor_, static_cast<off_t>(size)) != 0)
+  if (Repeated([&] { return ftruncate(descriptor_, static_cast<off_t>(size)); }) != 0)
     Fail(_("%s: cannot be shortened: %s."), path_, std::strerror(errno),
          "PositionedFile::Truncate(uint64_t)");
 }
@@ -127,17 +174,34 @@ int64_t PositionedFile::SetModified(int64_t nanoseconds) {
 }
 
 void PositionedFile::Rename(const std::string& path) {
-  if (std::rename(path_.c_str(), path.c_str()) != 0)
+  const unsigned kNeverReplace = RENAME_NOREPLACE;
+  int failed = renameat2(AT_FDCWD, path_.c_str(), AT_FDCWD, path.c_str(), kNeverReplace);
+  if (failed != 0 && (errno == EINVAL || errno == ENOSYS))  // not every file system knows how
+    failed = std::rename(path_.c_str(), path.c_str());
+  if (failed != 0)
     Fail(_("%s: cannot be renamed: %s."), path_, std::strerror(errno),
          "PositionedFile::Rename(const std::string&)");
   path_ = path;
-  const std::string folder = std::filesystem::path(path).parent_path().string();
-  const int directory =
-      open(folder.empty() ? "." : folder.c_str(), O_RDONLY | O_DIRECTORY | O_CLOEXEC);
-  if (directory < 0)
-    return;  // deliberate: the name is given; not every file system lets it be synced
-  fsync(directory);
-  close(directory);
+  SyncFolderOf(path);
+}
+
+void PositionedFile::Remove() {
+  if (unlink(path_.c_str()) != 0)
+    Fail(_("%s: cannot be deleted: %s."), path_, std::strerror(errno), "PositionedFile::Remove()");
+  SyncFolderOf(path_);
+}
+
+bool PositionedFile::DoAlone(const std::function<void()>& action) {
+  // Who opens the file meanwhile waits, and the system announces it by a signal: by one that is
+  // ignored where nobody asked for it, not by the usual one, which ends the process.
+  if (fcntl(descriptor_, F_SETSIG, SIGURG) != 0 || fcntl(descriptor_, F_SETLEASE, F_WRLCK) != 0)
+    return false;
+  const struct Release {
+    int descriptor;
+    ~Release() { fcntl(descriptor, F_SETLEASE, F_UNLCK); }
+  } release{descriptor_};
+  action();
+  return true;
 }
 
 }  // namespace orin::drivers

@@ -5,6 +5,7 @@
 
 #include <cstddef>
 #include <cstdint>
+#include <functional>
 #include <string>
 
 namespace orin::drivers {
@@ -38,10 +39,18 @@ class PositionedFile {
   /// \returns the time that it has then, which is another one where it may not be set
   int64_t SetModified(int64_t nanoseconds);
   /// Keeps other programs that ask for it from changing the file, until this object goes.
-  /// \throws orin::Exception  another one has it
+  /// \throws orin::Exception  another one has it (the text says who), or another file has taken over
+  ///                          the name since this one was opened
   void Lock();
-  /// Gives the file its new name, replacing what has it, and makes the name durable.
+  /// Gives the file a new name, which no other file has, and makes the name durable.
+  /// \throws orin::Exception  it cannot be renamed, or there is such a file
   void Rename(const std::string& path);
+  /// Removes the file's name, durably.
+  void Remove();
+
+  /// Does `action` while nobody else has the file open, and nobody can open it.
+  /// \returns false: somebody has, or the system does not tell; nothing was done
+  bool DoAlone(const std::function<void()>& action);
 
  private:
   std::string path_;

@@ -33,6 +33,18 @@ TiffLevelStore::TiffLevelStore(std::unique_ptr<LevelFile> file, Settings setting
   Reload();
 }
 
+TiffLevelStore::~TiffLevelStore() {
+  try {
+    if (!file_->IsChanged()) return;
+    freshness_.BeginChange(levels_);
+    file_->GiveBackSpace();
+    Reload();
+    Settle();
+  } catch (const std::exception&) {
+    // deliberate: nothing is lost but space, which the next change finds again
+  }
+}
+
 void TiffLevelStore::Reload() {
   levels_.clear();
   if (!file_->Exists()) return;

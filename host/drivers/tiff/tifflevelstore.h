@@ -46,6 +46,8 @@ class TiffLevelStore final : public datasources::ILevelStore {
   };
   /// \throws orin::Exception  the file cannot be read
   TiffLevelStore(std::unique_ptr<LevelFile> file, Settings settings);
+  /// Gives back the space of levels that were replaced, where it is at the file's end.
+  ~TiffLevelStore() override;
 
   std::vector<datasources::LevelDescription> List() const override;
   void Create(unsigned level, const std::vector<unsigned>& channels,
@@ -57,6 +59,7 @@ class TiffLevelStore final : public datasources::ILevelStore {
   void KeepAnswers() override;
   datasources::LevelRoom RoomFor(const std::vector<unsigned>& levels,
                                  const std::vector<unsigned>& channels) const override;
+  void Remove(const std::vector<unsigned>& levels) override;
 
   // For the level writers.
 
@@ -122,13 +125,12 @@ class TiffLevelStore final : public datasources::ILevelStore {
                      const std::vector<unsigned>& channels) const;
   void Store(unsigned level, Pending& pending, const std::vector<uint32_t>& planes,
              const std::optional<datasources::ImageRecord>& image);
-  bool CanPatch(const StoredLevel& stored, const LevelMetadata& metadata,
-                const LevelBuild& build) const;
-  void Patch(const StoredLevel& stored, const LevelMetadata& metadata, const LevelBuild& build,
-             const std::vector<uint32_t>& planes);
   void AddDirectory(const Pending& pending, const LevelMetadata& metadata,
                     const std::vector<uint32_t>& planes);
   void TidyMasks(std::optional<uint64_t> strayMask);
+  std::vector<size_t> DirectoriesOf(const std::vector<unsigned>& levels) const;
+  void RemoveStored(const std::vector<unsigned>& levels);
+  void Unlink(const std::vector<size_t>& indices);
   void GiveUp(unsigned level, LevelBuild& build);
   [[noreturn]] void Fail(const char* format, unsigned level, const char* operation) const;
 

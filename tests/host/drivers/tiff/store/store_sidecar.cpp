@@ -2,6 +2,8 @@
 // SPDX-License-Identifier: MIT
 #include <fcntl.h>
 #include <sys/stat.h>
+#include <sys/wait.h>
+#include <unistd.h>
 
 #include <filesystem>
 
@@ -101,8 +103,26 @@ TEST_F(SideCar, GetsItsNameWithItsFirstChannelAndValidityChannelByChannel) {
   EXPECT_EQ(1u, level.sourceLevel);
 }
 
+/// A build of level 2 that ends without any clean-up before its block `stop`.
+void KilledBuild(const std::string& file, unsigned stop) {
+  const pid_t child = fork();
+  if (child == 0) {
+    const auto dataset = OpenGeneric(file);
+    Build(*dataset, kImage,
+          {.level = 2, .edge = 40, .channels = {1}, .goesOn = [=](unsigned block) {
+             if (block == stop) _exit(0);
+             return true;
+           }});
+    _exit(1);
+  }
+  int status = -1;
+  ASSERT_EQ(child, waitpid(child, &status, 0));
+  ASSERT_EQ(0, status);
+}
+
 TEST_F(SideCar, LeavesNothingBehindWhenItsFirstLevelIsGivenUp) {
-  std::ofstream(partial_) << "left by a killed run";
+  KilledBuild(file_, 4);
+  ASSERT_TRUE(Exists(partial_));
   {
     const auto dataset = OpenGeneric(file_);
     Build(*dataset, kImage,
@@ -117,11 +137,57 @@ TEST_F(SideCar, LeavesNothingBehindWhenItsFirstLevelIsGivenUp) {
 }
 
 TEST_F(SideCar, StartsAnewOverTheRestsOfAKilledRun) {
-  std::ofstream(partial_) << std::string(100000, 'x');
+  KilledBuild(file_, 5);
+  std::ofstream(partial_, std::ios::app) << std::string(100000, 'x');
   BuildBeside(file_, kImage, 2);
   EXPECT_EQ("", WrongTile(sideCar_, 0, LevelLayout(InPlanes(kImage), 2)));
   EXPECT_GT(100000u, std::filesystem::file_size(sideCar_));
   EXPECT_FALSE(Exists(partial_));
+}
+
+TEST_F(SideCar, IsNotBegunOverAFileThatIsNoRestOfAKilledRun) {
+  for (const std::string text : {"a letter to a friend", "II* but not of ours"}) {
+    const std::string written = text + std::string(200, '.');
+    std::ofstream(partial_) << written;
+    EXPECT_THROW(BuildBeside(file_, kImage, 2), Exception);
+    const auto bytes = BytesOf(partial_);
+    EXPECT_EQ(written, std::string(bytes.begin(), bytes.end()));
+    EXPECT_FALSE(Exists(sideCar_));
+  }
+}
+
+TEST_F(SideCar, ThatAnotherBuildMadeMeanwhileIsNotReplaced) {
+  const auto late = OpenGeneric(file_);
+  BuildBeside(file_, kImage, 4);
+  const auto before = BytesOf(sideCar_);
+  EXPECT_THROW(Build(*late, kImage, {.level = 2, .channels = {1}}), Exception);
+  EXPECT_EQ(before, BytesOf(sideCar_));
+  EXPECT_FALSE(Exists(partial_));
+}
+
+TEST_F(SideCar, GoesWithItsLastLevelAndWhatAKilledBuildLeft) {
+  BuildBeside(file_, kImage, 2);
+  BuildBeside(file_, kImage, 4);
+  OpenGeneric(file_)->GetSource()->Levels()->Remove({2});
+  EXPECT_EQ("50x40", SizesOf(sideCar_));
+  OpenGeneric(file_)->GetSource()->Levels()->Remove({4});
+  EXPECT_FALSE(Exists(sideCar_));
+  KilledBuild(file_, 4);
+  OpenGeneric(file_)->GetSource()->Levels()->Remove({});
+  EXPECT_FALSE(Exists(partial_));
+}
+
+TEST_F(SideCar, NamesTheLevelInsideTheFileThatItsLevelWasReadFrom) {
+  Build(file_, kImage, {.level = 2});
+  const auto dataset = OpenGeneric(file_);
+  datasources::BasicOverviewWriterAccessor accessor(dataset.get(), {1, 2, 3});
+  accessor.CreateLevel(4);
+  const std::unique_ptr<IRasterWriter> target(accessor.CreateRasterWriter(4));
+  const std::unique_ptr<IRasterWriter> source(accessor.CreateRasterWriter(2));
+  WriteBlocks(*target, LevelLayout(kImage, 4), 50);
+  accessor.SetLevelValid(4, true);
+  EXPECT_EQ(2u, LevelsOf(*dataset).at(1).sourceLevel);
+  EXPECT_EQ(datasources::LevelPlace::kSideCar, LevelsOf(*dataset).at(1).place);
 }
 
 TEST_F(SideCar, CanStartAgainAfterBeingGivenUpInTheSameRun) {

@@ -1,0 +1,134 @@
+// SPDX-License-Identifier: MIT
+#include "apps/orin-overviews/clean.h"
+
+#include <algorithm>
+#include <memory>
+
+#include "apps/orin-overviews/buildreport.h"
+#include "apps/orin-overviews/numberlist.h"
+#include "host/datasources/datasetmanager.h"
+#include "host/datasources/levelstore.h"
+#include "host/services/exception.h"
+#include "host/services/text.h"
+
+namespace orin::app {
+namespace {
+
+using datasources::DatasetManager;
+using datasources::IDataset;
+using datasources::ILevelStore;
+using datasources::IRasterDataset;
+using datasources::LevelDescription;
+using datasources::LevelPlace;
+
+/// The levels of an opened file in one place; null when its format holds none there.
+ILevelStore* LevelsOf(IDataset& dataset) {
+  auto* raster = dynamic_cast<IRasterDataset*>(&dataset);
+  return raster ? raster->GetSource()->Levels() : nullptr;
+}
+
+/// The levels to remove that are there.
+std::vector<LevelDescription> Chosen(const ILevelStore* store, LevelPlace place,
+                                     const CleanOptions& options) {
+  std::vector<LevelDescription> chosen = store ? store->List() : std::vector<LevelDescription>();
+  std::erase_if(chosen, [&](const LevelDescription& level) {
+    const auto& asked = options.levels;
+    return level.place != place ||
+           (!asked.empty() && std::find(asked.begin(), asked.end(), level.level) == asked.end());
+  });
+  return chosen;
+}
+
+std::vector<unsigned> FactorsOf(const std::vector<LevelDescription>& levels) {
+  std::vector<unsigned> factors;
+  for (const LevelDescription& level : levels) factors.push_back(level.level);
+  return factors;
+}
+
+/// \returns what was removed
+std::vector<LevelDescription> CleanInside(const CleanOptions& options, const std::string& file) {
+  DatasetManager& manager = *DatasetManager::GetInstance();
+  std::unique_ptr<IDataset> dataset(manager.Open(file, datasources::kReadOnly));
+  const auto chosen = Chosen(LevelsOf(*dataset), LevelPlace::kInternal, options);
+  if (chosen.empty()) return chosen;
+  dataset.reset();
+  dataset.reset(manager.Open(file, datasources::kUpdate));
+  LevelsOf(*dataset)->Remove(FactorsOf(chosen));
+  return chosen;
+}
+
+/// What a build that was killed left of a side-car goes as well, unless single levels are named.
+std::vector<LevelDescription> CleanBeside(const CleanOptions& options, const std::string& file) {
+  const std::unique_ptr<IDataset> dataset(
+      DatasetManager::GetInstance()->OpenFormat("ZMBALL", file, datasources::kReadOnly));
+  ILevelStore* store = LevelsOf(*dataset);
+  const auto chosen = Chosen(store, LevelPlace::kSideCar, options);
+  if (store && (!chosen.empty() || options.levels.empty())) store->Remove(FactorsOf(chosen));
+  return chosen;
+}
+
+std::string RemovedText(const std::vector<LevelDescription>& removed) {
+  const std::string levels = JoinNumbers(FactorsOf(removed));
+  return removed.front().place == LevelPlace::kInternal
+             ? FormatString(_("levels removed: %s (inside the file)"), levels.c_str())
+             : FormatString(_("levels removed: %s (in %s)"), levels.c_str(),
+                            removed.front().file.c_str());
+}
+
+/// One place of one file, every failure reported.
+ExitCode TryPlace(const auto& clean, const CleanOptions& options, const std::string& file,
+                  bool& hasRemoved, Console& console) {
+  try {
+    const std::vector<LevelDescription> removed = clean(options, file);
+    if (removed.empty()) return kDone;
+    hasRemoved = true;
+    console.Result(file + ": " + RemovedText(removed));
+    return kDone;
+  } catch (const Exception& error) {
+    console.Error(AfterFileName(file, error.GetMessage()));
+  } catch (const std::exception& error) {
+    console.Error(
+        AfterFileName(file, FormatString(_("The levels cannot be removed: %s."), error.what())));
+  }
+  return kCannotBuild;
+}
+
+/// The file opens as a raster; otherwise says why not.
+bool CanOpen(const std::string& file, Console& console) {
+  try {
+    const std::unique_ptr<IDataset> dataset(
+        DatasetManager::GetInstance()->Open(file, datasources::kReadOnly));
+    return true;
+  } catch (const Exception& error) {
+    console.Error(AfterFileName(file, error.GetMessage()));
+  }
+  return false;
+}
+
+ExitCode CleanFile(const CleanOptions& options, const std::string& file, Console& console) {
+  if (!CanOpen(file, console)) return kCannotOpen;
+  ExitCode code = kDone;
+  bool hasRemoved = false;
+  if (options.placement != Placement::kExternal)
+    code = TryPlace(CleanInside, options, file, hasRemoved, console);
+  if (options.placement != Placement::kInternal)
+    code = std::max(code, TryPlace(CleanBeside, options, file, hasRemoved, console));
+  if (code == kDone && !hasRemoved)
+    console.Result(file + ": " +
+                   (options.levels.empty() ? _("nothing to do: there are no levels")
+                                           : _("nothing to do: there are no such levels")));
+  return code;
+}
+
+}  // namespace
+
+ExitCode RunClean(const CleanOptions& options, Console& console) {
+  ExitCode result = kDone;
+  for (const std::string& file : options.files) {
+    const ExitCode code = CleanFile(options, file, console);
+    if (code != kDone) result = options.files.size() == 1 ? code : kSomeFailed;
+  }
+  return result;
+}
+
+}  // namespace orin::app

@@ -1,0 +1,213 @@
+/// Where a store puts what it writes, and what becomes of the space of replaced levels.
+// SPDX-License-Identifier: MIT
+#include <filesystem>
+
+#include <sys/wait.h>
+#include <unistd.h>
+
+#include "host/drivers/tiff/ownspace.h"
+#include "host/services/exception.h"
+#include "tests/host/drivers/tiff/store/storesupport.h"
+
+namespace orin::tests {
+namespace {
+
+using drivers::ExtentSet;
+using drivers::PositionedFile;
+
+const Layout kImage{
+    .width = 200, .height = 160, .samples = 3, .tile = 32, .photometric = PHOTOMETRIC_RGB};
+
+/// "2-5 9-10"
+std::string TextOf(const ExtentSet& extents) {
+  std::string text;
+  for (const auto& [start, end] : extents)
+    text += (text.empty() ? "" : " ") + std::to_string(start) + "-" + std::to_string(end);
+  return text;
+}
+
+TEST(Extents, ThatTouchOrOverlapAreOne) {
+  ExtentSet extents;
+  extents.Add({10, 20});
+  extents.Add({30, 40});
+  extents.Add({20, 22});
+  extents.Add({5, 5});
+  EXPECT_EQ("10-22 30-40", TextOf(extents));
+  extents.Add({8, 35});
+  EXPECT_EQ("8-40", TextOf(extents));
+  EXPECT_EQ(32u, extents.Size());
+  EXPECT_EQ(40u, extents.End());
+}
+
+TEST(Extents, AreCutWhereSomethingIsRemoved) {
+  ExtentSet extents;
+  extents.Add({10, 20});
+  extents.Add({30, 40});
+  extents.Remove({15, 17});
+  extents.Remove({35, 50});
+  EXPECT_EQ("10-15 17-20 30-35", TextOf(extents));
+  extents.Remove({0, 32});
+  EXPECT_EQ("32-35", TextOf(extents));
+  EXPECT_TRUE(extents.Holds({32, 35}));
+  EXPECT_FALSE(extents.Holds({32, 36}));
+}
+
+TEST(Extents, AreTakenInOrderAtEvenPositionsAndBeforeTheLimit) {
+  ExtentSet extents;
+  extents.Add({11, 20});
+  extents.Add({30, 40});
+  EXPECT_EQ(12u, extents.Take(5));
+  EXPECT_EQ(30u, extents.Take(4));
+  EXPECT_EQ(34u, extents.Take(2));
+  EXPECT_EQ(18u, extents.Take(2, 30)) << "begins again before the limit";
+  EXPECT_EQ(std::nullopt, extents.Take(5));
+  EXPECT_EQ(36u, extents.Take(4));
+  EXPECT_EQ("11-12 17-18", TextOf(extents));
+}
+
+class Space : public TiffStore {
+ protected:
+  Space() : file_(folder_.File("image.tif")) { WriteImage(file_, kImage); }
+
+  void BuildAll(const std::string& method = "NEAREST", unsigned edge = 100) const {
+    for (const unsigned level : {2u, 4u, 8u})
+      Build(file_, kImage, {.level = level, .edge = edge, .method = method});
+  }
+  std::string WrongLevels() const {
+    std::string wrong;
+    for (uint16_t i = 0; i < 3; ++i)
+      wrong += WrongTile(file_, uint16_t(i + 1), LevelLayout(kImage, 2u << i));
+    return wrong;
+  }
+  uint64_t Size() const { return std::filesystem::file_size(file_); }
+  drivers::OwnSpace Own() const {
+    const PositionedFile file(file_, PositionedFile::Mode::kRead);
+    return drivers::FindOwnSpace(file, drivers::ParseStructure(file));
+  }
+  void Append(const std::string& text) const { std::ofstream(file_, std::ios::app) << text; }
+
+  std::string file_;
+};
+
+TEST_F(Space, OfTenRebuildsIsThatOfOne) {
+  BuildAll();
+  const uint64_t first = Size();
+  for (int i = 0; i < 10; ++i) {
+    BuildAll(i % 2 ? "NEAREST" : "AVERAGE", 31);
+    EXPECT_LE(Size(), first + first / 20) << "rebuild " << i;
+    EXPECT_EQ("", WrongLevels());
+  }
+}
+
+TEST_F(Space, OfAReplacedLevelStaysAsItIsWhileAnotherProgramHasTheFileOpen) {
+  BuildAll();
+  const auto before = BytesOf(file_);
+  const auto link = LinkOfFirst(file_);
+  std::ifstream reader(file_);
+  Build(file_, kImage, {.level = 2});
+  const auto after = BytesOf(file_);
+  ASSERT_GT(after.size(), before.size());
+  unsigned changed = 0;  // but for the link and the old level's validity: three characters
+  for (size_t i = 0; i < before.size(); ++i)
+    changed += before[i] != after[i] && !(i >= link && i < link + 4);
+  EXPECT_EQ(3u, changed);
+  reader.close();
+  Build(file_, kImage, {.level = 2});
+  EXPECT_LE(Size(), before.size() + 64);
+  EXPECT_EQ("", WrongLevels());
+}
+
+TEST_F(Space, ThatAKilledBuildTookIsTakenAgain) {
+  uint64_t longest = 0;
+  for (int i = 0; i < 5; ++i) {
+    const pid_t child = fork();
+    if (child == 0) {
+      Build(file_, kImage, {.level = 2, .edge = 40, .goesOn = [](unsigned block) {
+                              if (block == 4) _exit(0);
+                              return true;
+                            }});
+      _exit(1);
+    }
+    int status = -1;
+    ASSERT_EQ(child, waitpid(child, &status, 0));
+    ASSERT_EQ(0, status);
+    if (i == 0) longest = Size();
+    EXPECT_EQ(longest, Size());
+  }
+  BuildAll();
+  EXPECT_TRUE(Own().free.Size() < 256) << TextOf(Own().free);
+  EXPECT_EQ("", WrongLevels());
+}
+
+TEST_F(Space, OfOtherProgramsIsNeverTaken) {
+  const std::string foreign(5000, 'x');
+  Append(foreign);
+  BuildAll();
+  Append(foreign);
+  for (int i = 0; i < 3; ++i) BuildAll("AVERAGE");
+  Append(foreign);
+  BuildAll();
+  const auto bytes = BytesOf(file_);
+  EXPECT_EQ(3 * std::count(foreign.begin(), foreign.end(), 'x'), [&] {
+    ptrdiff_t count = 0;
+    const std::string all(bytes.begin(), bytes.end());
+    for (size_t at = all.find(foreign); at != all.npos; at = all.find(foreign, at + foreign.size()))
+      count += ptrdiff_t(foreign.size());
+    return count;
+  }());
+  EXPECT_EQ("", WrongLevels());
+}
+
+TEST_F(Space, IsNotTakenWhereTheChainIsBrokenAndSomethingMayBeHidden) {
+  BuildAll();
+  BuildAll("AVERAGE");
+  EXPECT_FALSE(Own().stretches.empty());
+  const auto last = DirectoriesOf(file_).back().offset;
+  const auto bytes = BytesOf(file_);
+  const size_t link = last + 2 + 12 * size_t(uint8_t(bytes[last]));
+  std::fstream stream(file_, std::ios::in | std::ios::out | std::ios::binary);
+  stream.seekp(std::streamoff(link));
+  stream.write("\xF0\xFF\xFF\x7F", 4);
+  stream.close();
+  EXPECT_TRUE(Own().stretches.empty());
+  EXPECT_TRUE(Own().free.IsEmpty());
+}
+
+TEST_F(Space, OfADamagedMarkerIsLostAndNothingElse) {
+  BuildAll();
+  const auto own = Own();
+  ASSERT_EQ(3u, own.stretches.size());
+  std::fstream stream(file_, std::ios::in | std::ios::out | std::ios::binary);
+  stream.seekp(std::streamoff(own.stretches[1].marker + 20));
+  stream.put('!');
+  stream.close();
+  EXPECT_EQ(2u, Own().stretches.size());
+  BuildAll("AVERAGE");
+  EXPECT_EQ("", WrongLevels());
+}
+
+TEST_F(Space, OfRemovedLevelsIsGivenBackAndTheImageIsWhatItWas) {
+  const auto before = BytesOf(file_);
+  BuildAll();
+  Open(file_, datasources::kUpdate)->GetSource()->Levels()->Remove({4});
+  EXPECT_EQ("200x160 100x80 25x20", SizesOf(file_));
+  Open(file_, datasources::kUpdate)->GetSource()->Levels()->Remove({2, 8});
+  EXPECT_EQ("200x160", SizesOf(file_));
+  const auto after = BytesOf(file_);
+  ASSERT_EQ(before.size(), after.size());
+  EXPECT_EQ(before, after);
+}
+
+TEST_F(Space, OfRemovedLevelsInFrontOfOtherBytesStays) {
+  BuildAll();
+  Append("others");
+  const uint64_t size = Size();
+  Open(file_, datasources::kUpdate)->GetSource()->Levels()->Remove({2, 4, 8});
+  EXPECT_EQ("200x160", SizesOf(file_));
+  EXPECT_EQ(size, Size());
+  const auto bytes = BytesOf(file_);
+  EXPECT_EQ("others", std::string(bytes.end() - 6, bytes.end()));
+}
+
+}  // namespace
+}  // namespace orin::tests
