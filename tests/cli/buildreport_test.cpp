@@ -50,6 +50,21 @@ TEST(BuildReport, TheSummaryTellsWhatWasBuiltHowAndWhere) {
             SummaryText(Plan({2}), State({2, 4, 8}, {}, LevelPlace::kSideCar)));
 }
 
+TEST(BuildReport, KeptLevelsOfUnknownOriginAreNeverCalledUpToDate) {
+  BuildPlan plan = Plan({2, 4});
+  plan.unverified = {4};
+  EXPECT_EQ("nothing to do; already up to date: 2; kept unverified: 4", NothingToDoText(plan));
+  plan.unverified = {2, 4};
+  EXPECT_EQ("nothing to do; kept unverified: 2, 4", NothingToDoText(plan));
+}
+
+TEST(BuildReport, LevelsOfAChangedImageAreNamed) {
+  BuildPlan plan = Plan({});
+  EXPECT_EQ("", StaleText(plan));
+  plan.stale = {2, 8};
+  EXPECT_EQ("the image was changed after these levels were built: 2, 8.", StaleText(plan));
+}
+
 TEST(BuildReport, LevelsInBothPlacesAreWorthANotice) {
   LevelState state = State({2, 4}, {}, LevelPlace::kInternal);
   EXPECT_EQ("", HiddenLevelsText(state));

@@ -24,7 +24,8 @@ RasterInfo Scene() {
                          1,
                          "Orin Overviews 0.1.0",
                          {true, true},
-                         {true, true}});
+                         {true, true},
+                         datasources::LevelStatus::kCurrent});
   info.levels.push_back({4,
                          250,
                          194,
@@ -34,7 +35,8 @@ RasterInfo Scene() {
                          0,
                          "",
                          {true, true},
-                         {true, false}});
+                         {true, false},
+                         datasources::LevelStatus::kUnfinished});
   return info;
 }
 
@@ -54,6 +56,28 @@ TEST(RasterInfo, TheTableHasALineForEachLevel) {
       "2      500 x 388  inside         NEAREST  1     yes         Orin Overviews 0.1.0\n"
       "4      250 x 194  scene.tif.ovr  -        -     channels 1  -\n",
       TableOf(Scene()));
+}
+
+TEST(RasterInfo, ALevelIsValidStaleUnverifiedOrNot) {
+  using datasources::LevelStatus;
+  const auto validOf = [](LevelStatus status, std::vector<bool> valid) {
+    RasterInfo info = Scene();
+    info.levels.resize(1);
+    info.levels[0].status = status;
+    info.levels[0].validChannels = std::move(valid);
+    const std::string table = TableOf(info);
+    const size_t column = table.find("valid", table.find("level  size"));
+    const size_t start = table.find('\n') + 1;
+    const size_t row = table.find('\n', start) + 1;
+    const std::string text = table.substr(row + column - start);
+    return text.substr(0, text.find("  "));
+  };
+  EXPECT_EQ("yes", validOf(LevelStatus::kCurrent, {true, true}));
+  EXPECT_EQ("channels 2", validOf(LevelStatus::kCurrent, {false, true}));
+  EXPECT_EQ("no", validOf(LevelStatus::kUnfinished, {false, false}));
+  EXPECT_EQ("stale", validOf(LevelStatus::kStale, {false, false}));
+  EXPECT_EQ("unverified", validOf(LevelStatus::kUnverified, {true, true}));
+  EXPECT_EQ("channels 1 unverified", validOf(LevelStatus::kUnverified, {true, false}));
 }
 
 TEST(RasterInfo, WithoutLevelsTheTableSaysSo) {
@@ -77,6 +101,7 @@ TEST(RasterInfo, JsonSaysNullForWhatIsUnknown) {
   EXPECT_NE(std::string::npos, json.find("\"method\": null"));
   EXPECT_NE(std::string::npos, json.find("\"sourceLevel\": null"));
   EXPECT_NE(std::string::npos, json.find("\"program\": null"));
+  EXPECT_NE(std::string::npos, json.find("\"fingerprint\": null"));
 }
 
 TEST(RasterInfo, JsonTakesAFileNameThatIsNotUtf8) {

@@ -207,6 +207,17 @@ inline std::vector<char> BytesOf(const std::string& file) {
   return {std::istreambuf_iterator<char>(stream), {}};
 }
 
+/// The same without what levels remember of their image, which changes with the file's time.
+inline std::string BytesWithoutRecords(const std::string& file) {
+  const std::vector<char> bytes = BytesOf(file);
+  std::string text(bytes.begin(), bytes.end());
+  const std::string item = "ORIN_IMAGE\">";
+  for (size_t at = text.find(item); at != text.npos; at = text.find(item, at + 1))
+    text.replace(at + item.size(), datasources::kImageRecordLength,
+                 std::string(datasources::kImageRecordLength, '-'));
+  return text;
+}
+
 /// Where the first directory keeps its link, found out the short way.
 inline size_t LinkOfFirst(const std::string& file) {
   const std::vector<char> bytes = BytesOf(file);
