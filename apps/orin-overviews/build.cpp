@@ -105,10 +105,11 @@ BuildPlan PlanWithRoom(BuildOptions& options, const std::string& file, Console& 
   BuildPlan plan = PlanBuild(options, file);
   if (!plan.room.obstacle.empty() && options.placement == Placement::kAutomatic &&
       plan.room.file == file) {
-    console.Notice(
-        AfterFileName(file, plan.room.obstacle + " " + _("They go to a file beside it instead.")));
+    const std::string reason = plan.room.obstacle;
     options.placement = Placement::kExternal;
     plan = PlanBuild(options, file);
+    if (!plan.building.empty())
+      console.Notice(AfterFileName(file, reason + " " + _("They go to a file beside it instead.")));
   }
   datasources::RequireRoom(plan.room);
   return plan;

@@ -49,7 +49,7 @@ class Answers(Case):
         answer = run("build", "--help")
         self.assertRan(answer, 0)
         for option in ("--levels", "--factor", "--method", "--channels", "--internal", "--external",
-                       "--force", "--quiet"):
+                       "--co", "--force", "--quiet"):
             self.assertIn(option, answer.stdout)
         self.assertEqual("", answer.stderr)
         self.assertIn("--json", run("info", "--help").stdout)

@@ -178,10 +178,11 @@ class WithLoss(InMemory):
 
     def test_levels_of_a_jpeg_image_have_its_quality(self):
         for quality in (35, 80, 97):
-            for photometric in ("YCBCR", "RGB"):
+            for photometric, tables in itertools.product(("YCBCR", "RGB"), ("0", "1")):
                 write_tiff(self.file, self.smooth, "Byte",
                            ["COMPRESS=JPEG", f"JPEG_QUALITY={quality}", "TILED=YES",
-                            "INTERLEAVE=PIXEL", f"PHOTOMETRIC={photometric}"])
+                            f"JPEGTABLESMODE={tables}", "INTERLEAVE=PIXEL",
+                            f"PHOTOMETRIC={photometric}"])
                 self.assertRan(run("build", self.file, "--levels", "2"))
                 level = read_pixels(self.file, 0).astype(int)
                 expected = nearest(read_pixels(self.file), 1, 2, (400, 300)).astype(int)
