@@ -4,6 +4,7 @@
 #include <algorithm>
 
 #include "host/datasources/datasetmanager.h"
+#include "host/datasources/levelstore.h"
 #include "host/datasources/pyramidlevels.h"
 #include "host/services/exception.h"
 #include "host/services/text.h"
@@ -23,22 +24,30 @@ std::unique_ptr<IDataset> Open(const std::string& file, AccessMode mode) {
   return std::unique_ptr<IDataset>(DatasetManager::GetInstance()->Open(file, mode));
 }
 
-const IRasterDataset& RasterOf(const IDataset& dataset, const std::string& file) {
-  const auto* raster = dynamic_cast<const IRasterDataset*>(&dataset);
+IRasterDataset& RasterOf(IDataset& dataset, const std::string& file) {
+  auto* raster = dynamic_cast<IRasterDataset*>(&dataset);
   if (!raster || raster->GetChannelCount() == 0)
     throw Exception(FormatString(_("%s: holds no raster."), file.c_str()),
                     "apps/orin-overviews/buildplan", "orin::app::PlanBuild", 0);
   return *raster;
 }
 
-std::vector<unsigned> ChannelsToTreat(const IRasterDataset& raster,
-                                      const std::vector<unsigned>& chosen) {
-  if (!chosen.empty()) return chosen;
+std::vector<unsigned> BitChannels(const IRasterDataset& raster) {
   std::vector<unsigned> channels;
   for (unsigned channel = 1; channel <= raster.GetChannelCount(); ++channel) {
     const std::unique_ptr<datasources::IChannelInfo> info(raster.GetChannelInfo(channel));
-    if (info->GetDataType().bits > 1) channels.push_back(channel);
+    if (info->GetDataType().bits == 1) channels.push_back(channel);
   }
+  return channels;
+}
+
+/// Those of the user, or all that are no masks.
+std::vector<unsigned> ChannelsToTreat(const BuildPlan& plan, const std::vector<unsigned>& chosen) {
+  if (!chosen.empty()) return chosen;
+  std::vector<unsigned> channels;
+  for (unsigned channel = 1; channel <= plan.channelCount; ++channel)
+    if (!std::binary_search(plan.bitChannels.begin(), plan.bitChannels.end(), channel))
+      channels.push_back(channel);
   return channels;
 }
 
@@ -90,12 +99,14 @@ std::unique_ptr<IDataset> OpenForBuild(const std::string& file, Placement placem
 
 BuildPlan PlanBuild(const BuildOptions& options, const std::string& file) {
   const auto dataset = OpenForBuild(file, options.placement);
-  const IRasterDataset& raster = RasterOf(*dataset, file);
+  IRasterDataset& raster = RasterOf(*dataset, file);
   BuildPlan plan;
   plan.width = raster.GetWidth();
   plan.height = raster.GetHeight();
   plan.channelCount = raster.GetChannelCount();
-  plan.channels = ChannelsToTreat(raster, options.channels);
+  plan.bitChannels = BitChannels(raster);
+  plan.holdsClasses = raster.GetSource()->HoldsClasses();
+  plan.channels = ChannelsToTreat(plan, options.channels);
   plan.report = datasources::FormatNameOf(*dataset).find("TIFF") == std::string::npos
                     ? LevelReport::kWithinShare
                     : LevelReport::kToTheEnd;

@@ -4,6 +4,7 @@
 #include <algorithm>
 #include <cerrno>
 #include <cstring>
+#include <fstream>
 #include <utility>
 
 #include <fcntl.h>
@@ -63,6 +64,15 @@ void RequireWritable(const std::string& file) {
   close(descriptor);
 }
 
+/// Whether the file in which raster programs keep what a TIFF has no tag for names classes.
+bool NamesCategories(const std::string& auxiliaryFile) {
+  constexpr size_t kMostBytes = 4 << 20;  // names stand before long tables
+  std::ifstream file(auxiliaryFile, std::ios::binary);
+  std::string text(kMostBytes, '\0');
+  file.read(text.data(), kMostBytes);
+  return file.gcount() > 0 && text.find("<CategoryNames>") != std::string::npos;
+}
+
 /// Items of the file (no sample) or of one of its channels.
 AuxiliaryData::Items ItemsOf(const std::vector<MetadataItem>& metadata,
                              std::optional<unsigned> sample) {
@@ -93,6 +103,10 @@ AuxiliaryData TiffSource::MetadataOf(const std::vector<unsigned>& channels) cons
   std::vector<AuxiliaryData::Items> channelItems;
   for (const unsigned channel : channels) channelItems.push_back(ItemsOf(metadata_, channel - 1));
   return {ItemsOf(metadata_, std::nullopt), std::move(channelItems)};
+}
+
+bool TiffSource::HoldsClasses() const {
+  return format_.photometric == PHOTOMETRIC_PALETTE || NamesCategories(file_ + ".aux.xml");
 }
 
 std::unique_ptr<datasources::IRasterReader> TiffSource::OpenReader(
