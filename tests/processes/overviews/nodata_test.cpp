@@ -136,5 +136,46 @@ TEST(NoDataLevels, HoldNegativeNoDataValuesOfSixtyFourBitIntegers) {
     ExpectSameLevels<int64_t>(storage, -9999, "-9999", 1 << 20);
 }
 
+/// Levels of two channels that declare -5 and 9999, one after another.
+std::vector<std::vector<short>> LevelsOfTwoValues(int format, unsigned channel) {
+  drivers::MemoryRaster raster = RasterWith<short>(-5, "", 1, false);
+  raster.metadata.clear();
+  raster.channels.push_back(RasterWith<short>(9999, "", 1, false).channels[0]);
+  raster.channels[0].metadata["NO_DATA_VALUE"] = "-5";
+  raster.channels[1].metadata["NO_DATA_VALUE"] = "9999";
+  RecordingHost host;
+  host.Put("a", raster, format);
+  CreateFileOverviews job = JobFor("a", {2, 4, 8});
+  job.SetPyramidType(ResampleBilinear);
+  EXPECT_TRUE(job.Generate());
+  std::vector<std::vector<short>> levels;
+  for (const unsigned level : {2, 4, 8}) levels.push_back(Level<short>(host, level, channel));
+  return levels;
+}
+
+/// Whether the levels hold `fill`, and beside it nothing but means of the valid pixels.
+::testing::AssertionResult HoldFillAndMeans(const std::vector<std::vector<short>>& levels,
+                                            short fill) {
+  for (const std::vector<short>& level : levels) {
+    size_t filled = 0;
+    for (const short value : level) {
+      if (value == fill) ++filled;
+      else if (value < 100 || value > 104) return ::testing::AssertionFailure() << value;
+    }
+    if (filled == 0 || filled == level.size()) return ::testing::AssertionFailure() << filled;
+  }
+  return ::testing::AssertionSuccess();
+}
+
+TEST(NoDataLevels, OfATiffWithSeveralValuesHoldTheFirstInAllChannels) {
+  EXPECT_TRUE(HoldFillAndMeans(LevelsOfTwoValues(kFormatTiff, 1), -5));
+  EXPECT_TRUE(HoldFillAndMeans(LevelsOfTwoValues(kFormatTiff, 2), -5));
+}
+
+TEST(NoDataLevels, OfOtherFilesWithSeveralValuesHoldEachChannelsOwn) {
+  EXPECT_TRUE(HoldFillAndMeans(LevelsOfTwoValues(kFormatMemory, 1), -5));
+  EXPECT_TRUE(HoldFillAndMeans(LevelsOfTwoValues(kFormatMemory, 2), 9999));
+}
+
 }  // namespace
 }  // namespace orin::testing
