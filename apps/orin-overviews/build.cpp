@@ -79,9 +79,25 @@ Outcome RunJob(CreateFileOverviews& job, const BuildPlan& plan, const BuildOptio
 /// Why the channels asked for cannot be treated; empty when they can.
 std::string ChannelProblem(const CreateFileOverviews& job, const BuildPlan& plan,
                            const BuildOptions& options) {
-  if (job.ValidChannelList()) return "";
-  return FormatString(_("--channels names %s, but the file's channels are 1 to %u."),
-                      JoinNumbers(options.channels).c_str(), plan.channelCount);
+  if (!job.ValidChannelList())
+    return FormatString(_("--channels names %s, but the file's channels are 1 to %u."),
+                        JoinNumbers(options.channels).c_str(), plan.channelCount);
+  for (const unsigned channel : options.channels)
+    if (std::binary_search(plan.bitChannels.begin(), plan.bitChannels.end(), channel))
+      return FormatString(
+          _("channel %u is a mask of one bit, which has no levels. Leave it out of --channels."),
+          channel);
+  return "";
+}
+
+/// Warns of a method that makes values which the image does not hold, where they mean something.
+void WarnOfBlending(const BuildPlan& plan, const BuildOptions& options, const std::string& file,
+                    Console& console) {
+  const auto method = options.method == ResampleInvalid ? GetDefaultPyramidType() : options.method;
+  const bool blends =
+      method == ResampleAverage || method == ResampleBilinear || method == ResampleBicubic;
+  if (blends && plan.holdsClasses && !plan.building.empty())
+    console.Warning(AfterFileName(file, BlendedClassesText()));
 }
 
 /// The code of a run that failed; says what is finished and what to do.
@@ -133,6 +149,7 @@ ExitCode BuildFile(BuildOptions options, const std::string& file, const Interrup
       if (planned.empty) console.Notice(AfterFileName(file, LeftOutText(plan, planned.level)));
   if (const std::string stale = StaleText(plan); !stale.empty())
     console.Notice(AfterFileName(file, stale));
+  WarnOfBlending(plan, options, file, console);
   const Outcome outcome = RunJob(job, plan, options, file, interruption, console);
   if (!outcome.built)
     return ReportFailure(outcome, plan, options, file, interruption.Requested(), console);

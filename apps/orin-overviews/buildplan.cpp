@@ -26,14 +26,22 @@ IRasterDataset& RasterOf(IDataset& dataset, const std::string& file) {
   return *raster;
 }
 
-std::vector<unsigned> ChannelsToTreat(const IRasterDataset& raster,
-                                      const std::vector<unsigned>& chosen) {
-  if (!chosen.empty()) return chosen;
+std::vector<unsigned> BitChannels(const IRasterDataset& raster) {
   std::vector<unsigned> channels;
   for (unsigned channel = 1; channel <= raster.GetChannelCount(); ++channel) {
     const std::unique_ptr<datasources::IChannelInfo> info(raster.GetChannelInfo(channel));
-    if (info->GetDataType().bits > 1) channels.push_back(channel);
+    if (info->GetDataType().bits == 1) channels.push_back(channel);
   }
+  return channels;
+}
+
+/// Those of the user, or all that are no masks.
+std::vector<unsigned> ChannelsToTreat(const BuildPlan& plan, const std::vector<unsigned>& chosen) {
+  if (!chosen.empty()) return chosen;
+  std::vector<unsigned> channels;
+  for (unsigned channel = 1; channel <= plan.channelCount; ++channel)
+    if (!std::binary_search(plan.bitChannels.begin(), plan.bitChannels.end(), channel))
+      channels.push_back(channel);
   return channels;
 }
 
@@ -97,7 +105,9 @@ BuildPlan PlanBuild(const BuildOptions& options, const std::string& file) {
   plan.width = raster.GetWidth();
   plan.height = raster.GetHeight();
   plan.channelCount = raster.GetChannelCount();
-  plan.channels = ChannelsToTreat(raster, options.channels);
+  plan.bitChannels = BitChannels(raster);
+  plan.holdsClasses = raster.GetSource()->HoldsClasses();
+  plan.channels = ChannelsToTreat(plan, options.channels);
   plan.report = datasources::FormatNameOf(*dataset).find("TIFF") == std::string::npos
                     ? LevelReport::kWithinShare
                     : LevelReport::kToTheEnd;

@@ -22,6 +22,8 @@ struct BuildPlan {
   unsigned width = 0;   ///< pixels
   unsigned height = 0;  ///< pixels
   unsigned channelCount = 0;
+  std::vector<unsigned> bitChannels;  ///< masks of one bit, which have no levels
+  bool holdsClasses = false;          ///< pixels number colours of a palette, or classes
   std::vector<unsigned> channels;   ///< to be treated; those of the user, or all wider than one bit
   std::vector<unsigned> requested;  ///< levels, ascending, each once
   std::vector<unsigned> kept;       ///< of these: present, valid and not to be forced

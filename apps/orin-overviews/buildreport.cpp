@@ -119,6 +119,12 @@ std::string LeftOutText(const BuildPlan& plan, unsigned level) {
                       plan.width, plan.height);
 }
 
+std::string BlendedClassesText() {
+  return _(
+      "the pixels are numbers of palette colours or classes: this method invents colours and "
+      "classes that the image does not hold. Use --method mode or --method nearest.");
+}
+
 std::string HiddenLevelsText(const LevelState& state) {
   const auto stands = [&](datasources::LevelPlace place) {
     return std::any_of(state.descriptions.begin(), state.descriptions.end(),

@@ -18,6 +18,8 @@ std::string NothingToDoText(const BuildPlan& plan);
 std::string StaleText(const BuildPlan& plan);
 /// Why a level larger than the image is not built.
 std::string LeftOutText(const BuildPlan& plan, unsigned level);
+/// Why a method that computes means does not suit a palette or classes.
+std::string BlendedClassesText();
 /// What to know of levels in both places; empty when they stand in one.
 std::string HiddenLevelsText(const LevelState& state);
 std::string InterruptedText(const LevelState& state, const BuildOptions& options);

@@ -81,6 +81,7 @@ class GenericSource final : public IRasterSource {
   AuxiliaryData MetadataOf(const std::vector<unsigned>& channels) const override {
     return image_->MetadataOf(channels);
   }
+  bool HoldsClasses() const override { return image_->HoldsClasses(); }
   std::unique_ptr<IRasterReader> OpenReader(const std::vector<unsigned>& channels) override {
     auto reader = image_->OpenReader(channels);
     if (image_->DeliversValidity()) return reader;

@@ -74,8 +74,11 @@ class IRasterSource {
   virtual unsigned ChannelCount() const = 0;
   /// \param channel  1-based
   virtual gobs::DataType TypeOf(unsigned channel) const = 0;
-  /// Metadata of the file and of `channels`, in their order.
+  /// Metadata of the file and of `channels`, in their order; no-data texts as they were declared.
   virtual AuxiliaryData MetadataOf(const std::vector<unsigned>& channels) const = 0;
+  /// True when pixels number entries of a palette or named classes: a mean of two numbers means
+  /// something else altogether.
+  virtual bool HoldsClasses() const { return false; }
 
   /// A reader of full-resolution pixels on a handle of its own; it must not outlive the source.
   /// \throws orin::Exception  the channels differ in type, or the file cannot be read

@@ -61,14 +61,17 @@ void NoDataAnswers::AnswerAs(AuxiliaryData& data, const std::vector<unsigned>& c
   const std::string file = data.GetFileMetadataValue(kNoDataKey);
   const std::string fileAnswer = AnswerTo<T>(file, type);
   data.SetFileMetadataValue(kNoDataKey, fileAnswer);
-  if (fileAnswer != PlainNoDataText(file)) data.SetFileMetadataValue(kDeclaredNoDataKey, file);
+  const auto declared = [](const std::string& text, const std::string& answer) {
+    return answer == PlainNoDataText(text) ? "" : text;
+  };
+  data.SetFileMetadataValue(kDeclaredNoDataKey, declared(file, fileAnswer));
   texts.answered = fileAnswer;
   texts.fill = file;
   for (unsigned channel = 1; channel <= channels.size(); ++channel) {
     const std::string own = data.GetChanMetadataValue(kNoDataKey, channel);
     const std::string answer = AnswerTo<T>(own, type);
     data.SetChanMetadataValue(kNoDataKey, channel, answer);
-    if (answer != PlainNoDataText(own)) data.SetChanMetadataValue(kDeclaredNoDataKey, channel, own);
+    data.SetChanMetadataValue(kDeclaredNoDataKey, channel, declared(own, answer));
     texts.declared.push_back(answer.empty() ? file : own);
     if (channel == 1 && fileAnswer.empty()) {
       texts.answered = answer;

@@ -61,6 +61,7 @@ bool ForEachBlock(IRasterReader& reader, Visit&& visit) {
   const uint64_t pixels = std::max<uint64_t>(1, kBlockBytes / PixelBytes(pixel));
   const uint32_t width = reader.GetWidth();
   const uint32_t height = reader.GetHeight();
+  if (width == 0 || height == 0) return true;
   const uint64_t tileHeight = std::clamp<uint64_t>(reader.GetTileHeight(), 1, height);
   const uint64_t tileWidth = std::clamp<uint64_t>(reader.GetTileWidth(), 1, width);
   const uint64_t across = std::max<uint64_t>(1, pixels / tileHeight / tileWidth) * tileWidth;

@@ -23,11 +23,13 @@ std::optional<double> ParseNoData(const std::string& text);
 template <class T>
 struct NoDataValue {
   T stored{};  ///< what a pixel without data holds; may be NaN or infinite
-  T other{};  ///< counts as well: the last finite value when the text lies beyond it, else `stored`
+  T other{};   ///< of floating types, counts as well: the last finite value when the text lies
+               ///< beyond it, else `stored`
 
   bool Matches(T value) const {
-    if (value == stored || value == other) return true;
-    if constexpr (std::is_floating_point_v<T>) return std::isnan(value) && std::isnan(stored);
+    if (value == stored) return true;
+    if constexpr (std::is_floating_point_v<T>)
+      return value == other || (std::isnan(value) && std::isnan(stored));
     return false;
   }
 };

