@@ -18,6 +18,7 @@ using orin::datasources::IRasterReader;
 using orin::datasources::kAlphaKey;
 using orin::datasources::kFillOnlyKey;
 using orin::datasources::kNoDataKey;
+using orin::datasources::kValidityKey;
 using orin::gobs::Mask;
 using orin::gobs::Raster;
 
@@ -127,13 +128,13 @@ bool IsAlpha(const AuxiliaryData& metadata, unsigned channel) {
 }
 
 /// The reader's no-data texts, one a channel; nothing when no channel has one.
-std::optional<std::vector<std::string>> DeclaredTexts(const IRasterReader& reader) {
-  const AuxiliaryData metadata = reader.GetAuxiliaryData();
+std::optional<std::vector<std::string>> DeclaredTexts(const AuxiliaryData& metadata,
+                                                      unsigned channels) {
   const bool isFillOnly = !metadata.GetFileMetadataValue(kFillOnlyKey).empty();
   const std::string file = isFillOnly ? "" : metadata.GetFileMetadataValue(kNoDataKey);
   std::vector<std::string> texts;
   bool any = false;
-  for (unsigned channel = 1; channel <= reader.GetChannelCount(); ++channel) {
+  for (unsigned channel = 1; channel <= channels; ++channel) {
     std::string own = metadata.GetChanMetadataValue(kNoDataKey, channel);
     texts.push_back(Trimmed(own.empty() ? file : own));
     any = any || (!IsAlpha(metadata, channel) && IsFiniteNumber(texts.back()));
@@ -143,10 +144,10 @@ std::optional<std::vector<std::string>> DeclaredTexts(const IRasterReader& reade
 }
 
 /// The decision of the values that the reader's file declares, or null.
-std::unique_ptr<orin::gobs::IMaskDecision> DeclaredDecision(const IRasterReader& reader) {
-  const auto texts = DeclaredTexts(reader);
+std::unique_ptr<orin::gobs::IMaskDecision> DeclaredDecision(const IRasterReader& reader,
+                                                            const AuxiliaryData& metadata) {
+  const auto texts = DeclaredTexts(metadata, reader.GetChannelCount());
   if (!texts) return nullptr;
-  const AuxiliaryData metadata = reader.GetAuxiliaryData();
   const orin::gobs::DataType type = reader.GetDataType();
   std::unique_ptr<orin::gobs::IMaskDecision> decision;
   orin::typedispatch::WithPixelType(type, [&]<class T>(std::type_identity<T>) {
@@ -163,9 +164,9 @@ std::unique_ptr<orin::gobs::IMaskDecision> DeclaredDecision(const IRasterReader&
 }  // namespace
 
 orin::gobs::IMaskDecision* GetFileMetadataSrcMask(orin::datasources::IRasterReader* reader) {
-  std::unique_ptr<orin::gobs::IMaskDecision> decision = DeclaredDecision(*reader);
-  const std::string validity =
-      reader->GetAuxiliaryData().GetFileMetadataValue(orin::datasources::kValidityKey);
-  if (!validity.empty()) decision = std::make_unique<WithBlockValidity>(std::move(decision));
+  const AuxiliaryData metadata = reader->GetAuxiliaryData();
+  auto decision = DeclaredDecision(*reader, metadata);
+  if (!metadata.GetFileMetadataValue(kValidityKey).empty())
+    decision = std::make_unique<WithBlockValidity>(std::move(decision));
   return decision.release();
 }
