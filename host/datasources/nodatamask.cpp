@@ -103,15 +103,15 @@ std::string Declared(const std::string& answered, const std::string& declared) {
 }
 
 /// What the reader's channels declare; nothing when none of those that count declares a number.
-std::optional<std::vector<ChannelText>> DeclaredTexts(const IRasterReader& reader) {
-  const AuxiliaryData metadata = reader.GetAuxiliaryData();
+std::optional<std::vector<ChannelText>> DeclaredTexts(const AuxiliaryData& metadata,
+                                                      unsigned channels) {
   const bool isFillOnly = !metadata.GetFileMetadataValue(kFillOnlyKey).empty();
   const std::string file = isFillOnly ? ""
                                       : Declared(metadata.GetFileMetadataValue(kNoDataKey),
                                                  metadata.GetFileMetadataValue(kDeclaredNoDataKey));
   std::vector<ChannelText> texts;
   bool any = false;
-  for (unsigned channel = 1; channel <= reader.GetChannelCount(); ++channel) {
+  for (unsigned channel = 1; channel <= channels; ++channel) {
     const std::string own = Declared(metadata.GetChanMetadataValue(kNoDataKey, channel),
                                      metadata.GetChanMetadataValue(kDeclaredNoDataKey, channel));
     const bool isAlpha = !metadata.GetChanMetadataValue(kAlphaKey, channel).empty();
@@ -123,8 +123,9 @@ std::optional<std::vector<ChannelText>> DeclaredTexts(const IRasterReader& reade
 }
 
 /// The decision of the values that the reader's file declares, or null.
-std::unique_ptr<IMaskDecision> DeclaredDecision(const IRasterReader& reader) {
-  const auto texts = DeclaredTexts(reader);
+std::unique_ptr<IMaskDecision> DeclaredDecision(const IRasterReader& reader,
+                                                const AuxiliaryData& metadata) {
+  const auto texts = DeclaredTexts(metadata, reader.GetChannelCount());
   if (!texts) return nullptr;
   const orin::gobs::DataType type = reader.GetDataType();
   std::unique_ptr<IMaskDecision> decision;
@@ -137,9 +138,9 @@ std::unique_ptr<IMaskDecision> DeclaredDecision(const IRasterReader& reader) {
 }  // namespace
 
 IMaskDecision* GetFileMetadataSrcMask(IRasterReader* reader) {
-  std::unique_ptr<IMaskDecision> decision = DeclaredDecision(*reader);
-  const std::string validity =
-      reader->GetAuxiliaryData().GetFileMetadataValue(orin::datasources::kValidityKey);
-  if (!validity.empty()) decision = std::make_unique<WithBlockValidity>(std::move(decision));
+  const AuxiliaryData metadata = reader->GetAuxiliaryData();
+  std::unique_ptr<IMaskDecision> decision = DeclaredDecision(*reader, metadata);
+  if (!metadata.GetFileMetadataValue(orin::datasources::kValidityKey).empty())
+    decision = std::make_unique<WithBlockValidity>(std::move(decision));
   return decision.release();
 }

@@ -3,6 +3,8 @@
 
 #include <cstdlib>
 #include <filesystem>
+#include <mutex>
+#include <set>
 #include <utility>
 #include <vector>
 
@@ -73,6 +75,14 @@ std::string ReasonOrFailure(const std::string& path, unsigned width, unsigned he
   }
 }
 
+/// An image is opened several times by one build.
+void WarnOnce(const std::string& text) {
+  static std::mutex mutex;
+  static std::set<std::string> said;
+  const std::lock_guard lock(mutex);
+  if (said.insert(text).second) tarn::Warning::Warn(text, "host/drivers/tiff/tiffmask", 0);
+}
+
 }  // namespace
 
 std::unique_ptr<IValidityReader> OpenTiffMask(const std::string& path, uint64_t directoryOffset) {
@@ -106,9 +116,8 @@ std::unique_ptr<IValidityReader> OpenMaskBeside(const std::string& imageFile, un
   if (path.empty()) return nullptr;
   const std::string reason = ReasonOrFailure(path, width, height);
   if (reason.empty()) return OpenTiffMask(path, 0);
-  tarn::Warning::Warn(FormatString(_("%s: is not used as the mask of its image: %s."), path.c_str(),
-                                   reason.c_str()),
-                      "host/drivers/tiff/tiffmask", 0);
+  WarnOnce(FormatString(_("%s: is not used as the mask of its image: %s."), path.c_str(),
+                        reason.c_str()));
   return nullptr;
 }
 

@@ -66,6 +66,54 @@ TEST(NoDataMask, ThereIsNoDecisionWithoutANumber) {
   EXPECT_EQ(nullptr, DecisionOf(orin::gobs::eDT_BIT, "0", {""}));
 }
 
+/// The decision of a raster with masks or alpha. \param alpha  1-based channel, 0 for none
+std::unique_ptr<IMaskDecision> DecisionWithValidity(const std::string& noData, bool isFillOnly,
+                                                    unsigned channels, unsigned alpha) {
+  FakeRaster raster;
+  raster.channels = channels;
+  raster.metadata.SetFileMetadataValue("VALIDITY", "YES");
+  if (!noData.empty()) raster.metadata.SetFileMetadataValue("NO_DATA_VALUE", noData);
+  if (isFillOnly) raster.metadata.SetFileMetadataValue("NO_DATA_VALUE_IS_FILL", "YES");
+  if (alpha != 0) raster.metadata.SetChanMetadataValue("ALPHA", alpha, "YES");
+  return std::unique_ptr<IMaskDecision>(GetFileMetadataSrcMask(&raster));
+}
+
+/// Validity of a row of bytes whose block calls pixel 0 no data.
+std::vector<bool> ValidityOfMasked(const IMaskDecision& decision,
+                                   const std::vector<uint8_t>& values, unsigned channels) {
+  const auto width = static_cast<unsigned>(values.size() / channels);
+  Raster block({width, 1, channels, DataTypeOf<uint8_t>()}, {});
+  std::memcpy(block.data, values.data(), block.byteSize);
+  block.validity = std::make_unique<Mask>(width, 1, block.Window());
+  block.validity->SetValid(0, 0, false);
+  Mask mask(width, 1, {});
+  decision.Decide(block, mask);
+  std::vector<bool> valid;
+  for (unsigned x = 0; x < width; ++x) valid.push_back(mask.IsValid(x, 0));
+  return valid;
+}
+
+TEST(NoDataMask, APixelIsNoDataWhereTheValueOrTheBlocksValiditySaysSo) {
+  const auto decision = DecisionWithValidity("7", false, 1, 0);
+  EXPECT_THAT(ValidityOfMasked(*decision, {5, 7, 0, 5}, 1), ElementsAre(false, false, true, true));
+}
+
+TEST(NoDataMask, AValueThatIsAFillOnlyMasksNothing) {
+  const auto decision = DecisionWithValidity("0", true, 1, 0);
+  EXPECT_THAT(ValidityOfMasked(*decision, {5, 0, 0, 5}, 1), ElementsAre(false, true, true, true));
+}
+
+TEST(NoDataMask, AlphaIsNotComparedWithTheValue) {
+  const auto decision = DecisionWithValidity("7", false, 3, 3);
+  EXPECT_THAT(ValidityOfMasked(*decision, {1, 1, 1, 7, 7, 200, 7, 1, 7, 1, 7, 7}, 3),
+              ElementsAre(false, false, true, true));
+}
+
+TEST(NoDataMask, AlphaAloneIsMaskedByItsValidityAlone) {
+  const auto decision = DecisionWithValidity("7", false, 1, 1);
+  EXPECT_THAT(ValidityOfMasked(*decision, {7, 7, 1}, 1), ElementsAre(false, true, true));
+}
+
 template <class T>
 class NoDataMaskOfType : public ::testing::Test {};
 using PixelTypes = ::testing::Types<signed char, unsigned char, short, unsigned short, int,
