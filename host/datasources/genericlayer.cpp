@@ -50,11 +50,37 @@ class BothPlaces final : public ILevelStore {
   std::unique_ptr<ILevelStore> sideCar_;
 };
 
+/// The side-car of what is no file by itself: there is none, and none can be made.
+class NoSideCar final : public ILevelStore {
+ public:
+  explicit NoSideCar(std::string image) : image_(std::move(image)) {}
+
+  std::vector<LevelDescription> List() const override { return {}; }
+  void Create(unsigned, const std::vector<unsigned>&, const std::string&) override { Refuse(); }
+  std::unique_ptr<IRasterWriter> OpenWriter(unsigned, const std::vector<unsigned>&) override {
+    Refuse();
+  }
+  void SetValid(unsigned, const std::vector<unsigned>&, bool) override { Refuse(); }
+
+ private:
+  [[noreturn]] void Refuse() const {
+    throw Exception(
+        FormatString(
+            _("%s: is no file by itself: its side-car would be %s.ovr, where nothing can be "
+              "written and no program would look. Copy the raster into a file, or make a "
+              "VRT file that refers to it, and build the levels of that."),
+            image_.c_str(), image_.c_str()),
+        "host/datasources/genericlayer", "NoSideCar::Refuse() const", 0);
+  }
+
+  std::string image_;
+};
+
 class GenericSource final : public IRasterSource {
  public:
-  GenericSource(std::unique_ptr<IRasterSource> image, ISideCarFormat& format,
-                const std::string& file)
-      : image_(std::move(image)), levels_(image_->Levels(), format.Open(file, *image_)) {}
+  /// \param sideCar  of `image`
+  GenericSource(std::unique_ptr<IRasterSource> image, std::unique_ptr<ILevelStore> sideCar)
+      : image_(std::move(image)), levels_(image_->Levels(), std::move(sideCar)) {}
 
   unsigned Width() const override { return image_->Width(); }
   unsigned Height() const override { return image_->Height(); }
@@ -80,7 +106,11 @@ std::unique_ptr<IRasterSource> OpenGeneric(IFormatDriver& driver, const std::str
   if (!format)
     throw Exception(FormatString(_("%s: no side-car format is registered."), file.c_str()),
                     "host/datasources/genericlayer", "OpenGeneric", 0);
-  return std::make_unique<GenericSource>(driver.Open(file, kReadOnly), *format, file);
+  auto image = driver.Open(file, kReadOnly);
+  std::unique_ptr<ILevelStore> sideCar;
+  if (driver.IsPath(file)) sideCar = format->Open(file, *image);
+  else sideCar = std::make_unique<NoSideCar>(file);
+  return std::make_unique<GenericSource>(std::move(image), std::move(sideCar));
 }
 
 }  // namespace orin::datasources
