@@ -61,6 +61,7 @@ void HfaUpdate::Close() {
 void HfaUpdate::SetItem(const std::string& key, const std::string& text) {
   const GdalErrors errors;
   const CPLErr answer = GDALSetMetadataItem(dataset_, key.c_str(), text.c_str(), nullptr);
+  file_.RequireWritten();  // says why, which the library does not
   errors.Require(answer == CE_None, CannotWrite(), path_);
 }
 
@@ -75,6 +76,7 @@ void HfaUpdate::AddLevel(unsigned level, const std::vector<unsigned>& channels) 
   const CPLErr answer =
       GDALBuildOverviews(dataset_, "NONE", 1, &factor, static_cast<int>(bands.size()), bands.data(),
                          GDALDummyProgress, nullptr);
+  file_.RequireWritten();  // says why, which the library does not
   errors.Require(answer == CE_None, CannotWrite(), path_);
   for (size_t i = 0; i < bands.size(); ++i)
     if (GDALGetOverviewCount(GDALGetRasterBand(dataset_, bands[i])) != before[i] + 1)
@@ -119,6 +121,7 @@ void HfaUpdate::WriteBlock(GDALRasterBandH band, const gobs::Raster& block, unsi
   if (surplusColumn && surplusRow) put(width, height, 1, 1, block.width - 1, block.height - 1);
   // Now, so that no other thread meets the failures of these writes.
   if (GDALFlushRasterCache(band) != CE_None) answer = CE_Failure;
+  file_.RequireWritten();  // says why, which the library does not
   errors.Require(answer == CE_None, CannotWrite(), path_);
 }
 
@@ -126,6 +129,7 @@ void HfaUpdate::Commit() {
   {
     const GdalErrors errors;
     Close();
+    file_.RequireWritten();
     errors.Require(true, CannotWrite(), path_);
   }
   file_.Commit();

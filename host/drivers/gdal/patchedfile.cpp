@@ -136,8 +136,12 @@ std::vector<FilePatch> PatchedFile::Waiting() const {
   return patches;
 }
 
-void PatchedFile::Commit() {
+void PatchedFile::RequireWritten() const {
   if (error_ != 0) FailToWrite();
+}
+
+void PatchedFile::Commit() {
+  RequireWritten();
   const auto sync = [this] {
     if (fsync(descriptor_) == 0) return;
     error_ = errno;

@@ -41,6 +41,10 @@ class PatchedFile {
   /// \throws orin::Exception  a write of the library failed, or one of these does
   void Commit();
 
+  /// Throws when a write failed, also one that the library said nothing of.
+  /// \throws orin::Exception
+  void RequireWritten() const;
+
   // For the library. A failed write is remembered: the library may not tell.
   size_t Read(uint64_t position, void* bytes, size_t count);
   size_t Write(uint64_t position, const void* bytes, size_t count);
