@@ -8,6 +8,7 @@
 #include "apps/orin-overviews/interruption.h"
 #include "apps/orin-overviews/numberlist.h"
 #include "apps/orin-overviews/progressdisplay.h"
+#include "host/datasources/datasetmanager.h"
 #include "host/services/counter.h"
 #include "host/services/exception.h"
 #include "host/services/text.h"
@@ -184,6 +185,8 @@ ExitCode TryFile(const BuildOptions& options, const std::string& file,
 ExitCode RunBuild(const BuildOptions& options, Console& console) {
   const Interruption interruption;
   datasources::SetLevelOptions(options.storing);
+  datasources::DatasetManager::GetInstance()->RefuseUpdates(options.placement ==
+                                                            Placement::kExternal);
   ExitCode result = kDone;
   for (size_t i = 0; i < options.files.size(); ++i) {
     if (interruption.Requested()) return kInterrupted;

@@ -30,6 +30,15 @@ std::string UnrecognisedText(const std::string& file) {
   return FormatString(_("%s: is not a raster file of a known format."), file.c_str());
 }
 
+/// True for a format of its own whose name the library takes for the generic layer's, so that it
+/// never reopens such a dataset: what is opened for reading has to keep new levels beside the file
+/// from the start.
+bool KeepsItsName(int code) {
+  const ZMBInfo_s* record = ZMBGetFormatInfo(code);
+  return record && record->name.find("ZMB") != std::string::npos &&
+         FormatRegistry::Instance().SideCarFormat() != nullptr;
+}
+
 IDataset* OpenThrough(int formatCode, const std::string& file, AccessMode mode,
                       const char* function) {
   ZMBFormatType fileCode = kFormatUnknown;
@@ -41,6 +50,8 @@ IDataset* OpenThrough(int formatCode, const std::string& file, AccessMode mode,
     Refuse(
         FormatString(_("%s: is not a %s file."), file.c_str(), ZMBInfo[formatCode]->name.c_str()),
         function);
+  if (mode == kReadOnly && KeepsItsName(fileCode))
+    return new SourceDataset(OpenGeneric(*driver, file), file, mode, fileCode, fileCode);
   return new SourceDataset(driver->Open(file, mode), file, mode, fileCode, fileCode);
 }
 
@@ -60,6 +71,11 @@ DatasetManager* DatasetManager::GetInstance() {
 }
 
 IDataset* DatasetManager::Open(const std::string& file, AccessMode mode) {
+  if (mode == kUpdate && refusesUpdates_)
+    Refuse(FormatString(_("%s: is not opened for writing: levels are to stand beside it."),
+                        file.c_str()),
+           "orin::datasources::DatasetManager::Open(const std::string&, "
+           "orin::datasources::AccessMode)");
   return OpenThrough(kFormatUnknown, file, mode,
                      "orin::datasources::DatasetManager::Open(const std::string&, "
                      "orin::datasources::AccessMode)");

@@ -23,8 +23,14 @@ class DatasetManager {
   /// \throws orin::Exception  as `Open`
   IDataset* OpenFormat(const std::string& format, const std::string& file, AccessMode mode);
 
+  /// While it is on, `Open` refuses to open for update, so that every image counts as read-only and
+  /// new levels go beside it. For the application, before work starts.
+  void RefuseUpdates(bool on) { refusesUpdates_ = on; }
+
  private:
   DatasetManager() = default;
+
+  bool refusesUpdates_ = false;
 };
 
 }  // namespace orin::datasources

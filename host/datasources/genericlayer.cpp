@@ -63,15 +63,44 @@ class BothPlaces final : public ILevelStore {
   std::unique_ptr<ILevelStore> sideCar_;
 };
 
+/// The side-car of what is no file by itself: there is none, and none can be made.
+class NoSideCar final : public ILevelStore {
+ public:
+  explicit NoSideCar(std::string image) : image_(std::move(image)) {}
+
+  std::vector<LevelDescription> List() const override { return {}; }
+  void Create(unsigned, const std::vector<unsigned>&, const std::string&) override { Refuse(); }
+  std::unique_ptr<IRasterWriter> OpenWriter(unsigned, const std::vector<unsigned>&) override {
+    Refuse();
+  }
+  void SetValid(unsigned, const std::vector<unsigned>&, bool) override { Refuse(); }
+  void Remove(const std::vector<unsigned>&) override {}
+
+ private:
+  [[noreturn]] void Refuse() const {
+    throw Exception(
+        FormatString(
+            _("%s: is no file by itself: its side-car would be %s.ovr, where nothing can be "
+              "written and no program would look. Copy the raster into a file, or make a "
+              "VRT file that refers to it, and build the levels of that."),
+            image_.c_str(), image_.c_str()),
+        "host/datasources/genericlayer", "NoSideCar::Refuse() const", 0);
+  }
+
+  std::string image_;
+};
+
 class GenericSource final : public IRasterSource {
  public:
-  GenericSource(std::unique_ptr<IRasterSource> image, ISideCarFormat& format,
-                const std::string& file)
+  /// \param sideCar  of `image`
+  /// \param format   null when `file` can have nothing beside it
+  GenericSource(std::unique_ptr<IRasterSource> image, std::unique_ptr<ILevelStore> sideCar,
+                ISideCarFormat* format, const std::string& file)
       : image_(std::move(image)),
-        levels_(image_->Levels(), format.Open(file, *image_)),
+        levels_(image_->Levels(), std::move(sideCar)),
         format_(format),
         file_(file) {
-    hasMaskBeside_ = !image_->DeliversValidity() && OpenMaskBeside();
+    hasMaskBeside_ = format && !image_->DeliversValidity() && OpenMaskBeside();
   }
 
   unsigned Width() const override { return image_->Width(); }
@@ -103,12 +132,12 @@ class GenericSource final : public IRasterSource {
 
  private:
   std::unique_ptr<IValidityReader> OpenMaskBeside() {
-    return format_.OpenMaskBeside(file_, image_->Width(), image_->Height());
+    return format_->OpenMaskBeside(file_, image_->Width(), image_->Height());
   }
 
   std::unique_ptr<IRasterSource> image_;
   BothPlaces levels_;
-  ISideCarFormat& format_;
+  ISideCarFormat* format_;
   std::string file_;
   bool hasMaskBeside_ = false;
 };
@@ -120,7 +149,12 @@ std::unique_ptr<IRasterSource> OpenGeneric(IFormatDriver& driver, const std::str
   if (!format)
     throw Exception(FormatString(_("%s: no side-car format is registered."), file.c_str()),
                     "host/datasources/genericlayer", "OpenGeneric", 0);
-  return std::make_unique<GenericSource>(driver.Open(file, kReadOnly), *format, file);
+  auto image = driver.Open(file, kReadOnly);
+  if (!driver.IsPath(file))
+    return std::make_unique<GenericSource>(std::move(image), std::make_unique<NoSideCar>(file),
+                                           nullptr, file);
+  auto sideCar = format->Open(file, *image);
+  return std::make_unique<GenericSource>(std::move(image), std::move(sideCar), format, file);
 }
 
 }  // namespace orin::datasources

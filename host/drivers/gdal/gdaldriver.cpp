@@ -46,6 +46,8 @@ class GdalDriver final : public datasources::IFormatDriver {
                       "host/drivers/gdal/gdaldriver", "GdalDriver::Open", 0);
     return std::make_unique<GdalSource>(file, *format, access);
   }
+
+  bool IsPath(const std::string& file) const override { return IsRegularFile(file); }
 };
 
 void SetUpLibrary() {

@@ -52,9 +52,13 @@ std::vector<const char*> OpeningDrivers() {
   return names;
 }
 
-bool IsRegularFile(const std::string& name) {
-  struct stat status;
-  return stat(name.c_str(), &status) == 0 && S_ISREG(status.st_mode);
+/// A name that only the library understands: "/vsizip/...", "NETCDF:..."
+bool IsLibraryName(const std::string& name) {
+  if (name.starts_with("/vsi")) return true;
+  const size_t colon = name.find(':');
+  return colon != name.npos && colon > 1 &&
+         std::all_of(name.begin(), name.begin() + static_cast<std::ptrdiff_t>(colon),
+                     [](unsigned char c) { return std::isalnum(c) || c == '_'; });
 }
 
 }  // namespace
@@ -76,12 +80,9 @@ std::vector<ZMBInfo_s> GdalFormatRecords() {
   return records;
 }
 
-bool IsLibraryName(const std::string& name) {
-  if (name.starts_with("/vsi")) return true;
-  const size_t colon = name.find(':');
-  return colon != name.npos && colon > 1 &&
-         std::all_of(name.begin(), name.begin() + static_cast<std::ptrdiff_t>(colon),
-                     [](unsigned char c) { return std::isalnum(c) || c == '_'; });
+bool IsRegularFile(const std::string& name) {
+  struct stat status;
+  return stat(name.c_str(), &status) == 0 && S_ISREG(status.st_mode);
 }
 
 const GdalFormat* IdentifyGdalFormat(const std::string& name) {

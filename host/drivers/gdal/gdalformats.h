@@ -30,7 +30,8 @@ std::vector<ZMBInfo_s> GdalFormatRecords();
 /// program is a raster here.
 const GdalFormat* IdentifyGdalFormat(const std::string& name);
 
-/// True for names that are no paths of the operating system: "/vsizip/...", "NETCDF:..."
-bool IsLibraryName(const std::string& name);
+/// True for a path of the operating system, and not for the library's own kinds of names:
+/// "/vsizip/...", "NETCDF:..."
+bool IsRegularFile(const std::string& name);
 
 }  // namespace orin::drivers

@@ -6,6 +6,7 @@
 
 #include "host/drivers/gdal/gdalbands.h"
 #include "host/drivers/gdal/gdalerrors.h"
+#include "host/drivers/gdal/wholefile.h"
 #include "host/services/exception.h"
 #include "host/services/text.h"
 
@@ -35,6 +36,7 @@ GdalReader::GdalReader(const std::string& name, const GdalFormat& format,
       width_(static_cast<unsigned>(GDALGetRasterXSize(handle_.Get()))),
       height_(static_cast<unsigned>(GDALGetRasterYSize(handle_.Get()))),
       type_(CommonTypeOf(handle_, channels_)) {
+  RequireWholeFile(handle_, format);
   int blockWidth = 1, blockHeight = 1;
   if (!channels_.empty())
     GDALGetBlockSize(handle_.Band(channels_.front()), &blockWidth, &blockHeight);

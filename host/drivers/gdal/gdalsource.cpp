@@ -13,6 +13,7 @@
 #include "host/drivers/gdal/gdalbands.h"
 #include "host/drivers/gdal/gdalerrors.h"
 #include "host/drivers/gdal/gdalreader.h"
+#include "host/drivers/gdal/hfalevelstore.h"
 #include "host/drivers/gdal/subdatasets.h"
 #include "host/services/exception.h"
 #include "host/services/text.h"
@@ -29,7 +30,7 @@ using datasources::kNoDataKey;
 
 /// Looks only: nothing is opened for writing before there is something to write.
 void RequireWritable(const std::string& name) {
-  if (IsLibraryName(name) && access(name.c_str(), F_OK) != 0)
+  if (!IsRegularFile(name))
     Refuse(FormatString(_("%s: cannot be opened for writing: it is no file of its own."),
                         name.c_str()));
   if (access(name.c_str(), W_OK) != 0)
@@ -55,6 +56,8 @@ GdalSource::GdalSource(std::string name, const GdalFormat& format, datasources::
   height_ = static_cast<unsigned>(GDALGetRasterYSize(handle.Get()));
   items_ = ItemsOf(handle.Get());
   ReadChannels(handle);
+  if (format_.code == kFormatErdas)
+    levels_ = OpenHfaLevels(name_, format_, *this, access == datasources::kUpdate);
 }
 
 GdalSource::~GdalSource() = default;

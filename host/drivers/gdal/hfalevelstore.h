@@ -1,0 +1,97 @@
+/// The levels inside an ERDAS Imagine file.
+// SPDX-License-Identifier: MIT
+#pragma once
+
+#include <map>
+#include <memory>
+#include <mutex>
+#include <optional>
+#include <string>
+#include <vector>
+
+#include "host/datasources/levelstore.h"
+#include "host/drivers/gdal/gdalformats.h"
+#include "host/drivers/gdal/hfarecord.h"
+#include "host/drivers/gdal/hfatree.h"
+#include "host/drivers/gdal/hfaupdate.h"
+
+namespace orin::drivers {
+
+/// The levels inside `name`, or null when it holds none that are its own and cannot take any.
+/// \param image   its full resolution; outlives the store
+/// \param update  levels may be made and changed
+/// \throws orin::Exception  the file cannot be read, or for an update: it cannot hold levels
+std::unique_ptr<datasources::ILevelStore> OpenHfaLevels(const std::string& name,
+                                                        const GdalFormat& format,
+                                                        datasources::IRasterSource& image,
+                                                        bool update);
+
+/// The pixels of one level that are being written, and which of them are.
+struct HfaBuild {
+  std::unique_ptr<HfaUpdate> update;
+  unsigned level = 0;
+  std::vector<unsigned> channels;
+  std::vector<GDALRasterBandH> bands;  ///< one for each of `channels`
+  std::vector<bool> covered;           ///< one for each pixel of the level
+  bool isClosed = false;               ///< stored or given up
+};
+
+/// A level appears in the file when all of its pixels are on the disk, and is marked not valid at
+/// first; one that is written anew is marked not valid before.
+///
+/// Operations may be called from several threads; one level is written at a time.
+class HfaLevelStore final : public datasources::ILevelStore {
+ public:
+  /// \param path  of the file, links resolved
+  HfaLevelStore(std::string path, const GdalFormat& format, datasources::IRasterSource& image,
+                bool mayChange);
+  ~HfaLevelStore() override;
+
+  std::vector<datasources::LevelDescription> List() const override;
+  void Create(unsigned level, const std::vector<unsigned>& channels,
+              const std::string& method) override;
+  std::unique_ptr<datasources::IRasterWriter> OpenWriter(
+      unsigned level, const std::vector<unsigned>& channels) override;
+  void SetValid(unsigned level, const std::vector<unsigned>& channels, bool valid) override;
+
+  // For the level writers.
+
+  const GdalFormat& Format() const { return format_; }
+  /// Where the stored level stands in the lists of `channels`. \throws orin::Exception  it does not
+  std::vector<int> PositionsOf(unsigned level, const std::vector<unsigned>& channels);
+  /// Takes the level's validity away, and opens the file.
+  std::shared_ptr<HfaBuild> BeginWriting(unsigned level, const std::vector<unsigned>& channels);
+  /// Gives up what is not stored.
+  void EndWriting(HfaBuild& build) noexcept;
+
+ private:
+  struct Pending {
+    std::vector<bool> channels;
+    std::string method;
+  };
+
+  [[noreturn]] void Fail(const char* format, unsigned level) const;
+  void Reload();
+  void LockFile();
+  datasources::LevelDescription Describe(unsigned level) const;
+  void RequireRoom(unsigned level, const std::vector<unsigned>& channels) const;
+  HfaRecord RecordToWrite(unsigned level, const std::vector<unsigned>& channels);
+  void Record(unsigned level, const HfaRecord& record);
+  void StoreBuild();
+  unsigned WidthOf(unsigned level, bool isOurs) const;
+  unsigned HeightOf(unsigned level, bool isOurs) const;
+
+  std::string path_;
+  const GdalFormat& format_;
+  datasources::IRasterSource& image_;
+  bool mayChange_;
+  int lock_ = -1;  ///< descriptor that holds the lock, from the first change on
+  HfaPyramid pyramid_;
+  std::map<unsigned, HfaRecord> records_;
+  std::map<unsigned, Pending> pending_;
+  std::shared_ptr<HfaBuild> build_;
+  unsigned lastRead_ = 0;  ///< level read since the last Create
+  mutable std::mutex mutex_;
+};
+
+}  // namespace orin::drivers

@@ -1,0 +1,124 @@
+/// How a level gets into an ERDAS Imagine file: not valid first, then its pixels, then valid.
+// SPDX-License-Identifier: MIT
+#include <algorithm>
+#include <filesystem>
+
+#include "host/drivers/gdal/hfalevelstore.h"
+#include "host/services/exception.h"
+#include "host/services/text.h"
+
+namespace orin::drivers {
+
+using Overwrites = PatchedFile::Overwrites;
+
+/// The format would go on in a second file.
+void HfaLevelStore::RequireRoom(unsigned level, const std::vector<unsigned>& channels) const {
+  constexpr double kMostBytes = 2e9;
+  double bytes = 0;
+  for (const unsigned channel : channels) {
+    const gobs::DataType type = image_.TypeOf(channel);
+    bytes += double(WidthOf(level, false)) * HeightOf(level, false) * BytesPerComponent(type) *
+             ComponentsPerSample(type);
+  }
+  std::error_code ignored;
+  const auto size = std::filesystem::file_size(path_, ignored);
+  if (!ignored && double(size) + bytes > kMostBytes)
+    Fail(_("%s: level %u would make the file larger than the 2 GB that the format keeps in one "
+           "file. Build with --external."),
+         level);
+}
+
+/// The level's record with `channels` not valid.
+HfaRecord HfaLevelStore::RecordToWrite(unsigned level, const std::vector<unsigned>& channels) {
+  const auto before = records_.find(level);
+  const auto pending = pending_.find(level);
+  HfaRecord record;
+  if (before != records_.end()) record = before->second;
+  else record.validity.assign(image_.ChannelCount(), kHfaAbsent);
+  if (pending != pending_.end()) record.method = pending->second.method;
+  record.sourceLevel = lastRead_ ? lastRead_ : 1;
+  record.program = HfaProgramName();
+  for (const unsigned channel : channels) record.validity.at(channel - 1) = kHfaInvalid;
+  return record;
+}
+
+void HfaLevelStore::Record(unsigned level, const HfaRecord& record) {
+  const auto before = records_.find(level);
+  const std::string text = ComposeHfaRecord(record);
+  if (before != records_.end() && ComposeHfaRecord(before->second) == text) return;
+  HfaUpdate update(path_, Overwrites::kWait);
+  update.SetItem(HfaRecordKey(level), text);
+  update.Commit();
+  Reload();
+}
+
+std::shared_ptr<HfaBuild> HfaLevelStore::BeginWriting(unsigned level,
+                                                      const std::vector<unsigned>& channels) {
+  const std::lock_guard lock(mutex_);
+  if (!mayChange_) Fail(_("%s: is open for reading only; level %u cannot be written."), level);
+  if (build_ && !build_->isClosed)
+    Fail(_("%s: level %u cannot be written while another one is."), level);
+  LockFile();
+  Reload();
+  std::vector<unsigned> missing;
+  for (const unsigned channel : channels)
+    if (pyramid_.Find(channel, level) < 0) missing.push_back(channel);
+  if (!missing.empty()) RequireRoom(level, missing);
+  Record(level, RecordToWrite(level, channels));
+  auto build = std::make_shared<HfaBuild>();
+  build->update =
+      std::make_unique<HfaUpdate>(path_, missing.empty() ? Overwrites::kDirect : Overwrites::kWait);
+  if (!missing.empty()) build->update->AddLevel(level, missing);
+  for (const unsigned channel : channels) {
+    const int stored = pyramid_.Find(channel, level);
+    const int added = channel <= pyramid_.channels.size()
+                          ? static_cast<int>(pyramid_.channels[channel - 1].size())
+                          : 0;
+    build->bands.push_back(build->update->LevelBand(channel, stored >= 0 ? stored : added));
+  }
+  build->level = level;
+  build->channels = channels;
+  build->covered.resize(uint64_t{image_.Width() / level} * (image_.Height() / level));
+  return build_ = std::move(build);
+}
+
+void HfaLevelStore::EndWriting(HfaBuild& build) noexcept {
+  const std::lock_guard lock(mutex_);
+  if (build.isClosed) return;
+  build.isClosed = true;
+  build.update.reset();
+  pending_.erase(build.level);
+}
+
+/// Puts the pixels that are being written into the file; they are valid when somebody says so.
+void HfaLevelStore::StoreBuild() {
+  HfaBuild& build = *build_;
+  if (std::find(build.covered.begin(), build.covered.end(), false) != build.covered.end())
+    Fail(_("%s: level %u is not complete and cannot be marked valid."), build.level);
+  build.isClosed = true;
+  const std::unique_ptr<HfaUpdate> update = std::move(build.update);
+  update->Commit();
+  pending_.erase(build.level);
+  Reload();
+}
+
+void HfaLevelStore::SetValid(unsigned level, const std::vector<unsigned>& channels, bool valid) {
+  const std::lock_guard lock(mutex_);
+  if (!mayChange_) Fail(_("%s: is open for reading only; level %u cannot be marked."), level);
+  LockFile();
+  if (valid && build_ && !build_->isClosed && build_->level == level) StoreBuild();
+  for (const unsigned channel : channels)
+    if (pyramid_.Find(channel, level) < 0)
+      Fail(_("%s: level %u is not complete and cannot be marked."), level);
+  const auto record = records_.find(level);
+  if (record == records_.end()) {
+    if (valid) return;
+    Fail(_("%s: level %u is another program's and cannot be marked."), level);
+  }
+  HfaRecord now = record->second;
+  for (const unsigned channel : channels)
+    now.validity.at(channel - 1) = valid ? kHfaValid : kHfaInvalid;
+  Record(level, now);
+}
+
+}  // namespace orin::drivers

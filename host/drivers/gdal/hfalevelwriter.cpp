@@ -1,0 +1,70 @@
+// SPDX-License-Identifier: MIT
+#include "host/drivers/gdal/hfalevelwriter.h"
+
+#include <algorithm>
+#include <utility>
+
+#include "host/drivers/gdal/gdalerrors.h"
+#include "host/services/text.h"
+
+namespace orin::drivers {
+namespace {
+
+constexpr unsigned kTile = 64;  // edge of the format's tiles, pixels
+
+}  // namespace
+
+HfaLevelWriter::HfaLevelWriter(HfaLevelStore& store, Level level)
+    : store_(store), level_(std::move(level)) {}
+
+HfaLevelWriter::~HfaLevelWriter() {
+  if (build_) store_.EndWriting(*build_);
+}
+
+unsigned HfaLevelWriter::StoredTileWidth() const { return std::min(kTile, level_.width); }
+unsigned HfaLevelWriter::StoredTileHeight() const { return std::min(kTile, level_.height); }
+
+void HfaLevelWriter::OpenPixels() {
+  const std::vector<int> positions = store_.PositionsOf(level_.factor, level_.channels);
+  handle_ = std::make_unique<GdalHandle>(level_.path, store_.Format());
+  const GdalErrors errors;
+  for (size_t i = 0; i < positions.size(); ++i) {
+    GDALRasterBandH band = GDALGetOverview(handle_->Band(level_.channels[i]), positions[i]);
+    const bool fits = band && GDALGetRasterBandXSize(band) >= int(level_.width) &&
+                      GDALGetRasterBandYSize(band) >= int(level_.height);
+    errors.Require(fits, _("%s: cannot be read: %s."), level_.path);
+    bands_.push_back(band);
+  }
+}
+
+void HfaLevelWriter::Read(gobs::Raster& block) {
+  RequireFittingBlock(block, *this, level_.path);
+  if (!handle_) OpenPixels();
+  const auto inside = datasources::InsideOf(block, level_.width, level_.height);
+  if (inside.width <= 0 || inside.height <= 0) return;
+  const uint64_t pixel = PixelBytes(block);
+  uint8_t* first =
+      block.data + LayoutOf(block).Index(inside.x - block.x, inside.y - block.y) * pixel;
+  const GdalErrors errors;
+  CPLErr answer = CE_None;
+  for (size_t i = 0; i < bands_.size() && answer == CE_None; ++i)
+    answer = GDALRasterIOEx(bands_[i], GF_Read, int(inside.x), int(inside.y), int(inside.width),
+                            int(inside.height), first + i * (pixel / bands_.size()),
+                            int(inside.width), int(inside.height), GDALGetRasterDataType(bands_[i]),
+                            GSpacing(pixel), GSpacing(pixel * block.stride), nullptr);
+  errors.Require(answer == CE_None, _("%s: cannot be read: %s."), level_.path);
+  RepeatEdges(block, inside);
+}
+
+void HfaLevelWriter::Write(const gobs::Raster& block) {
+  RequireFittingBlock(block, *this, level_.path);
+  if (!build_ || build_->isClosed) build_ = store_.BeginWriting(level_.factor, level_.channels);
+  for (unsigned i = 0; i < level_.channels.size(); ++i)
+    build_->update->WriteBlock(build_->bands[i], block, i, level_.width, level_.height);
+  for (uint64_t y = block.y; y < uint64_t{block.y} + block.height; ++y) {
+    const auto row = build_->covered.begin() + static_cast<std::ptrdiff_t>(y * level_.width);
+    std::fill(row + block.x, row + block.x + block.width, true);
+  }
+}
+
+}  // namespace orin::drivers

@@ -1,0 +1,32 @@
+// SPDX-License-Identifier: MIT
+#include "host/drivers/gdal/hfarecord.h"
+
+#include <charconv>
+#include <sstream>
+#include <vector>
+
+namespace orin::drivers {
+
+std::string HfaRecordKey(unsigned level) { return "ORIN_LEVEL_" + std::to_string(level); }
+
+std::string ComposeHfaRecord(const HfaRecord& record) {
+  return record.method + ";" + std::to_string(record.sourceLevel) + ";" + record.program + ";" +
+         record.validity;
+}
+
+std::optional<HfaRecord> ParseHfaRecord(const std::string& text, size_t channels) {
+  std::vector<std::string> fields;
+  std::istringstream stream(text);
+  for (std::string field; std::getline(stream, field, ';');) fields.push_back(field);
+  if (fields.size() != 4) return std::nullopt;
+  HfaRecord record{fields[0], 0, fields[2], fields[3]};
+  std::from_chars(fields[1].data(), fields[1].data() + fields[1].size(), record.sourceLevel);
+  const bool isWhole = record.validity.size() == channels &&
+                       record.validity.find_first_not_of("-01") == std::string::npos;
+  if (!isWhole) return std::nullopt;
+  return record;
+}
+
+std::string HfaProgramName() { return "Orin Overviews " ORIN_VERSION; }
+
+}  // namespace orin::drivers

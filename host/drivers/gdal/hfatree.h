@@ -1,0 +1,33 @@
+/// The node tree of an ERDAS Imagine file (.img), as far as it tells of levels.
+// SPDX-License-Identifier: MIT
+#pragma once
+
+#include <string>
+#include <vector>
+
+namespace orin::drivers {
+
+/// An entry of a channel's list of levels.
+struct HfaLevelName {
+  std::string file;     ///< name, without folder, of the file that is said to hold the level
+  unsigned factor = 0;  ///< decimation factor
+};
+
+struct HfaPyramid {
+  /// One list a channel, in the order of the list in the file.
+  std::vector<std::vector<HfaLevelName>> channels;
+  bool isSpilled = false;    ///< pixels stand in a second file (.ige)
+  bool hasUnlisted = false;  ///< some level is in no list
+
+  /// True when a list names another file than `name`: the file was copied or renamed, or its levels
+  /// stand elsewhere. What the lists lead to is not this file's then.
+  bool NamesAnotherFileThan(const std::string& name) const;
+  /// Position of the level in the channel's list, or -1. \param channel  1-based
+  int Find(unsigned channel, unsigned factor) const;
+};
+
+/// \param path  also a name of the library: "/vsizip/..."
+/// \throws orin::Exception  the file's tree cannot be read
+HfaPyramid ReadHfaPyramid(const std::string& path);
+
+}  // namespace orin::drivers

@@ -1,0 +1,158 @@
+// SPDX-License-Identifier: MIT
+#include "host/drivers/gdal/patchedfile.h"
+
+#include <fcntl.h>
+#include <sys/stat.h>
+#include <unistd.h>
+
+#include <algorithm>
+#include <cerrno>
+#include <cstring>
+#include <filesystem>
+#include <utility>
+
+#include "host/drivers/gdal/patchedfilesystem.h"
+#include "host/services/exception.h"
+#include "host/services/text.h"
+
+namespace orin::drivers {
+
+PatchedFile::PatchedFile(std::string path, Overwrites overwrites)
+    : path_(std::move(path)),
+      overwrites_(overwrites),
+      descriptor_(open(path_.c_str(), O_RDWR | O_CLOEXEC)) {
+  struct stat status {};
+  if (descriptor_ < 0 || fstat(descriptor_, &status) != 0) {
+    const int reason = errno;
+    if (descriptor_ >= 0) close(descriptor_);
+    throw Exception(FormatString(_("%s: cannot be opened for writing: %s."), path_.c_str(),
+                                 std::strerror(reason)),
+                    "host/drivers/gdal/patchedfile", "PatchedFile::PatchedFile", 0);
+  }
+  end_ = size_ = static_cast<uint64_t>(status.st_size);
+  libraryName_ = ShowToLibrary(*this, std::filesystem::path(path_).filename().string());
+}
+
+PatchedFile::~PatchedFile() {
+  HideFromLibrary(libraryName_);
+  // What is left behind when this fails is at the file's end, and nothing refers to it.
+  if (!isCommitted_ && size_ > end_ && ftruncate(descriptor_, static_cast<off_t>(end_)) != 0)
+    error_ = errno;
+  close(descriptor_);
+}
+
+void PatchedFile::FailToWrite() const {
+  throw Exception(FormatString(_("%s: cannot be written: %s. Free space or change the permissions, "
+                                 "then run again."),
+                               path_.c_str(), std::strerror(error_)),
+                  "host/drivers/gdal/patchedfile", "PatchedFile::Commit()", 0);
+}
+
+PatchedFile::Page& PatchedFile::PageAt(uint64_t number) {
+  const auto [entry, isNew] = pages_.try_emplace(number);
+  if (isNew) {
+    entry->second.fill(0);
+    const auto position = static_cast<off_t>(number * kPageBytes);
+    if (pread(descriptor_, entry->second.data(), kPageBytes, position) < 0) error_ = errno;
+  }
+  return entry->second;
+}
+
+bool PatchedFile::PutThrough(uint64_t position, const char* bytes, size_t count) {
+  while (count > 0) {
+    const ssize_t put = pwrite(descriptor_, bytes, count, static_cast<off_t>(position));
+    if (put < 0 && errno == EINTR) continue;
+    if (put <= 0) {
+      if (error_ == 0) error_ = put < 0 ? errno : ENOSPC;
+      return false;
+    }
+    bytes += put;
+    position += static_cast<uint64_t>(put);
+    count -= static_cast<size_t>(put);
+    size_ = std::max(size_, position);
+  }
+  return true;
+}
+
+size_t PatchedFile::Write(uint64_t position, const void* bytes, size_t count) {
+  const auto* from = static_cast<const char*>(bytes);
+  size_t done = 0;
+  while (overwrites_ == Overwrites::kWait && done < count && position + done < end_) {
+    const uint64_t at = position + done;
+    const size_t inPage = at % kPageBytes;
+    const size_t part = std::min({count - done, kPageBytes - inPage, size_t(end_ - at)});
+    std::memcpy(PageAt(at / kPageBytes).data() + inPage, from + done, part);
+    done += part;
+  }
+  if (done < count && !PutThrough(position + done, from + done, count - done)) return done;
+  return error_ == 0 ? count : 0;
+}
+
+size_t PatchedFile::Read(uint64_t position, void* bytes, size_t count) {
+  auto* to = static_cast<char*>(bytes);
+  size_t got = 0;
+  while (got < count) {
+    const ssize_t part =
+        pread(descriptor_, to + got, count - got, static_cast<off_t>(position + got));
+    if (part < 0 && errno == EINTR) continue;
+    if (part <= 0) break;
+    got += static_cast<size_t>(part);
+  }
+  for (auto page = pages_.lower_bound(position / kPageBytes);
+       page != pages_.end() && page->first * kPageBytes < position + got; ++page) {
+    const uint64_t first = std::max(position, page->first * kPageBytes);
+    const uint64_t last = std::min({position + got, (page->first + 1) * kPageBytes, end_});
+    if (first < last)
+      std::memcpy(to + (first - position), page->second.data() + first % kPageBytes, last - first);
+  }
+  return got;
+}
+
+std::vector<FilePatch> PatchedFile::Waiting() const {
+  std::vector<FilePatch> patches;
+  uint64_t lastPage = 0;
+  for (const auto& [number, page] : pages_) {
+    const uint64_t start = number * kPageBytes;
+    const size_t length = std::min<uint64_t>(kPageBytes, end_ - start);
+    Page stored{};
+    if (pread(descriptor_, stored.data(), length, static_cast<off_t>(start)) < 0) stored.fill(0);
+    const auto first = std::mismatch(page.begin(), page.begin() + length, stored.begin()).first;
+    if (first == page.begin() + length) continue;
+    auto last = page.begin() + length;
+    while (*(last - 1) == stored[static_cast<size_t>(last - 1 - page.begin())]) --last;
+    const bool goesOn = !patches.empty() && lastPage + 1 == number;
+    if (goesOn) {  // one number may lie across the border: no write may cut it
+      FilePatch& before = patches.back();
+      const Page& pageBefore = pages_.at(lastPage);
+      const uint64_t filled = before.position + before.bytes.size();
+      before.bytes.append(pageBefore.data() + filled % kPageBytes,
+                          filled % kPageBytes == 0 ? 0 : start - filled);
+      before.bytes.append(page.begin(), last);
+    } else {
+      patches.push_back({start + static_cast<uint64_t>(first - page.begin()), {first, last}});
+    }
+    lastPage = number;
+  }
+  return patches;
+}
+
+void PatchedFile::RequireWritten() const {
+  if (error_ != 0) FailToWrite();
+}
+
+void PatchedFile::Commit() {
+  RequireWritten();
+  const auto sync = [this] {
+    if (fsync(descriptor_) == 0) return;
+    error_ = errno;
+    FailToWrite();
+  };
+  const std::vector<FilePatch> patches = Waiting();
+  sync();
+  isCommitted_ = true;  // from here on something may refer to what was appended
+  for (const FilePatch& patch : patches)
+    if (!PutThrough(patch.position, patch.bytes.data(), patch.bytes.size())) FailToWrite();
+  sync();
+}
+
+}  // namespace orin::drivers

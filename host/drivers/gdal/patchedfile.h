@@ -1,0 +1,72 @@
+/// A file whose existing bytes a library changes in memory first, so that all changes of its
+/// structure reach the disk at once, in an order of ours, when everything they refer to is there.
+// SPDX-License-Identifier: MIT
+#pragma once
+
+#include <array>
+#include <cstdint>
+#include <map>
+#include <string>
+#include <vector>
+
+namespace orin::drivers {
+
+/// Bytes to be put over existing ones.
+struct FilePatch {
+  uint64_t position;
+  std::string bytes;
+};
+
+/// The library opens `LibraryName()`. What it appends goes to the file at once; what it writes over
+/// bytes that were there before stays here until `Commit`. Given up without it, the file is cut
+/// back to what it was. For one thread at a time.
+class PatchedFile {
+ public:
+  enum class Overwrites {
+    kWait,   ///< until `Commit`
+    kDirect  ///< go to the file at once: for pixels that nobody counts on
+  };
+
+  /// \throws orin::Exception  the file cannot be opened for writing
+  PatchedFile(std::string path, Overwrites overwrites);
+  ~PatchedFile();
+  PatchedFile(const PatchedFile&) = delete;
+  PatchedFile& operator=(const PatchedFile&) = delete;
+
+  /// Its last part is the file's own name.
+  const std::string& LibraryName() const { return libraryName_; }
+  /// The overwrites that wait and change something, by ascending position.
+  std::vector<FilePatch> Waiting() const;
+  /// Makes what was appended durable, then the waiting overwrites, each by one write.
+  /// \throws orin::Exception  a write of the library failed, or one of these does
+  void Commit();
+
+  /// Throws when a write failed, also one that the library said nothing of.
+  /// \throws orin::Exception
+  void RequireWritten() const;
+
+  // For the library. A failed write is remembered: the library may not tell.
+  size_t Read(uint64_t position, void* bytes, size_t count);
+  size_t Write(uint64_t position, const void* bytes, size_t count);
+  uint64_t Size() const { return size_; }
+
+ private:
+  static constexpr size_t kPageBytes = 4096;
+  using Page = std::array<char, kPageBytes>;
+
+  Page& PageAt(uint64_t number);
+  bool PutThrough(uint64_t position, const char* bytes, size_t count);
+  [[noreturn]] void FailToWrite() const;
+
+  std::string path_;
+  std::string libraryName_;
+  Overwrites overwrites_;
+  int descriptor_ = -1;
+  uint64_t end_ = 0;   ///< of what was there before; bytes
+  uint64_t size_ = 0;  ///< with what was appended
+  std::map<uint64_t, Page> pages_;
+  int error_ = 0;  ///< errno of the first write that failed
+  bool isCommitted_ = false;
+};
+
+}  // namespace orin::drivers
