@@ -1,0 +1,234 @@
+// SPDX-License-Identifier: MIT
+#include <gmock/gmock.h>
+
+#include "host/datasources/overviewaccessors.h"
+#include "host/drivers/gdal/hfarecord.h"
+#include "host/drivers/gdal/patchedfile.h"
+#include "tests/host/drivers/gdal/gdalfiles.h"
+
+namespace orin::tests {
+namespace {
+
+using datasources::BasicOverviewWriterAccessor;
+using datasources::IRasterWriter;
+using datasources::kUpdate;
+using drivers::FilePatch;
+using drivers::PatchedFile;
+using ::testing::HasSubstr;
+
+constexpr int kWidth = 301, kHeight = 203;
+
+class HfaLevels : public GdalFiles {
+ protected:
+  HfaLevels() : file_(File("image.img")) {
+    WritePicture(file_, "HFA", {.width = kWidth, .height = kHeight, .channels = 2});
+  }
+  std::string file_;
+};
+
+uint8_t LevelPixel(uint32_t x, uint32_t y, unsigned channel, unsigned level) {
+  return uint8_t(x * 3 + y * 5 + channel * 17 + level);
+}
+
+/// Writes the rows from `first` up to `last` of a level.
+void WriteRows(IRasterWriter& writer, uint32_t first, uint32_t last) {
+  for (uint32_t y = first; y < last; y += 64) {
+    gobs::Raster block({writer.GetWidth(), std::min(64u, last - y), writer.GetChannelCount(),
+                        writer.GetDataType()},
+                       {0, 0, 0, y});
+    uint8_t* to = block.data;
+    for (uint32_t row = 0; row < block.height; ++row)
+      for (uint32_t x = 0; x < block.width; ++x)
+        for (const unsigned channel : writer.GetChannelsInfo())
+          *to++ = LevelPixel(x, y + row, channel, writer.GetLevel());
+    writer.Write(block);
+  }
+}
+
+void Build(datasources::IRasterDataset& dataset, unsigned level,
+           const std::vector<unsigned>& channels) {
+  BasicOverviewWriterAccessor accessor(&dataset, channels);
+  accessor.SetResamplingName("NEAREST");
+  accessor.CreateLevel(level);
+  const std::unique_ptr<IRasterWriter> writer(accessor.CreateRasterWriter(level));
+  WriteRows(*writer, 0, writer->GetHeight());
+  accessor.SetLevelValid(level, true);
+}
+
+/// What is wrong with the image or its levels in the eyes of the library; empty when nothing is.
+std::string WrongPixels(const std::string& file) {
+  const drivers::GdalErrors errors;
+  const std::unique_ptr<GDALDataset> dataset(GDALDataset::Open(file.c_str()));
+  if (!dataset) return "cannot be opened: " + errors.Reason();
+  for (int channel = 1; channel <= 2; ++channel) {
+    GDALRasterBand& band = *dataset->GetRasterBand(channel);
+    std::vector<uint8_t> pixels(size_t(kWidth) * kHeight);
+    if (band.RasterIO(GF_Read, 0, 0, kWidth, kHeight, pixels.data(), kWidth, kHeight, GDT_Byte, 0,
+                      0, nullptr) != CE_None)
+      return "image cannot be read: " + errors.Reason();
+    for (int i = 0; i < kWidth * kHeight; ++i)
+      if (pixels[size_t(i)] != PatternAt(i % kWidth, i / kWidth, channel)) return "image differs";
+    for (int index = 0; index < band.GetOverviewCount(); ++index) {
+      GDALRasterBand& level = *band.GetOverview(index);
+      const int factor = (kWidth + level.GetXSize() / 2) / level.GetXSize();
+      const int width = kWidth / factor, height = kHeight / factor;
+      pixels.resize(size_t(width) * size_t(height));
+      if (level.RasterIO(GF_Read, 0, 0, width, height, pixels.data(), width, height, GDT_Byte, 0, 0,
+                         nullptr) != CE_None)
+        return "level cannot be read: " + errors.Reason();
+      for (int i = 0; i < width * height; ++i)
+        if (pixels[size_t(i)] != LevelPixel(uint32_t(i % width), uint32_t(i / width),
+                                            unsigned(channel), unsigned(factor)))
+          return "level " + std::to_string(factor) + " differs";
+    }
+  }
+  return errors.Any() ? errors.Reason() : "";
+}
+
+std::string Validity(const std::string& file, unsigned level) {
+  const auto dataset = Open(file, kUpdate);
+  for (const auto& entry : dataset->GetSource()->Levels()->List())
+    if (entry.level == level) {
+      std::string text;
+      for (size_t i = 0; i < entry.presentChannels.size(); ++i)
+        text += !entry.presentChannels[i] ? '-' : entry.validChannels[i] ? '1' : '0';
+      return text;
+    }
+  return "";
+}
+
+TEST_F(HfaLevels, AreWrittenChannelByChannelAndReadBackAsSources) {
+  const auto dataset = Open(file_, kUpdate);
+  Build(*dataset, 2, {1});
+  EXPECT_EQ("1-", Validity(file_, 2));
+  Build(*dataset, 2, {2});
+  EXPECT_EQ("11", Validity(file_, 2));
+  EXPECT_EQ("", WrongPixels(file_));
+  BasicOverviewWriterAccessor accessor(dataset.get(), {2});
+  const std::unique_ptr<IRasterWriter> source(accessor.CreateRasterWriter(2));
+  EXPECT_EQ(150u, source->GetWidth());
+  EXPECT_EQ(101u, source->GetHeight());
+  gobs::Raster block({20, 10, 1, gobs::eDT_8U}, {1, 1, 130, 91});
+  source->Read(block);
+  EXPECT_EQ(LevelPixel(130, 91, 2, 2), *PixelAddress(block, 0, 0));
+  EXPECT_EQ(LevelPixel(149, 100, 2, 2), *PixelAddress(block, 20, 10));  // the edge, repeated
+}
+
+TEST_F(HfaLevels, AreWrittenForAllChannelsAtOnce) {
+  Build(*Open(file_, kUpdate), 3, {1, 2});
+  EXPECT_EQ("11", Validity(file_, 3));
+  EXPECT_EQ("", WrongPixels(file_));
+}
+
+TEST_F(HfaLevels, ThatAreGivenUpLeaveTheFileAsItWasButForTheRecord) {
+  const auto size = std::filesystem::file_size(file_);
+  {
+    const auto dataset = Open(file_, kUpdate);
+    BasicOverviewWriterAccessor accessor(dataset.get(), {1});
+    accessor.CreateLevel(2);
+    const std::unique_ptr<IRasterWriter> writer(accessor.CreateRasterWriter(2));
+    WriteRows(*writer, 0, 64);
+    EXPECT_THAT(RefusalOf([&] { accessor.SetValid(1, 2, true); }), HasSubstr("is not complete"));
+  }
+  EXPECT_EQ("", Validity(file_, 2));
+  EXPECT_EQ("", WrongPixels(file_));
+  EXPECT_LT(std::filesystem::file_size(file_), size + 4096);
+}
+
+TEST_F(HfaLevels, LoseTheirValidityByTheFirstWriteAndKeepItLostWhenGivenUp) {
+  Build(*Open(file_, kUpdate), 2, {1, 2});
+  const auto dataset = Open(file_, kUpdate);
+  BasicOverviewWriterAccessor accessor(dataset.get(), {2});
+  accessor.CreateLevel(2);
+  EXPECT_EQ("11", Validity(file_, 2));
+  {
+    const std::unique_ptr<IRasterWriter> writer(accessor.CreateRasterWriter(2));
+    WriteRows(*writer, 0, 64);
+    EXPECT_EQ("10", Validity(file_, 2));
+  }
+  EXPECT_EQ("10", Validity(file_, 2));
+  EXPECT_EQ("", WrongPixels(file_));
+  Build(*dataset, 2, {2});
+  EXPECT_EQ("11", Validity(file_, 2));
+}
+
+TEST_F(HfaLevels, ThatTheFormatCannotTellApartAreRefused) {
+  WritePicture(File("small.img"), "HFA", {.width = 20, .height = 20, .channels = 2});
+  const auto dataset = Open(File("small.img"), kUpdate);
+  Build(*dataset, 7, {1});
+  EXPECT_THAT(RefusalOf([&] { Build(*dataset, 8, {1}); }), HasSubstr("cannot tell them apart"));
+}
+
+TEST_F(HfaLevels, AreNotWrittenWhileAnotherStoreWritesThem) {
+  const auto first = Open(file_, kUpdate);
+  const auto second = Open(file_, kUpdate);
+  Build(*first, 2, {1});
+  EXPECT_THAT(RefusalOf([&] { Build(*second, 4, {1}); }), HasSubstr("another build is writing"));
+}
+
+TEST_F(HfaLevels, OfAReadOnlyStoreCannotBeChanged) {
+  Build(*Open(file_, kUpdate), 2, {1, 2});
+  const auto dataset = Open(file_);  // levels inside are listed, new ones go beside the file
+  EXPECT_EQ(2u, dataset->GetSource()->Levels()->List().at(0).level);
+  const std::string before = BytesOf(file_);
+  dataset->GetSource()->Levels()->Create(4, {1}, "NEAREST");
+  EXPECT_EQ(before, BytesOf(file_));
+}
+
+TEST_F(HfaLevels, OfACopiedFileAreNotItsOwnAndNoneAreWrittenInside) {
+  Build(*Open(file_, kUpdate), 2, {1, 2});
+  std::filesystem::copy(file_, File("copy.img"));
+  EXPECT_THAT(RefusalOf([&] { Open(File("copy.img"), kUpdate); }),
+              HasSubstr("copy.img: holds a list of levels under another file's name"));
+  EXPECT_TRUE(Open(File("copy.img"))->GetSource()->Levels()->List().empty());
+}
+
+/// The library's own change of a file: one more level with its pixels, and an item.
+void AddLevel(const std::string& libraryName, int factor) {
+  const drivers::GdalErrors errors;
+  CPLSetThreadLocalConfigOption("GDAL_PAM_ENABLED", "NO");
+  {
+    const std::unique_ptr<GDALDataset> dataset(
+        GDALDataset::Open(libraryName.c_str(), GDAL_OF_UPDATE));
+    ASSERT_TRUE(dataset);
+    ASSERT_EQ(CE_None, dataset->BuildOverviews("NONE", 1, &factor, 0, nullptr, nullptr, nullptr));
+    for (int channel = 1; channel <= 2; ++channel) {
+      GDALRasterBand& band = *dataset->GetRasterBand(channel);
+      GDALRasterBand& level = *band.GetOverview(band.GetOverviewCount() - 1);
+      for (int y = 0; y < level.GetYSize(); ++y) {
+        std::vector<uint8_t> row(size_t(level.GetXSize()));
+        for (size_t x = 0; x < row.size(); ++x)
+          row[x] = LevelPixel(uint32_t(x), uint32_t(y), unsigned(channel), unsigned(factor));
+        ASSERT_EQ(CE_None, level.RasterIO(GF_Write, 0, y, level.GetXSize(), 1, row.data(),
+                                          level.GetXSize(), 1, GDT_Byte, 0, 0, nullptr));
+      }
+    }
+    dataset->SetMetadataItem(drivers::HfaRecordKey(unsigned(factor)).c_str(), "record");
+  }
+  CPLSetThreadLocalConfigOption("GDAL_PAM_ENABLED", nullptr);
+  EXPECT_FALSE(errors.Any()) << errors.Reason();
+}
+
+/// The process may end between any two of the writes that a commit consists of.
+TEST_F(HfaLevels, AreWholeOrAbsentAfterEveryWriteOfACommit) {
+  std::filesystem::create_directory(File("state"));
+  for (const int factor : {2, 3, 5, 9, 17}) {
+    PatchedFile patched(file_, PatchedFile::Overwrites::kWait);
+    AddLevel(patched.LibraryName(), factor);
+    const std::vector<FilePatch> patches = patched.Waiting();
+    EXPECT_FALSE(patches.empty());
+    std::string state = BytesOf(file_);  // everything is appended
+    for (size_t done = 0; done <= patches.size(); ++done) {
+      if (done > 0)
+        state.replace(patches[done - 1].position, patches[done - 1].bytes.size(),
+                      patches[done - 1].bytes);
+      WriteBytes(File("state/image.img"), state);  // its own name is stored in the file
+      EXPECT_EQ("", WrongPixels(File("state/image.img"))) << factor << " after " << done;
+    }
+    patched.Commit();
+    EXPECT_EQ(state, BytesOf(file_));
+  }
+}
+
+}  // namespace
+}  // namespace orin::tests

@@ -1,0 +1,119 @@
+// SPDX-License-Identifier: MIT
+#include "host/drivers/gdal/patchedfile.h"
+
+#include <cpl_vsi.h>
+
+#include "tests/host/drivers/gdal/gdalfiles.h"
+
+namespace orin::tests {
+namespace {
+
+using drivers::FilePatch;
+using drivers::PatchedFile;
+using Overwrites = PatchedFile::Overwrites;
+
+class Patched : public GdalFiles {
+ protected:
+  Patched() : path_(File("file.bin")), before_(10000, 'a') { WriteBytes(path_, before_); }
+
+  std::string path_;
+  std::string before_;
+};
+
+/// What the library reads.
+std::string Seen(const PatchedFile& file) {
+  std::string bytes(20000, '\0');
+  VSILFILE* handle = VSIFOpenL(file.LibraryName().c_str(), "rb");
+  bytes.resize(VSIFReadL(bytes.data(), 1, bytes.size(), handle));
+  VSIFCloseL(handle);
+  return bytes;
+}
+
+void PutAt(const PatchedFile& file, uint64_t position, const std::string& bytes) {
+  VSILFILE* handle = VSIFOpenL(file.LibraryName().c_str(), "r+b");
+  ASSERT_TRUE(handle);
+  VSIFSeekL(handle, position, SEEK_SET);
+  EXPECT_EQ(bytes.size(), VSIFWriteL(bytes.data(), 1, bytes.size(), handle));
+  VSIFCloseL(handle);
+}
+
+TEST_F(Patched, ShowsTheLibraryWhatItWroteAndKeepsItFromTheFile) {
+  PatchedFile file(path_, Overwrites::kWait);
+  PutAt(file, 4090, "0123456789");
+  std::string expected = before_;
+  expected.replace(4090, 10, "0123456789");
+  EXPECT_TRUE(expected == Seen(file));
+  EXPECT_TRUE(before_ == BytesOf(path_));
+}
+
+TEST_F(Patched, AppendsAtOnceAndOverwritesWhenCommitted) {
+  PatchedFile file(path_, Overwrites::kWait);
+  PutAt(file, 9998, "0123");
+  EXPECT_TRUE(before_ + "23" == BytesOf(path_));
+  const std::string after = before_.substr(0, 9998) + "0123";
+  EXPECT_TRUE(after == Seen(file));
+  file.Commit();
+  EXPECT_TRUE(after == BytesOf(path_));
+}
+
+TEST_F(Patched, IsAsItWasWithoutACommit) {
+  {
+    PatchedFile file(path_, Overwrites::kWait);
+    PutAt(file, 10, "x");
+    PutAt(file, 10000, std::string(5000, 'z'));
+  }
+  EXPECT_TRUE(before_ == BytesOf(path_));
+}
+
+TEST_F(Patched, WaitsOnlyWithWhatChangesSomethingInOneWriteEach) {
+  PatchedFile file(path_, Overwrites::kWait);
+  PutAt(file, 9000, "x");
+  PutAt(file, 100, "aaaa");  // what is there already
+  PutAt(file, 500, "yaay");
+  const std::vector<FilePatch> waiting = file.Waiting();
+  ASSERT_EQ(2u, waiting.size());
+  EXPECT_EQ(500u, waiting[0].position);
+  EXPECT_EQ("yaay", waiting[0].bytes);
+  EXPECT_EQ(9000u, waiting[1].position);
+  EXPECT_EQ("x", waiting[1].bytes);
+}
+
+TEST_F(Patched, NeverCutsANumberThatLiesAcrossTwoPages) {
+  PatchedFile file(path_, Overwrites::kWait);
+  PutAt(file, 4094, "1234");
+  const std::vector<FilePatch> waiting = file.Waiting();
+  ASSERT_EQ(1u, waiting.size());
+  EXPECT_EQ(4094u, waiting[0].position);
+  EXPECT_EQ("1234", waiting[0].bytes);
+}
+
+TEST_F(Patched, JoinsChangesOfNeighbouringPagesWithWhatLiesBetween) {
+  PatchedFile file(path_, Overwrites::kWait);
+  PutAt(file, 4000, "x");
+  PutAt(file, 4200, "y");
+  const std::vector<FilePatch> waiting = file.Waiting();
+  ASSERT_EQ(1u, waiting.size());
+  EXPECT_EQ("x" + std::string(199, 'a') + "y", waiting[0].bytes);
+}
+
+TEST_F(Patched, OverwritesAtOnceWhenThatIsAskedFor) {
+  PatchedFile file(path_, Overwrites::kDirect);
+  PutAt(file, 10, "x");
+  EXPECT_EQ('x', BytesOf(path_)[10]);
+}
+
+TEST_F(Patched, LetsTheLibraryMakeNoOtherFile) {
+  PatchedFile file(path_, Overwrites::kWait);
+  const std::string folder = file.LibraryName().substr(0, file.LibraryName().rfind('/') + 1);
+  EXPECT_EQ("file.bin", file.LibraryName().substr(folder.size()));
+  EXPECT_EQ(nullptr, VSIFOpenL((folder + "file.ige").c_str(), "wb"));
+  EXPECT_EQ(nullptr, VSIFOpenL((folder + "file.ige").c_str(), "r+b"));
+}
+
+TEST_F(Patched, ThatCannotBeOpenedIsRefusedByName) {
+  EXPECT_EQ(File("none") + ": cannot be opened for writing: No such file or directory.",
+            RefusalOf([&] { PatchedFile(File("none"), Overwrites::kWait); }));
+}
+
+}  // namespace
+}  // namespace orin::tests

@@ -1,0 +1,142 @@
+// SPDX-License-Identifier: MIT
+#include <gmock/gmock.h>
+
+#include <limits>
+
+#include "host/drivers/gdal/gdalbands.h"
+#include "host/drivers/gdal/gdalsource.h"
+#include "tests/host/drivers/gdal/gdalfiles.h"
+
+namespace orin::tests {
+namespace {
+
+using datasources::AuxiliaryData;
+using ::testing::HasSubstr;
+
+/// What the source says of a picture stored as a virtual raster over TIFF, which keeps every type.
+class GdalSource : public GdalFiles {
+ protected:
+  std::unique_ptr<datasources::IRasterDataset> OpenVrt(
+      const Picture& picture, const std::function<void(GDALDataset&)>& edit = [](GDALDataset&) {}) {
+    WritePicture(File("image.tif"), "GTiff", picture);
+    const std::unique_ptr<GDALDataset> source(GDALDataset::Open(File("image.tif").c_str()));
+    const std::unique_ptr<GDALDataset> vrt(
+        GetGDALDriverManager()->GetDriverByName("VRT")->CreateCopy(
+            File("image.vrt").c_str(), source.get(), FALSE, nullptr, nullptr, nullptr));
+    edit(*vrt);
+    vrt->FlushCache(false);
+    return Open(File("image.vrt"));
+  }
+};
+
+std::string FileNoData(datasources::IRasterDataset& dataset) {
+  return dataset.GetSource()->MetadataOf({1}).GetFileMetadataValue(datasources::kNoDataKey);
+}
+std::string ChannelNoData(datasources::IRasterDataset& dataset, unsigned channel) {
+  return dataset.GetSource()->MetadataOf({channel}).GetChanMetadataValue(datasources::kNoDataKey,
+                                                                         1);
+}
+
+TEST_F(GdalSource, TellsEveryType) {
+  const std::pair<GDALDataType, gobs::DataType> types[] = {
+      {GDT_Byte, gobs::eDT_8U},
+      {GDT_UInt16, gobs::DataTypeOf<uint16_t>()},
+      {GDT_Int16, gobs::DataTypeOf<int16_t>()},
+      {GDT_UInt32, gobs::DataTypeOf<uint32_t>()},
+      {GDT_Int32, gobs::DataTypeOf<int32_t>()},
+      {GDT_UInt64, gobs::DataTypeOf<uint64_t>()},
+      {GDT_Int64, gobs::DataTypeOf<int64_t>()},
+      {GDT_Float32, gobs::DataTypeOf<float>()},
+      {GDT_Float64, gobs::DataTypeOf<double>()},
+      {GDT_CInt16, gobs::DataTypeOf<int16_t>(true)},
+      {GDT_CInt32, gobs::DataTypeOf<int32_t>(true)},
+      {GDT_CFloat32, gobs::DataTypeOf<float>(true)},
+      {GDT_CFloat64, gobs::DataTypeOf<double>(true)}};
+  for (const auto& [stored, told] : types)
+    EXPECT_EQ(told, OpenVrt({.type = stored})->GetSource()->TypeOf(1))
+        << GDALGetDataTypeName(stored);
+}
+
+TEST_F(GdalSource, TellsOneBitSamplesAndSignedBytes) {
+  WritePicture(File("bits.img"), "HFA", {.options = {"NBITS=1"}});
+  EXPECT_EQ(gobs::eDT_BIT, Open(File("bits.img"))->GetSource()->TypeOf(1));
+  WritePicture(File("signed.img"), "HFA", {.options = {"PIXELTYPE=SIGNEDBYTE"}});
+  EXPECT_EQ(gobs::DataTypeOf<int8_t>(), Open(File("signed.img"))->GetSource()->TypeOf(1));
+}
+
+TEST_F(GdalSource, AnswersANoDataValueForTheFileWhenAllChannelsAgree) {
+  const auto dataset = OpenVrt({.channels = 2}, [](GDALDataset& vrt) {
+    vrt.GetRasterBand(1)->SetNoDataValue(200);
+    vrt.GetRasterBand(2)->SetNoDataValue(200);
+  });
+  EXPECT_EQ("200", FileNoData(*dataset));
+  EXPECT_EQ("", ChannelNoData(*dataset, 1));
+}
+
+TEST_F(GdalSource, AnswersANoDataValueForEachChannelWhenTheyDiffer) {
+  const auto dataset = OpenVrt({.channels = 3}, [](GDALDataset& vrt) {
+    vrt.GetRasterBand(1)->SetNoDataValue(1);
+    vrt.GetRasterBand(3)->SetNoDataValue(3.5);
+  });
+  EXPECT_EQ("", FileNoData(*dataset));
+  EXPECT_EQ("1", ChannelNoData(*dataset, 1));
+  EXPECT_EQ("", ChannelNoData(*dataset, 2));
+  EXPECT_EQ("3.5", ChannelNoData(*dataset, 3));
+}
+
+TEST_F(GdalSource, KeepsAllDigitsOfSixtyFourBits) {
+  const auto least = OpenVrt({.type = GDT_Int64}, [](GDALDataset& vrt) {
+    vrt.GetRasterBand(1)->SetNoDataValueAsInt64(std::numeric_limits<int64_t>::min());
+  });
+  EXPECT_EQ("-9223372036854775808", FileNoData(*least));
+  const auto most = OpenVrt({.type = GDT_UInt64}, [](GDALDataset& vrt) {
+    vrt.GetRasterBand(1)->SetNoDataValueAsUInt64(std::numeric_limits<uint64_t>::max());
+  });
+  EXPECT_EQ("18446744073709551615", FileNoData(*most));
+}
+
+TEST_F(GdalSource, AnswersNoTextThatIsNoFiniteNumber) {
+  const auto dataset = OpenVrt({.type = GDT_Float32}, [](GDALDataset& vrt) {
+    vrt.GetRasterBand(1)->SetNoDataValue(std::numeric_limits<double>::quiet_NaN());
+  });
+  EXPECT_EQ("", FileNoData(*dataset));
+  const std::unique_ptr<GDALDataset> vrt(GDALDataset::Open(File("image.vrt").c_str()));
+  EXPECT_EQ("nan", drivers::NoDataTextOf(vrt->GetRasterBand(1)));
+}
+
+TEST_F(GdalSource, PassesOnMetadata) {
+  const auto dataset = OpenVrt({}, [](GDALDataset& vrt) {
+    vrt.SetMetadataItem("SENSOR", "camera");
+    vrt.GetRasterBand(1)->SetMetadataItem("COLOUR", "red=1");
+  });
+  const AuxiliaryData metadata = dataset->GetSource()->MetadataOf({1});
+  EXPECT_EQ("camera", metadata.GetFileMetadataValue("SENSOR"));
+  EXPECT_EQ("red=1", metadata.GetChanMetadataValue("COLOUR", 1));
+}
+
+TEST_F(GdalSource, TellsWhichChannelIsOpacity) {
+  WritePicture(File("rgba.png"), "PNG", {.channels = 4});
+  const auto dataset = Open(File("rgba.png"));
+  EXPECT_EQ(4u, dynamic_cast<drivers::GdalSource&>(*dataset->GetSource()).AlphaChannel());
+  WritePicture(File("rgb.png"), "PNG", {.channels = 3});
+  const auto opaque = Open(File("rgb.png"));
+  EXPECT_EQ(0u, dynamic_cast<drivers::GdalSource&>(*opaque->GetSource()).AlphaChannel());
+}
+
+TEST_F(GdalSource, HasNoLevelsOfItsOwnButInErdasImagine) {
+  WritePicture(File("image.jpg"), "JPEG", {.width = 2000, .height = 2000});
+  EXPECT_EQ(nullptr, Open(File("image.jpg"))->GetSource()->Levels());
+}
+
+TEST_F(GdalSource, RefusesToReadChannelsOfDifferentTypesTogether) {
+  const auto dataset = OpenVrt({}, [](GDALDataset& vrt) { vrt.AddBand(GDT_Float32, nullptr); });
+  EXPECT_EQ(gobs::DataTypeOf<float>(), dataset->GetSource()->TypeOf(2));
+  EXPECT_TRUE(dataset->GetSource()->OpenReader({2}));
+  EXPECT_THAT(RefusalOf([&] {
+                dataset->GetSource()->OpenReader({1, 2});
+              }),
+              HasSubstr("image.vrt: its channels differ in type"));
+}
+
+}  // namespace
+}  // namespace orin::tests
