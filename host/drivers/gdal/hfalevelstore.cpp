@@ -112,6 +112,12 @@ void HfaLevelStore::LockFile() {
          path_);
 }
 
+void HfaLevelStore::Remove(const std::vector<unsigned>& levels) {
+  for (const unsigned level : levels)
+    if (!PositionsOf(level, {1}).empty())
+      Fail(_("%s: level %u stands inside, from where this format has no way to remove it."), level);
+}
+
 /// The format rounds up; what we make ends where it should.
 unsigned HfaLevelStore::WidthOf(unsigned level, bool isOurs) const {
   return image_.Width() / level + (!isOurs && image_.Width() % level != 0);

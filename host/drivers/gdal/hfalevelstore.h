@@ -53,6 +53,7 @@ class HfaLevelStore final : public datasources::ILevelStore {
   std::unique_ptr<datasources::IRasterWriter> OpenWriter(
       unsigned level, const std::vector<unsigned>& channels) override;
   void SetValid(unsigned level, const std::vector<unsigned>& channels, bool valid) override;
+  void Remove(const std::vector<unsigned>& levels) override;
 
   // For the level writers.
 
