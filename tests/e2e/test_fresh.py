@@ -153,7 +153,7 @@ class Edited(FreshCase):
     def test_a_tile_that_was_left_out_counts(self):
         dataset = gdal.GetDriverByName("GTiff").Create(
             self.file, 1000, 1000, 1, gdal.GDT_Byte, ["TILED=YES", "SPARSE_OK=TRUE"])
-        dataset.GetRasterBand(1).WriteArray(self.pixels[0], 256, 256)
+        dataset.GetRasterBand(1).WriteArray(self.pixels[0], 190, 390)
         del dataset
         self.build("--external")
         self.assertStates("current", "current")

@@ -88,10 +88,12 @@ void LevelFreshness::Prepare(const std::optional<ImageStamp>& start) {
   if (start) watch_->Start(*start);
 }
 
-ImageRecord LevelFreshness::RecordSince(const std::optional<ImageStamp>& start) {
+ImageRecord LevelFreshness::RecordSince(const std::optional<ImageStamp>& start, bool wasTouched) {
   if (!start) return {};
   std::string fingerprint = watch_->Fingerprint(*start);
-  if (!isInImage_ && watch_->Stamp() != start)
+  const bool hasChanged =
+      isInImage_ ? wasTouched && watch_->Again() != fingerprint : watch_->Stamp() != start;
+  if (hasChanged)
     throw Exception(FormatString(_("%s: was changed by another program while a level was computed "
                                    "from it. Run again when nobody writes to it."),
                                  watch_->File().c_str()),

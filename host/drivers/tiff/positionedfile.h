@@ -5,6 +5,7 @@
 
 #include <cstddef>
 #include <cstdint>
+#include <mutex>
 #include <string>
 
 namespace orin::drivers {
@@ -37,6 +38,10 @@ class PositionedFile {
   /// Sets the modification time, nanoseconds since 1970, as finely as the file system keeps it.
   /// \returns the time that it has then, which is another one where it may not be set
   int64_t SetModified(int64_t nanoseconds);
+  /// True when the file's time showed, before one of the changes made through this object since the
+  /// last call, that somebody else wrote to it or set its time. What falls into the same tick of
+  /// the system's clock escapes.
+  bool TakeWasTouched();
   /// Keeps other programs that ask for it from changing the file, until this object goes.
   /// \throws orin::Exception  another one has it
   void Lock();
@@ -44,8 +49,14 @@ class PositionedFile {
   void Rename(const std::string& path);
 
  private:
+  int64_t Modified() const;
+  void NoteTouch();
+
   std::string path_;
   int descriptor_;
+  std::mutex mutex_;          // held while the file is changed
+  int64_t lastModified_ = 0;  ///< after the last change by this object, or when it was opened
+  bool wasTouched_ = false;
 };
 
 }  // namespace orin::drivers
