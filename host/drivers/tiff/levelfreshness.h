@@ -61,6 +61,7 @@ class LevelFreshness {
   std::shared_ptr<datasources::ImageWatch> watch_;
   bool isInImage_;
   bool isChanging_ = false;
+  bool wasKnown_ = false;                          ///< the fingerprint, when the changes began
   std::optional<datasources::ImageStamp> before_;  ///< of the image, when the changes began
 };
 

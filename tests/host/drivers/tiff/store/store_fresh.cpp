@@ -198,24 +198,31 @@ TEST_F(Fresh, LevelThatAnotherProgramTookOverIsUnverified) {
 }
 
 TEST_F(Fresh, EditDuringABuildIntoTheFileItselfGivesNoValidLevel) {
-  unsigned blocks = 0;
-  const auto editing = [&](unsigned) {
-    if (++blocks == 3) Flip(file_, TileAt(file_, 3).first);
+  const auto editing = [&](unsigned block) {
+    if (block == 3) Flip(file_, TileAt(file_, 3).first), SetTime(7000);
     return true;
   };
-  EXPECT_THROW(Build(file_, kImage, {.level = 2, .edge = 40, .goesOn = editing}), Exception);
+  const LevelBuilding two{.level = 2, .edge = 40, .goesOn = editing};
+  EXPECT_THROW(Build(file_, kImage, two), Exception);
   EXPECT_TRUE(LevelsOf(file_).empty());
+  Build(file_, kImage, {.level = 2});
+  const LevelBuilding four{.level = 4, .edge = 10, .goesOn = editing};
+  EXPECT_THROW(Build(file_, kImage, four), Exception);
+  ASSERT_EQ(1u, LevelsOf(file_).size());
+  EXPECT_EQ(LevelStatus::kStale, Level().status);
 }
 
-TEST_F(Fresh, TouchDuringABuildDoesNoHarm) {
-  unsigned blocks = 0;
-  const auto touching = [&](unsigned) {
-    if (++blocks == 3) SetTime(7000);
+TEST_F(Fresh, TouchDuringABuildDoesNoHarmToAnImageThatWasKnownBefore) {
+  Build(file_, kImage, {.level = 2});
+  const auto touching = [&](unsigned block) {
+    if (block == 3) SetTime(7000);
     return true;
   };
-  Build(file_, kImage, {.level = 2, .edge = 40, .goesOn = touching});
-  EXPECT_EQ(LevelStatus::kCurrent, Level().status);
-  EXPECT_EQ(Level().image.stamp.bytes, std::filesystem::file_size(file_));
+  Build(file_, kImage, {.level = 4, .edge = 10, .goesOn = touching});
+  for (const LevelDescription& level : LevelsOf(file_)) {
+    EXPECT_EQ(LevelStatus::kCurrent, level.status);
+    EXPECT_EQ(level.image.stamp.bytes, std::filesystem::file_size(file_));
+  }
 }
 
 TEST_F(Fresh, ImageThatChangesDuringABuildBesideItGivesNoValidLevel) {
