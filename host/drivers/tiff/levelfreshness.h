@@ -45,8 +45,8 @@ class LevelFreshness {
   /// \param start  when the computation of a level began
   void Prepare(const std::optional<datasources::ImageStamp>& start);
   /// What a level that was computed from the image remembers; blank when nothing can be told.
-  /// \param wasTouched  somebody else may have written to the image's file while levels were written
-  ///                    into it
+  /// \param wasTouched  somebody else may have written to the image's file since then, while levels
+  ///                    were written into it
   /// \throws orin::Exception  another program has changed the image since `start`
   datasources::ImageRecord RecordSince(const std::optional<datasources::ImageStamp>& start,
                                        bool wasTouched);
