@@ -1,4 +1,5 @@
-/// The sub-command `info`: lists the levels of a file, wherever they are. Writes nothing.
+/// The sub-command `info`: lists the levels of a file, wherever they are, and whether they match
+/// it.
 // SPDX-License-Identifier: MIT
 #pragma once
 

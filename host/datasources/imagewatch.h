@@ -50,6 +50,8 @@ class ImageWatch {
   /// The fingerprint: known, waited for, or computed now from what the files hold now. Empty when
   /// it cannot be computed.
   std::string Fingerprint(const ImageStamp& stamp);
+  /// The fingerprint computed now, whatever is known. Empty when it cannot be computed.
+  std::string Again() const { return Compute({}); }
 
  private:
   std::string Compute(const std::stop_token& stop) const;

@@ -167,7 +167,10 @@ class Info(Case):
         inside, beside = answer["levels"]
         self.assertEqual({"level": 2, "width": 501, "height": 388, "place": "internal",
                           "file": self.file, "method": "NEAREST", "sourceLevel": 1,
-                          "program": program, "channels": valid}, inside)
+                          "program": program, "state": "current",
+                          "fingerprint": beside["fingerprint"], "channels": valid}, inside)
+        self.assertRegex(inside["fingerprint"], "^[0-9a-f]{32}$")
+        self.assertEqual("current", beside["state"])
         found = [beside[key] for key in ("place", "file", "level", "width", "height")]
         self.assertEqual(["side-car", self.file + ".ovr", 4, 250, 194], found)
 
@@ -179,7 +182,7 @@ class Info(Case):
         self.assertRegex(lines[2], r"^2 +501 x 388 +inside +NEAREST +1 +yes +Orin Overviews")
         self.assertRegex(lines[3], r"^4 +250 x 194 +inside +NEAREST +2 +yes +Orin Overviews")
 
-    def test_it_writes_nothing(self):
+    def test_it_writes_nothing_when_size_and_time_tell_all(self):
         before = (os.stat(self.file), sorted(os.listdir(self.folder)))
         run("info", self.file)
         self.assertEqual(before[0].st_mtime_ns, os.stat(self.file).st_mtime_ns)

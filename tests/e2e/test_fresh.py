@@ -153,7 +153,7 @@ class Edited(FreshCase):
     def test_a_tile_that_was_left_out_counts(self):
         dataset = gdal.GetDriverByName("GTiff").Create(
             self.file, 1000, 1000, 1, gdal.GDT_Byte, ["TILED=YES", "SPARSE_OK=TRUE"])
-        dataset.GetRasterBand(1).WriteArray(self.pixels[0], 256, 256)
+        dataset.GetRasterBand(1).WriteArray(self.pixels[0], 190, 390)
         del dataset
         self.build("--external")
         self.assertStates("current", "current")
@@ -162,6 +162,11 @@ class Edited(FreshCase):
 
 
 class NotEdited(FreshCase):
+    def setUp(self):
+        super().setUp()
+        if subprocess.run(["strace", "-o", os.devnull, "true"], check=False).returncode != 0:
+            self.skipTest("system calls cannot be traced here")
+
     def check_answered_at_once(self, path):
         """The second answer reads no pixels; the first one had to."""
         first, second = bytes_read("info", path), bytes_read("info", path)

@@ -48,6 +48,8 @@ class LevelFile {
   void Sync();
   /// \see PositionedFile::SetModified
   int64_t SetModified(int64_t nanoseconds);
+  /// \see PositionedFile::TakeWasTouched
+  bool TakeWasTouched() { return file_ && file_->TakeWasTouched(); }
   /// Makes a directory visible, durably: everything appended before is on the device first. The
   /// structure is read again.
   void Link(const Place& place, uint64_t directory);

@@ -76,6 +76,7 @@ void LevelFreshness::BeginChange(const std::vector<StoredLevel>& levels) {
   before_ = watch_->Stamp();
   isChanging_ = isInImage_;
   if (before_) Trust(levels, *before_);
+  wasKnown_ = before_ && watch_->Known(*before_);
 }
 
 void LevelFreshness::EndChange(const std::optional<ImageStamp>& now) {
@@ -88,10 +89,13 @@ void LevelFreshness::Prepare(const std::optional<ImageStamp>& start) {
   if (start) watch_->Start(*start);
 }
 
-ImageRecord LevelFreshness::RecordSince(const std::optional<ImageStamp>& start) {
+ImageRecord LevelFreshness::RecordSince(const std::optional<ImageStamp>& start, bool wasTouched) {
   if (!start) return {};
   std::string fingerprint = watch_->Fingerprint(*start);
-  if (!isInImage_ && watch_->Stamp() != start)
+  // A fingerprint that was computed meanwhile may be of the data before or after a touch.
+  const auto isAsBefore = [&] { return wasKnown_ && watch_->Again() == fingerprint; };
+  const bool hasChanged = isInImage_ ? wasTouched && !isAsBefore() : watch_->Stamp() != start;
+  if (hasChanged)
     throw Exception(FormatString(_("%s: was changed by another program while a level was computed "
                                    "from it. Run again when nobody writes to it."),
                                  watch_->File().c_str()),

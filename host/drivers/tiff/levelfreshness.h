@@ -45,8 +45,11 @@ class LevelFreshness {
   /// \param start  when the computation of a level began
   void Prepare(const std::optional<datasources::ImageStamp>& start);
   /// What a level that was computed from the image remembers; blank when nothing can be told.
+  /// \param wasTouched  somebody else may have written to the image's file since then, while levels
+  ///                    were written into it
   /// \throws orin::Exception  another program has changed the image since `start`
-  datasources::ImageRecord RecordSince(const std::optional<datasources::ImageStamp>& start);
+  datasources::ImageRecord RecordSince(const std::optional<datasources::ImageStamp>& start,
+                                       bool wasTouched);
   /// The fingerprint of `Now()`, if it is known without reading; else empty.
   std::string KnownFingerprint() const;
 
@@ -58,6 +61,7 @@ class LevelFreshness {
   std::shared_ptr<datasources::ImageWatch> watch_;
   bool isInImage_;
   bool isChanging_ = false;
+  bool wasKnown_ = false;                          ///< the fingerprint, when the changes began
   std::optional<datasources::ImageStamp> before_;  ///< of the image, when the changes began
 };
 

@@ -16,7 +16,7 @@ using datasources::ImageStamp;
 ImageRecord TiffLevelStore::RecordOrGiveUp(unsigned level, const Pending& pending) {
   if (source_) return *source_;
   try {
-    return freshness_.RecordSince(pending.imageAtStart);
+    return freshness_.RecordSince(pending.imageAtStart, file_->TakeWasTouched());
   } catch (const Exception&) {
     const std::shared_ptr<LevelBuild> build = pending.build;
     GiveUp(level, *build);

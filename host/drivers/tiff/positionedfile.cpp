@@ -27,6 +27,8 @@ namespace {
                   function, 0);
 }
 
+constexpr int64_t kSecond = 1000000000;  // nanoseconds
+
 constexpr char kCannotWrite[] =
     "%s: cannot be written: %s. Free space or change the permissions, "
     "then run again.";
@@ -78,6 +80,7 @@ PositionedFile::PositionedFile(std::string path, Mode mode)
     Fail(mode == Mode::kRead ? _("%s: cannot be opened: %s.")
                              : _("%s: cannot be opened for writing: %s."),
          path_, std::strerror(errno), "PositionedFile::PositionedFile(std::string, Mode)");
+  lastModified_ = Modified();
 }
 
 PositionedFile::~PositionedFile() { close(descriptor_); }
@@ -134,6 +137,8 @@ void PositionedFile::Read(uint64_t position, void* bytes, size_t count) const {
 
 void PositionedFile::Write(uint64_t position, const void* bytes, size_t count) {
   constexpr char kFunction[] = "PositionedFile::Write(uint64_t, const void*, size_t)";
+  const std::lock_guard lock(mutex_);
+  NoteTouch();
   const auto* from = static_cast<const uint8_t*>(bytes);
   while (count > 0) {
     const ssize_t put = pwrite(descriptor_, from, count, static_cast<off_t>(position));
@@ -144,6 +149,24 @@ void PositionedFile::Write(uint64_t position, const void* bytes, size_t count) {
     position += static_cast<uint64_t>(put);
     count -= static_cast<size_t>(put);
   }
+  lastModified_ = Modified();
+}
+
+int64_t PositionedFile::Modified() const {
+  struct stat status;
+  if (fstat(descriptor_, &status) != 0) return 0;
+  return status.st_mtim.tv_sec * kSecond + status.st_mtim.tv_nsec;
+}
+
+void PositionedFile::NoteTouch() {
+  if (Modified() != lastModified_) wasTouched_ = true;
+}
+
+bool PositionedFile::TakeWasTouched() {
+  const std::lock_guard lock(mutex_);
+  NoteTouch();
+  lastModified_ = Modified();
+  return std::exchange(wasTouched_, false);
 }
 
 void PositionedFile::Sync() {
@@ -152,13 +175,17 @@ void PositionedFile::Sync() {
 }
 
 void PositionedFile::Truncate(uint64_t size) {
+  const std::lock_guard lock(mutex_);
+  NoteTouch();
   if (Repeated([&] { return ftruncate(descriptor_, static_cast<off_t>(size)); }) != 0)
     Fail(_("%s: cannot be shortened: %s."), path_, std::strerror(errno),
          "PositionedFile::Truncate(uint64_t)");
+  lastModified_ = Modified();
 }
 
 int64_t PositionedFile::SetModified(int64_t nanoseconds) {
-  constexpr int64_t kSecond = 1000000000;
+  const std::lock_guard lock(mutex_);
+  NoteTouch();
   int64_t seconds = nanoseconds / kSecond;
   if (nanoseconds % kSecond < 0) --seconds;  // times before 1970
   timespec times[2] = {};
@@ -166,11 +193,8 @@ int64_t PositionedFile::SetModified(int64_t nanoseconds) {
   times[1].tv_sec = seconds;
   times[1].tv_nsec = nanoseconds - seconds * kSecond;
   futimens(descriptor_, times);  // refused to those who do not own the file
-  struct stat status;
-  if (fstat(descriptor_, &status) != 0)
-    Fail(_("%s: cannot be looked at: %s."), path_, std::strerror(errno),
-         "PositionedFile::SetModified(int64_t)");
-  return status.st_mtim.tv_sec * kSecond + status.st_mtim.tv_nsec;
+  lastModified_ = Modified();
+  return lastModified_;
 }
 
 void PositionedFile::Rename(const std::string& path) {

@@ -6,6 +6,7 @@
 #include <cstddef>
 #include <cstdint>
 #include <functional>
+#include <mutex>
 #include <string>
 
 namespace orin::drivers {
@@ -38,6 +39,10 @@ class PositionedFile {
   /// Sets the modification time, nanoseconds since 1970, as finely as the file system keeps it.
   /// \returns the time that it has then, which is another one where it may not be set
   int64_t SetModified(int64_t nanoseconds);
+  /// True when the file's time showed, before one of the changes made through this object since the
+  /// last call, that somebody else wrote to it or set its time. What falls into the same tick of
+  /// the system's clock escapes.
+  bool TakeWasTouched();
   /// Keeps other programs that ask for it from changing the file, until this object goes.
   /// \throws orin::Exception  another one has it (the text says who), or another file has taken over
   ///                          the name since this one was opened
@@ -53,8 +58,14 @@ class PositionedFile {
   bool DoAlone(const std::function<void()>& action);
 
  private:
+  int64_t Modified() const;
+  void NoteTouch();
+
   std::string path_;
   int descriptor_;
+  std::mutex mutex_;          // held while the file is changed
+  int64_t lastModified_ = 0;  ///< after the last change by this object, or when it was opened
+  bool wasTouched_ = false;
 };
 
 }  // namespace orin::drivers
