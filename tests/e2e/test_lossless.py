@@ -196,6 +196,15 @@ class WithLoss(InMemory):
         self.assertSamePixels(nearest(read_pixels(self.file), 1, 2, (400, 300)),
                               read_pixels(self.file, 0))
 
+    def test_all_channels_beside_the_file_have_the_quality_asked_for(self):
+        write_tiff(self.file, self.smooth, "Byte", ["PHOTOMETRIC=RGB"])
+        self.assertRan(run("build", self.file, "--levels", "2", "--external", "--co",
+                           "COMPRESS=JPEG", "--co", "QUALITY=97"))
+        tables = [luminance_table(stored_tiles(self.file + ".ovr", 1, channel)[0])
+                  for channel in (1, 2, 3)]
+        self.assertEqual([tables[0]] * 3, tables)
+        self.assertLess(max(tables[0]), 10)  # 255 and so on at low qualities
+
     def test_loss_in_the_levels_of_a_lossless_image_is_the_users_choice(self):
         write_tiff(self.file, self.smooth, "Byte", ["COMPRESS=LZW", "PHOTOMETRIC=RGB"])
         exact = nearest(self.smooth, 1, 2, (400, 300))
@@ -212,10 +221,10 @@ class WithLoss(InMemory):
         self.assertEqual(0, errors[3])
 
 
-def stored_tiles(path, index):
+def stored_tiles(path, index, channel=1):
     """The stored bytes of the tiles or strips of a directory, tables of a JPEG in front."""
     dataset = gdal.Open(f"GTIFF_DIR:{index}:{path}")
-    band = dataset.GetRasterBand(1)
+    band = dataset.GetRasterBand(channel)
     tables = band.GetMetadataItem("JPEGTABLES", "TIFF")
     head = bytes.fromhex(tables)[:-2] if tables else b""
     width, height = band.GetBlockSize()

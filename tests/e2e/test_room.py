@@ -156,7 +156,7 @@ class FreeSpace(Case):
         for place in ("--internal", "--external"):
             answer = run("build", file, place)
             self.assertRan(answer, 5)
-            self.assertRegex(answer.stderr, r"the levels need about \d{6} bytes .* \d+ bytes .*free")
+            self.assertRegex(answer.stderr, r"need about \d{6} bytes .* \d+ bytes .* are free")
             with open(file, "rb") as opened:
                 self.assertEqual(before, opened.read())
             self.assertEqual(["other", "scene.tif"], sorted(os.listdir(disk)))

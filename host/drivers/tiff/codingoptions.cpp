@@ -100,7 +100,7 @@ std::string ObstacleIn(const LevelCoding& coding) {
           "WebP stores 3 or 4 interleaved channels of 8 bits only, and a file beside the image "
           "keeps channels apart");
   }
-  if (const std::string change = UnfaithfulnessOf(coding); !change.empty()) return change;
+  if (std::string change = UnfaithfulnessOf(coding); !change.empty()) return change;
   if (TileEncoder::CanEncode(coding)) return "";
   return FormatString(_("it does not take %u channels of %u bits in this form"),
                       format.samplesPerPixel, format.bitsPerSample);

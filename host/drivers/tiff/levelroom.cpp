@@ -1,6 +1,6 @@
 /// Looks, before a level is made, whether the file and its file system can take it.
 // SPDX-License-Identifier: MIT
-#include <algorithm>
+#include <utility>
 
 #include "host/datasources/levelroom.h"
 #include "host/drivers/tiff/storedsize.h"
@@ -26,18 +26,19 @@ bool BecomesBig(const ImageShape& image, const LevelCoding& level) {
 
 }  // namespace
 
-/// A stored level of ours keeps its form unless the user's options give it another.
+/// A stored level of ours keeps its form unless the user's options are to give it another.
 TiffLevelStore::Pending TiffLevelStore::PendingFor(unsigned level) const {
   Pending pending;
   pending.channels.resize(settings_.image.samples);
   const datasources::LevelOptions& options = datasources::CurrentLevelOptions();
   const StoredLevel* ours = FindOurs(level);
-  const bool isRestored = ours && options.restores && options.SayCoding();
-  if (!ours || isRestored) pending.coding = CodingOfLevel(settings_.coding, level, file_->Path());
+  if (!ours || options.SayCoding())
+    pending.coding = CodingOfLevel(settings_.coding, level, file_->Path());
   if (!ours) return pending;
-  const LevelCoding stored = CodingOfStored(*ours);
-  if (!isRestored) pending.coding = stored;
-  pending.isRecoded = !HaveSameForm(stored, pending.coding);
+  LevelCoding stored = CodingOfStored(*ours);
+  const bool isOther = !HaveSameForm(stored, pending.coding);
+  pending.isRecoded = isOther && options.restores && options.SayCoding();
+  if (isOther && !pending.isRecoded) pending.coding = std::move(stored);
   return pending;
 }
 

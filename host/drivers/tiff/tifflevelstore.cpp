@@ -149,8 +149,11 @@ LevelCoding TiffLevelStore::CodingOfStored(const StoredLevel& stored) const {
   const TiffStructure& structure = file_->Structure();
   LevelCoding coding =
       CodingOf(file_->File(), structure, structure.directories[stored.index], stored.format);
-  coding.jpegQuality = settings_.coding.jpegQuality;
-  coding.mayBeSparse = settings_.coding.mayBeSparse;
+  const LevelCoding& image = settings_.coding;
+  coding.mayBeSparse = image.mayBeSparse;
+  coding.storedPart = std::max(coding.storedPart, image.storedPart);
+  coding.imageBytes.reset();
+  if (coding.format.compression == image.format.compression) coding.imageBytes = image.imageBytes;
   return coding;
 }
 

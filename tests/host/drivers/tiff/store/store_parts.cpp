@@ -225,6 +225,23 @@ TEST_F(Parts, DirectoryIsReadByLibtiffAsItWasComposed) {
     }
 }
 
+TEST_F(Parts, AppenderStopsAtFourGiBOfAClassicFileOnly) {
+  const std::string name = folder_.File("long.tif");
+  drivers::PositionedFile file(name, drivers::PositionedFile::Mode::kCreate);
+  file.Truncate((uint64_t{1} << 32) - 50);
+  drivers::Appender classic(file, false, {});
+  EXPECT_EQ((uint64_t{1} << 32) - 50, classic.Append(std::vector<uint8_t>(20)));
+  try {
+    classic.Append(std::vector<uint8_t>(100));
+    ADD_FAILURE() << "it went on";
+  } catch (const Exception& refused) {
+    EXPECT_EQ(0u, refused.GetMessage().find(name + ": would pass 4 GiB")) << refused.GetMessage();
+  }
+  EXPECT_EQ((uint64_t{1} << 32) - 30, file.Size());
+  drivers::Appender big(file, true, {});
+  EXPECT_EQ((uint64_t{1} << 32) - 30, big.Append(std::vector<uint8_t>(100)));
+}
+
 TEST_F(Parts, EncoderNamesTheFileAndTheCodecsReason) {
   drivers::LevelCoding coding = drivers::PlainCoding(16, 16, 1, gobs::DataTypeOf<float>(), "");
   coding.format.tileWidth = coding.format.tileHeight = 16;
