@@ -110,6 +110,7 @@ class GenericSource final : public IRasterSource {
   AuxiliaryData MetadataOf(const std::vector<unsigned>& channels) const override {
     return image_->MetadataOf(channels);
   }
+  unsigned StoredBitsOf(unsigned channel) const override { return image_->StoredBitsOf(channel); }
   bool HoldsClasses() const override { return image_->HoldsClasses(); }
   std::unique_ptr<IRasterReader> OpenReader(const std::vector<unsigned>& channels) override {
     auto reader = image_->OpenReader(channels);

@@ -74,6 +74,9 @@ class IRasterSource {
   virtual unsigned ChannelCount() const = 0;
   /// \param channel  1-based
   virtual gobs::DataType TypeOf(unsigned channel) const = 0;
+  /// Bits that the file keeps of a sample of this channel, 1-based: 12 of a type of 16, say. Levels
+  /// hold nothing that takes more.
+  virtual unsigned StoredBitsOf(unsigned channel) const { return TypeOf(channel).bits; }
   /// Metadata of the file and of `channels`, in their order; no-data texts as they were declared.
   virtual AuxiliaryData MetadataOf(const std::vector<unsigned>& channels) const = 0;
   /// True when pixels number entries of a palette or named classes: a mean of two numbers means

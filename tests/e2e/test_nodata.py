@@ -183,7 +183,8 @@ class Palette(Case):
 
     def test_every_level_has_the_images_colours(self):
         for place in PLACES:
-            answer = run("build", self.file, "--levels", "2,3", "--method", "mode", place, "--force")
+            answer = run("build", self.file, "--levels", "2,3", "--method", "mode", "--force",
+                         place)
             self.assertRan(answer)
             self.assertNotIn("colours", answer.stderr)
             dataset = gdal.Open(self.file)

@@ -1,6 +1,7 @@
 // SPDX-License-Identifier: MIT
 #include "host/drivers/tiff/sidecar.h"
 
+#include <algorithm>
 #include <filesystem>
 #include <utility>
 
@@ -23,6 +24,21 @@ gobs::DataType LevelTypeOf(const IRasterSource& image) {
   return image.ChannelCount() == 0 ? gobs::eDT_8U : image.TypeOf(1);
 }
 
+/// Makes samples as narrow as the image's, where the type that blocks hold stays the same. What is
+/// beyond them is clamped when it is stored.
+void KeepBits(const IRasterSource& image, LevelCoding& coding) {
+  const gobs::DataType& type = coding.format.type;
+  unsigned bits = 0;
+  for (unsigned channel = 1; channel <= image.ChannelCount(); ++channel)
+    bits = std::max(bits, image.StoredBitsOf(channel));
+  const unsigned nextNarrower = type.bits == 8 ? 1 : type.bits / 2;
+  if (type.isFloat || type.isComplex || type.bits == 64 || bits >= type.bits ||
+      bits <= nextNarrower)
+    return;
+  coding.format.bitsPerSample = bits;
+  coding.predictor = PREDICTOR_NONE;
+}
+
 LevelCoding CodingOfImage(const IRasterSource& image) {
   LevelCoding coding;
   if (const auto* tiff = dynamic_cast<const TiffSource*>(&image)) {
@@ -38,6 +54,7 @@ LevelCoding CodingOfImage(const IRasterSource& image) {
     if (noData.empty()) noData = metadata.GetChanMetadataValue(datasources::kNoDataKey, 1);
     coding = PlainCoding(image.Width(), image.Height(), image.ChannelCount(), LevelTypeOf(image),
                          noData);
+    KeepBits(image, coding);
   }
   coding.byteOrder = ByteOrder();
   return InPlanes(std::move(coding));

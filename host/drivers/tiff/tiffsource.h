@@ -31,6 +31,9 @@ class TiffSource final : public datasources::IRasterSource {
   /// Items of the default domain. The no-data value is the item of that name, else the no-data tag
   /// where that is a number, NaN and infinities included.
   datasources::AuxiliaryData MetadataOf(const std::vector<unsigned>& channels) const override;
+  unsigned StoredBitsOf(unsigned) const override {
+    return format_.bitsPerSample / ComponentsPerSample(format_.type);
+  }
   /// A palette, or category names in the file `NAME.EXT.aux.xml`.
   bool HoldsClasses() const override;
   std::unique_ptr<datasources::IRasterReader> OpenReader(

@@ -39,6 +39,9 @@ class PlainImage final : public datasources::IRasterSource {
   unsigned Height() const override { return height_; }
   unsigned ChannelCount() const override { return static_cast<unsigned>(types_.size()); }
   gobs::DataType TypeOf(unsigned channel) const override { return types_.at(channel - 1); }
+  unsigned StoredBitsOf(unsigned channel) const override {
+    return storedBits ? storedBits : TypeOf(channel).bits;
+  }
   datasources::AuxiliaryData MetadataOf(const std::vector<unsigned>&) const override {
     return {{{datasources::kNoDataKey, "-9999"}}, {}};
   }
@@ -46,6 +49,8 @@ class PlainImage final : public datasources::IRasterSource {
     return nullptr;
   }
   datasources::ILevelStore* Levels() override { return nullptr; }
+
+  unsigned storedBits = 0;  ///< 0: as many as the type has
 
  private:
   unsigned width_, height_;
@@ -282,6 +287,35 @@ TEST_F(SideCar, OfAnyOtherImageIsDeflatedWithThePredictorOfItsType) {
   const Seen ofFloats = PlainLevel(folder_.File("b.png"), floats, 2);
   EXPECT_EQ(COMPRESSION_ADOBE_DEFLATE, ofFloats.compression);
   EXPECT_EQ(3, ofFloats.predictor);
+}
+
+TEST_F(SideCar, KeepsTheBitsOfAnyOtherImageAndClampsWhatIsBeyond) {
+  PlainImage image(40, 30, {gobs::DataTypeOf<uint16_t>(), gobs::DataTypeOf<uint16_t>()});
+  image.storedBits = 12;
+  const std::string name = folder_.File("c.jp2");
+  const auto store = drivers::TiffSideCar().Open(name, image);
+  store->Create(2, {1}, "BICUBIC");
+  const auto writer = store->OpenWriter(2, {1});
+  gobs::Raster block({20, 15, 1, image.TypeOf(1)}, {});
+  auto* values = reinterpret_cast<uint16_t*>(block.data);
+  std::fill(values, values + 300, uint16_t{4094});
+  values[7] = 4097;
+  writer->Write(block);
+  store->SetValid(2, {1}, true);
+  gobs::Raster stored({20, 15, 1, image.TypeOf(1)}, {});
+  store->OpenWriter(2, {1})->Read(stored);
+  EXPECT_EQ(4094, reinterpret_cast<uint16_t*>(stored.data)[6]);
+  EXPECT_EQ(4095, reinterpret_cast<uint16_t*>(stored.data)[7]);
+  EXPECT_EQ("20x15", SizesOf(name + ".ovr"));
+}
+
+TEST_F(SideCar, IsAsWideAsTheTypeWhereFewerBitsWouldChangeIt) {
+  for (const unsigned bits : {7u, 8u, 16u, 17u}) {
+    PlainImage image(40, 30, {gobs::DataTypeOf<uint16_t>()});
+    image.storedBits = bits;
+    const Seen seen = PlainLevel(folder_.File(std::to_string(bits) + ".jp2"), image, 2);
+    EXPECT_EQ(2, seen.predictor) << bits;
+  }
 }
 
 TEST_F(SideCar, IsABigTiffWhenTheUsualPyramidsCouldPassFourGiB) {
