@@ -41,6 +41,16 @@ TEST(Mask, TheFirstPixelOfAByteIsItsTopBit) {
   EXPECT_EQ(0xFE, mask.begin[0]);
 }
 
+TEST(Mask, AnIntersectionLeavesWhatIsValidInBoth) {
+  Mask mask(10, 1, {});
+  mask.SetValid(1, 0, false);
+  Mask other(10, 1, {});
+  other.SetValid(2, 0, false);
+  other.SetValid(9, 0, false);
+  mask.Intersect(other);
+  for (int x = 0; x < 10; ++x) EXPECT_EQ(x != 1 && x != 2 && x != 9, mask.IsValid(x, 0)) << x;
+}
+
 TEST(Mask, LinesAreNotPaddedToBytes) {
   Mask mask(3, 3, {1, 1, 0, 0});  // 5 pixels a line: (0, 0) is pixel 6
   mask.SetValid(0, 0, false);
