@@ -3,9 +3,11 @@
 #include <filesystem>
 
 #include "basic/gobs/mask/mask.h"
+#include "host/datasources/genericlayer.h"
 #include "host/drivers/tiff/tiffmask.h"
 #include "host/services/exception.h"
 #include "tests/host/drivers/tiff/store/storesupport.h"
+#include "tests/testing/fakeraster.h"
 
 namespace orin::tests {
 namespace {
@@ -158,6 +160,65 @@ TEST_F(TiffStore, AMaskOfEightBitsInTheImageCounts) {
   uint8_t byte = 0;
   dataset->GetSource()->OpenMask()->Read(199, 159, 1, 1, &byte);
   EXPECT_EQ(255, byte);
+}
+
+/// A driver whose one image of two channels is transparent everywhere.
+class Transparent final : public datasources::IFormatDriver {
+ public:
+  std::vector<ZMBInfo_s> Formats() const override { return {}; }
+  ZMBFormatType Identify(const std::string&) const override { return kFormatUnknown; }
+  std::unique_ptr<datasources::IRasterSource> Open(const std::string&,
+                                                   datasources::AccessMode) override {
+    return std::make_unique<Image>();
+  }
+
+ private:
+  class Image final : public datasources::IRasterSource {
+   public:
+    unsigned Width() const override { return 20; }
+    unsigned Height() const override { return 10; }
+    unsigned ChannelCount() const override { return 2; }
+    gobs::DataType TypeOf(unsigned) const override { return gobs::eDT_8U; }
+    datasources::AuxiliaryData MetadataOf(const std::vector<unsigned>&) const override {
+      return {};
+    }
+    std::unique_ptr<datasources::IRasterReader> OpenReader(
+        const std::vector<unsigned>& channels) override {
+      auto pixels = std::make_unique<orin::testing::FakeRaster>();
+      pixels->width = Width();
+      pixels->height = Height();
+      pixels->channels = static_cast<unsigned>(channels.size());
+      return pixels;
+    }
+    unsigned AlphaChannel() const override { return 2; }
+    datasources::ILevelStore* Levels() override { return nullptr; }
+  };
+};
+
+TEST_F(TiffStore, AlphaOfAnyFormatIsReadWithItsBlocksAndNamedInItsSideCar) {
+  const std::string file = folder_.File("image.png");
+  Transparent driver;
+  const auto source = datasources::OpenGeneric(driver, file);
+  const auto reader = source->OpenReader({1});
+  EXPECT_EQ("0", reader->GetAuxiliaryData().GetFileMetadataValue(datasources::kNoDataKey));
+  gobs::Raster block({20, 10, 1, gobs::eDT_8U}, {1, 1, 0, 0});
+  reader->Read(block);
+  ASSERT_NE(nullptr, block.validity);
+  EXPECT_EQ(false, block.validity->Uniform());
+  source->Levels()->Create(2, {1}, "NEAREST");
+  const auto writer = source->Levels()->OpenWriter(2, {1});
+  gobs::Raster level({10, 5, 1, gobs::eDT_8U}, {});
+  std::fill_n(level.data, level.byteSize, uint8_t{0});
+  writer->Write(level);
+  source->Levels()->SetValid(2, {1}, true);
+  TIFF* tiff = TIFFOpen((file + ".ovr").c_str(), "r");
+  ASSERT_NE(nullptr, tiff);
+  uint16_t count = 0;
+  uint16_t* meanings = nullptr;
+  ASSERT_EQ(1, TIFFGetField(tiff, TIFFTAG_EXTRASAMPLES, &count, &meanings));
+  ASSERT_EQ(1, count);
+  EXPECT_EQ(EXTRASAMPLE_UNASSALPHA, meanings[0]);
+  TIFFClose(tiff);
 }
 
 }  // namespace
