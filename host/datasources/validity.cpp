@@ -2,6 +2,7 @@
 #include "host/datasources/validity.h"
 
 #include <algorithm>
+#include <cstring>
 #include <functional>
 #include <utility>
 
@@ -101,6 +102,17 @@ class Centres final : public IValidityReader {
   std::vector<uint8_t> row_;
 };
 
+/// Clears what is 0 in a row of bytes that belongs at (x, y).
+void ClearRuns(const uint8_t* row, uint32_t width, int64_t x, int64_t y, gobs::Mask& mask) {
+  const uint8_t* const end = row + width;
+  for (const uint8_t* at = row; at != end;) {
+    const auto* first = static_cast<const uint8_t*>(std::memchr(at, 0, size_t(end - at)));
+    if (!first) break;
+    at = std::find_if(first, end, [](uint8_t byte) { return byte != 0; });
+    mask.ClearRun(x + (first - row), y, uint64_t(at - first));
+  }
+}
+
 /// Gives the pixels of the buffer outside `inside` the validity of the nearest one inside.
 void RepeatEdges(const InsideWindow& inside, const gobs::Raster& block, gobs::Mask& mask) {
   const int64_t left = inside.x - block.x;
@@ -149,10 +161,8 @@ void AddValidity(IValidityReader& reader, gobs::Raster& block) {
     const auto count = static_cast<uint32_t>(std::min<int64_t>(rows, inside.y + inside.height - y));
     reader.Read(static_cast<uint32_t>(inside.x), static_cast<uint32_t>(y), width, count,
                 bytes.data());
-    for (uint64_t n = 0; n < uint64_t{width} * count; ++n)
-      if (bytes[n] == 0)
-        mask.SetValid(inside.x - block.x + int64_t(n % width), y - block.y + int64_t(n / width),
-                      false);
+    for (uint32_t row = 0; row < count; ++row)
+      ClearRuns(&bytes[uint64_t{row} * width], width, inside.x - block.x, y - block.y + row, mask);
   }
   RepeatEdges(inside, block, mask);
 }

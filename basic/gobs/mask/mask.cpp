@@ -37,6 +37,28 @@ void Mask::SetValid(int64_t pixelX, int64_t pixelY, bool valid) {
   byte = valid ? static_cast<uint8_t>(byte | bit) : static_cast<uint8_t>(byte & ~bit);
 }
 
+void Mask::ClearRun(int64_t pixelX, int64_t pixelY, uint64_t count) {
+  uint64_t index = LayoutOf(*this).Index(pixelX, pixelY);
+  const uint64_t last = index + count;
+  const auto clear = [this](uint64_t n) {
+    begin[n / 8] = static_cast<uint8_t>(begin[n / 8] & ~(0x80u >> (n % 8)));
+  };
+  for (; index < last && index % 8 != 0; ++index) clear(index);
+  const uint64_t bytes = (last - index) / 8;
+  std::fill_n(begin + index / 8, bytes, uint8_t{0});
+  for (index += bytes * 8; index < last; ++index) clear(index);
+}
+
+std::optional<bool> Mask::Uniform() const {
+  const uint64_t pixels = BufferPixels(*this);
+  const uint8_t whole = pixels == 0 || (begin[0] & 0x80u) != 0 ? 0xFF : 0;
+  for (uint64_t byte = 0; byte < pixels / 8; ++byte)
+    if (begin[byte] != whole) return std::nullopt;
+  for (uint64_t n = pixels / 8 * 8; n < pixels; ++n)
+    if (((begin[n / 8] << n % 8) & 0x80) != (whole & 0x80)) return std::nullopt;
+  return whole != 0;
+}
+
 void Mask::Intersect(const Mask& other) {
   std::transform(begin, end, other.begin, begin,
                  [](uint8_t a, uint8_t b) { return static_cast<uint8_t>(a & b); });

@@ -6,6 +6,7 @@
 #include <cstddef>
 #include <cstdint>
 #include <memory>
+#include <optional>
 
 #include "basic/gobs/bufferlayout.h"
 #include "basic/gobs/raster.h"
@@ -50,6 +51,10 @@ class Mask {
     return MaskBits{begin, LayoutOf(*this)}(pixelX, pixelY);
   }
   void SetValid(int64_t pixelX, int64_t pixelY, bool valid);
+  /// Makes `count` pixels of a line no data, from (x, y) on; the margin is in reach.
+  void ClearRun(int64_t pixelX, int64_t pixelY, uint64_t count);
+  /// Whether all of the buffer's pixels are valid, or none is; empty for a mixture.
+  std::optional<bool> Uniform() const;
   /// Leaves valid what is valid in `other`, too, which has the same geometry.
   void Intersect(const Mask& other);
 

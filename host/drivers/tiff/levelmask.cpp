@@ -149,16 +149,25 @@ void LevelMaskWriter::Write(const gobs::Raster& block) {
       }
       const uint32_t endY = std::min(bottom, tileY + format.tileHeight);
       const uint32_t endX = std::min(right, tileX + format.tileWidth);
+      const uint32_t x = std::max(block.x, tileX);
       for (uint32_t y = std::max(block.y, tileY); y < endY; ++y)
-        for (uint32_t x = std::max(block.x, tileX); x < endX; ++x) {
-          uint8_t& bit = open->second.bits[uint64_t{y - tileY} * format.tileWidth + (x - tileX)];
-          if (bit == kUnknown) --open->second.missing;
-          bit = block.validity->IsValid(int64_t{x} - block.x, int64_t{y} - block.y) ? 1 : 0;
-        }
+        Take(*block.validity, {int64_t{x} - block.x, int64_t{y} - block.y}, endX - x,
+             uint64_t{y - tileY} * format.tileWidth + (x - tileX), open->second);
       if (open->second.missing > 0) continue;
       Finish(number, open->second.bits);
       tiles_.erase(open);
     }
+}
+
+/// Takes `count` pixels of a line. \param from  the first, in the mask. \param to  in the tile
+void LevelMaskWriter::Take(const gobs::Mask& mask, std::pair<int64_t, int64_t> from, uint32_t count,
+                           uint64_t to, OpenTile& tile) {
+  const gobs::MaskBits isValid{mask.begin, LayoutOf(mask)};
+  for (uint32_t i = 0; i < count; ++i) {
+    uint8_t& bit = tile.bits[to + i];
+    tile.missing -= bit == kUnknown ? 1 : 0;
+    bit = isValid(from.first + i, from.second) ? 1 : 0;
+  }
 }
 
 LevelMaskWriter::OpenTile LevelMaskWriter::MakeTile(uint32_t tileX, uint32_t tileY) const {

@@ -8,8 +8,10 @@
 #include <memory>
 #include <optional>
 #include <string>
+#include <utility>
 #include <vector>
 
+#include "basic/gobs/mask/mask.h"
 #include "basic/gobs/raster.h"
 #include "host/datasources/levelstore.h"
 #include "host/datasources/validity.h"
@@ -88,6 +90,8 @@ class LevelMaskWriter {
     uint64_t missing;           ///< pixels
   };
 
+  static void Take(const gobs::Mask& mask, std::pair<int64_t, int64_t> from, uint32_t count,
+                   uint64_t to, OpenTile& tile);
   OpenTile MakeTile(uint32_t tileX, uint32_t tileY) const;
   void Finish(uint64_t tile, std::vector<uint8_t>& bits);
 

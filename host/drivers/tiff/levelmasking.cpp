@@ -42,7 +42,7 @@ LevelValidity TiffLevelStore::OpenValidity(unsigned level, const std::vector<uns
   if (!stored || !image.open) return validity;
   datasources::ValidityReaders readers;
   bool isWhole = true;
-  if (stored->mask)
+  if (image.hasMask && stored->mask)
     readers.push_back(
         OpenTiffMask(file_->Path(), file_->Structure().directories[*stored->mask].offset));
   else if (image.hasMask) isWhole = false;

@@ -4,6 +4,7 @@
 #include <algorithm>
 #include <filesystem>
 #include <utility>
+#include <vector>
 
 #include "host/drivers/tiff/levelmask.h"
 #include "host/drivers/tiff/tifflevelstore.h"
@@ -39,6 +40,18 @@ void KeepBits(const IRasterSource& image, LevelCoding& coding) {
   coding.predictor = PREDICTOR_NONE;
 }
 
+/// Has the levels say which of their samples is opacity.
+/// \param channel  1-based; 0 for none, and the first is none: it is what the image shows
+void MarkAlpha(unsigned channel, LevelCoding& coding) {
+  const uint32_t samples = coding.format.samplesPerPixel;
+  if (channel < 2 || channel > samples) return;
+  std::vector<uint64_t> meanings(samples - 1, EXTRASAMPLE_UNSPECIFIED);
+  meanings[channel - 2] = EXTRASAMPLE_UNASSALPHA;
+  std::erase_if(coding.inherited,
+                [](const NewEntry& entry) { return entry.tag == TIFFTAG_EXTRASAMPLES; });
+  coding.inherited.push_back(NumbersEntry(TIFFTAG_EXTRASAMPLES, TIFF_SHORT, meanings));
+}
+
 LevelCoding CodingOfImage(const IRasterSource& image) {
   LevelCoding coding;
   if (const auto* tiff = dynamic_cast<const TiffSource*>(&image)) {
@@ -55,6 +68,7 @@ LevelCoding CodingOfImage(const IRasterSource& image) {
     coding = PlainCoding(image.Width(), image.Height(), image.ChannelCount(), LevelTypeOf(image),
                          noData);
     KeepBits(image, coding);
+    MarkAlpha(image.AlphaChannel(), coding);
   }
   coding.byteOrder = ByteOrder();
   return InPlanes(std::move(coding));

@@ -38,6 +38,12 @@ void ResamplerManager::ProcessBlock(gobs::Raster* in, gobs::Raster* out) {
 /// sample replaced by a real one.
 void ResamplerManager::FindFilled(const gobs::Raster& in, gobs::Mask& mask,
                                   gobs::Raster& out) const {
+  out.validity = std::make_unique<gobs::Mask>(out.width, out.height, out.Window());
+  const bool hasSource = in.width != 0 && in.height != 0 && xRatio <= 1 && yRatio <= 1;
+  if (const auto uniform = mask.Uniform(); uniform && hasSource) {  // as most blocks are
+    for (uint32_t y = 0; y < out.height && !*uniform; ++y) out.validity->ClearRun(0, y, out.width);
+    return;
+  }
   const gobs::DataType bytes = gobs::DataTypeOf<uint8_t>(in.dataType.isComplex);
   const uint32_t channels = std::min(in.channelCount, 2u);
   gobs::Raster constant({in.width, in.height, channels, bytes}, in.Window());
@@ -46,10 +52,11 @@ void ResamplerManager::FindFilled(const gobs::Raster& in, gobs::Mask& mask,
   const std::unique_ptr<IRasterResampler> kernel(factory->CreateResampler(bytes));
   Configure(*kernel, 0.0);
   kernel->Resample(&constant, &mask, &filled);
-  out.validity = std::make_unique<gobs::Mask>(out.width, out.height, out.Window());
-  for (uint32_t y = 0; y < out.height; ++y)
-    for (uint32_t x = 0; x < out.width; ++x)
-      if (*PixelAddress(filled, x, y) == 0) out.validity->SetValid(x, y, false);
+  for (uint32_t y = 0; y < out.height; ++y) {
+    const uint8_t* pixel = PixelAddress(filled, 0, y);
+    for (uint32_t x = 0; x < out.width; ++x, pixel += PixelBytes(filled))
+      if (*pixel == 0) out.validity->ClearRun(x, y, 1);
+  }
 }
 
 void ResamplerManager::RenewKernel(const gobs::DataType& type) {

@@ -41,6 +41,41 @@ TEST(Mask, TheFirstPixelOfAByteIsItsTopBit) {
   EXPECT_EQ(0xFE, mask.begin[0]);
 }
 
+TEST(Mask, AnIntersectionLeavesWhatIsValidInBoth) {
+  Mask mask(10, 1, {});
+  mask.SetValid(1, 0, false);
+  Mask other(10, 1, {});
+  other.SetValid(2, 0, false);
+  other.SetValid(9, 0, false);
+  mask.Intersect(other);
+  for (int x = 0; x < 10; ++x) EXPECT_EQ(x != 1 && x != 2 && x != 9, mask.IsValid(x, 0)) << x;
+}
+
+TEST(Mask, ARunIsClearedFromItsFirstToItsLastPixel) {
+  for (uint32_t from = 0; from < 40; ++from)
+    for (uint32_t count = 0; from + count <= 40; ++count) {
+      Mask mask(40, 2, {1, 0, 0, 0});
+      mask.ClearRun(from, 1, count);
+      for (uint32_t x = 0; x < 40; ++x)
+        ASSERT_EQ(x < from || x >= from + count, mask.IsValid(x, 1)) << from << ' ' << count;
+      ASSERT_TRUE(mask.IsValid(39, 0) && mask.IsValid(40, 1));
+    }
+}
+
+TEST(Mask, IsUniformWhenAllPixelsAreAlike) {
+  Mask mask(5, 3, {});  // 15 pixels: the last bit of the last byte is none
+  EXPECT_EQ(true, mask.Uniform());
+  mask.SetValid(4, 2, false);
+  EXPECT_EQ(std::nullopt, mask.Uniform());
+  mask.ClearRun(0, 0, 15);
+  EXPECT_EQ(false, mask.Uniform());
+  mask.SetValid(4, 2, true);
+  EXPECT_EQ(std::nullopt, mask.Uniform());
+  mask.SetValid(4, 2, false);
+  mask.SetValid(0, 0, true);
+  EXPECT_EQ(std::nullopt, mask.Uniform());
+}
+
 TEST(Mask, LinesAreNotPaddedToBytes) {
   Mask mask(3, 3, {1, 1, 0, 0});  // 5 pixels a line: (0, 0) is pixel 6
   mask.SetValid(0, 0, false);
