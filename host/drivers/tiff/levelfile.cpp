@@ -2,7 +2,6 @@
 #include "host/drivers/tiff/levelfile.h"
 
 #include <algorithm>
-#include <array>
 #include <cstdio>
 #include <filesystem>
 #include <utility>
@@ -22,6 +21,20 @@ std::vector<uint8_t> EmptyHeader(const TiffStructure& structure) {
   structure.byteOrder.Put(structure.isBig ? TIFF_VERSION_BIG : TIFF_VERSION_CLASSIC, 2, &header[2]);
   if (structure.isBig) structure.byteOrder.Put(structure.LinkBytes(), 2, &header[4]);
   return header;
+}
+
+/// True for a header that links to no directory, and for none, with nothing behind it.
+bool IsStartOfSideCar(const std::vector<uint8_t>& start) {
+  for (const bool isBig : {false, true})
+    for (const std::endian order : {std::endian::little, std::endian::big}) {
+      TiffStructure structure;
+      structure.isBig = isBig;
+      structure.byteOrder.order = order;
+      std::vector<uint8_t> header = EmptyHeader(structure);
+      header.resize(start.size());
+      if (start == header) return true;
+    }
+  return std::count(start.begin(), start.end(), 0) == std::ptrdiff_t(start.size());
 }
 
 }  // namespace
@@ -68,15 +81,13 @@ void LevelFile::StartAppending() {
                                          isMade_ ? FindOwnSpace(*file_, structure_) : OwnSpace());
 }
 
-/// What bears the name already was begun by this program: a header without a directory, then a
-/// marker, as far as it was written.
+/// What bears the name already was begun by this program: it has the first marker, or nothing but a
+/// header without a directory.
 void LevelFile::RequireOursOrNew(const PositionedFile& partial) const {
-  const uint64_t size = partial.Size();
-  std::array<char, 2> order{};
-  if (size >= order.size()) partial.Read(0, order.data(), order.size());
-  const bool hasHeader = order[0] == order[1] && (order[0] == 'I' || order[0] == 'M');
-  const bool isBegun = size < 2 * kMarkerBytes || ReadMarker(partial, kMarkerBytes).has_value();
-  if (size > 0 && !(hasHeader && isBegun))
+  std::vector<uint8_t> start(std::min<uint64_t>(partial.Size(), 2 * kMarkerBytes));
+  partial.Read(0, start.data(), start.size());
+  start.resize(2 * kMarkerBytes);
+  if (!IsStartOfSideCar(start) && !ReadMarker(partial, kMarkerBytes))
     throw Exception(FormatString(_("%s: is no side-car that a build left behind. Delete it, or "
                                    "move it away, and run again."),
                                  partial.Path().c_str()),

@@ -8,7 +8,9 @@
 #include <utility>
 
 #include "host/drivers/tiff/sparsesample.h"
+#include "host/drivers/tiff/tiffhandle.h"
 #include "host/drivers/tiff/tifflevelstore.h"
+#include "host/services/text.h"
 
 namespace orin::drivers {
 
@@ -53,6 +55,10 @@ void LevelWriter::Begin() {
 
 void LevelWriter::Write(const Raster& block) {
   RequireFittingBlock(block, *this, file_);
+  WithMemory(file_, _("%s: not enough memory to write its levels."), [&] { WriteBlock(block); });
+}
+
+void LevelWriter::WriteBlock(const Raster& block) {
   if (!build_ || build_->isClosed) Begin();
   const uint32_t tileWidth = format_.tileWidth;
   const uint32_t tileHeight = format_.tileHeight;

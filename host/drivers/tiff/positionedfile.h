@@ -36,8 +36,8 @@ class PositionedFile {
   void Sync();
   void Truncate(uint64_t size);
   /// Keeps other programs that ask for it from changing the file, until this object goes.
-  /// \throws orin::Exception  another one has it (the text says who), or another file has taken over
-  ///                          the name since this one was opened
+  /// \throws orin::Exception  another one has it (the text says who), or another file has taken
+  ///                          over the name since this one was opened
   void Lock();
   /// Gives the file a new name, which no other file has, and makes the name durable.
   /// \throws orin::Exception  it cannot be renamed, or there is such a file
