@@ -23,6 +23,12 @@ std::vector<uint8_t> EmptyHeader(const TiffStructure& structure) {
   return header;
 }
 
+std::vector<uint64_t> OffsetsIn(const TiffStructure& structure) {
+  std::vector<uint64_t> offsets;
+  for (const TiffDirectory& directory : structure.directories) offsets.push_back(directory.offset);
+  return offsets;
+}
+
 /// True for a header that links to no directory, and for none, with nothing behind it.
 bool IsStartOfSideCar(const std::vector<uint8_t>& start) {
   for (const bool isBig : {false, true})
@@ -44,6 +50,9 @@ LevelFile::LevelFile(std::string path, bool mayChange)
       mayChange_(mayChange),
       isMade_(true),
       file_(std::make_unique<PositionedFile>(path_, PositionedFile::Mode::kRead)) {
+  // Who opens the file later knows its state of now. Where the system does not tell who has opened
+  // it before, space is reused once it was free for a whole build.
+  mayReuse_ = mayChange && file_->DoAlone([] {}) != PositionedFile::Alone::kOthersHaveItOpen;
   structure_ = ParseStructure(*file_);
 }
 
@@ -69,7 +78,9 @@ void LevelFile::OpenForChange() {
     auto changed = std::make_unique<PositionedFile>(path_, PositionedFile::Mode::kUpdate);
     changed->Lock();
     file_ = std::move(changed);
+    const std::vector<uint64_t> known = OffsetsIn(structure_);
     Refresh();  // another program may have changed the chain before
+    mayReuse_ = mayReuse_ && OffsetsIn(structure_) == known;
   } else {
     Make();
   }
@@ -77,8 +88,10 @@ void LevelFile::OpenForChange() {
 }
 
 void LevelFile::StartAppending() {
-  appender_ = std::make_unique<Appender>(*file_, structure_.isBig, structure_.byteOrder,
-                                         isMade_ ? FindOwnSpace(*file_, structure_) : OwnSpace());
+  OwnSpace space = isMade_ ? FindOwnSpace(*file_, structure_) : OwnSpace();
+  if (!mayReuse_) space.free = {};
+  appender_ =
+      std::make_unique<Appender>(*file_, structure_.isBig, structure_.byteOrder, std::move(space));
 }
 
 /// What bears the name already was begun by this program: it has the first marker, or nothing but a

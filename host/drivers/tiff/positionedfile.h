@@ -45,9 +45,10 @@ class PositionedFile {
   /// Removes the file's name, durably.
   void Remove();
 
-  /// Does `action` while nobody else has the file open, and nobody can open it.
-  /// \returns false: somebody has, or the system does not tell; nothing was done
-  bool DoAlone(const std::function<void()>& action);
+  enum class Alone { kDone, kOthersHaveItOpen, kCannotTell };
+  /// Does `action` while nothing else has the file open, in this process or another, and nobody can
+  /// open it. \returns whether it was done, or why not
+  Alone DoAlone(const std::function<void()>& action);
 
  private:
   std::string path_;

@@ -20,6 +20,8 @@ void* operator new(size_t bytes) {
   if (!memory) throw std::bad_alloc();
   return memory;
 }
+// The warning compares with the compiler's own allocation, which is replaced above.
+#pragma GCC diagnostic ignored "-Wmismatched-new-delete"
 void operator delete(void* memory) noexcept { std::free(memory); }
 void operator delete(void* memory, size_t) noexcept { std::free(memory); }
 
