@@ -54,7 +54,9 @@ class Answers(Case):
         self.assertEqual("", answer.stderr)
         self.assertIn("--json", run("info", "--help").stdout)
         everywhere = run("--help").stdout
-        for word in ("build", "info", "--verbose", "--log-file", "--version"):
+        for option in ("--levels", "--internal", "--external", "--quiet"):
+            self.assertIn(option, run("clean", "--help").stdout)
+        for word in ("build", "info", "clean", "--verbose", "--log-file", "--version"):
             self.assertIn(word, everywhere)
 
     def test_version(self):

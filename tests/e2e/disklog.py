@@ -1,13 +1,16 @@
 # SPDX-License-Identifier: MIT
-"""Records the changes that the tool makes to files, plays them back up to any point, and lets single
-system calls fail."""
+"""Records the changes that the tool makes to files, plays them back up to any point, and lets
+single system calls fail."""
 
 import os
 import re
+import tempfile
 
 import orin_e2e
 
 SHIM = os.environ["ORIN_DISK_SHIM"]
+if os.access("/dev/shm", os.W_OK):
+    tempfile.tempdir = "/dev/shm"  # hundreds of runs sync what they write: not to a disk
 
 
 class Change:

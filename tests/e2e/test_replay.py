@@ -1,6 +1,6 @@
 # SPDX-License-Identifier: MIT
-"""What is on disk between any two system calls of the tool, and after a power loss that swallowed a
-write which was not synced: the image is what it was, no level lies, and the same command finishes."""
+"""What is on disk between any two system calls of the tool, and after a power loss that swallowed
+a write which was not synced: the image is what it was, no level lies, the same command finishes."""
 
 import os
 import shutil
@@ -8,7 +8,7 @@ import unittest
 
 import numpy
 
-import disklog
+import disklog  # first: it says where the files go
 from orin_e2e import Case, info, overview_sizes, random_pixels, read_pixels, run, write_tiff
 
 SIZE = (50, 40)  # columns, rows: four tiles of 16 pixels in level 2, one in level 4
@@ -42,8 +42,11 @@ class Replayed(Case):
         """A fresh copy of the original folder with these changes made; the image in it."""
         shutil.rmtree(self.replayed, ignore_errors=True)
         shutil.copytree(self.original, self.replayed)
+        names = {}  # a file goes on under the name that it was given
         for change in changes:
-            change.apply(lambda path: path.replace(self.recorded, self.replayed))
+            change.apply(lambda path: names.get(path, path).replace(self.recorded, self.replayed))
+            if change.name == "rename":
+                names[change.paths[0]] = change.paths[1]
         return os.path.join(self.replayed, "image.tif")
 
     def levels(self, image):
@@ -135,7 +138,7 @@ class Rebuild(Replayed):
         self.check_all((*self.arguments, *more))
 
     def valid(self, image):
-        """Only what the rebuild made is compared with what it makes; the old levels are valid too."""
+        """Only levels of the rebuild are compared with it; the old ones are valid as well."""
         return [entry["level"] for entry in info(image)["levels"]
                 if entry["method"] == "AVERAGE"
                 and all(channel["valid"] for channel in entry["channels"])]

@@ -58,6 +58,7 @@ bool LevelFile::MoveDown(size_t index, uint64_t end) {
 /// Moves the directories of this program, the last ones in the file first.
 /// \pre nobody reads what is free. \returns false: nothing could be moved
 bool LevelFile::MoveDown() {
+  mayReuse_ = true;
   StartAppending();
   const OwnSpace space = FindOwnSpace(*file_, structure_);
   std::vector<uint64_t> own = space.directories;
@@ -89,16 +90,16 @@ void LevelFile::GiveBackSpace() {
   if (!appender_ || !isMade_) return;
   constexpr uint64_t kWorthMoving = 20;  // a twentieth of the file
   constexpr int kMostPasses = 3;         // what one pass leaves room for, the next one moves
-  const auto nothing = [] {};
+  const auto isAlone = [this] { return file_->DoAlone([] {}) == PositionedFile::Alone::kDone; };
   structure_ = ParseStructure(*file_);
   OwnSpace space = FindOwnSpace(*file_, structure_);
   for (int pass = 0; pass < kMostPasses; ++pass) {
-    if (space.free.Size() < file_->Size() / kWorthMoving || !file_->DoAlone(nothing) || !MoveDown())
-      break;
+    if (space.free.Size() < file_->Size() / kWorthMoving || !isAlone() || !MoveDown()) break;
     space = FindOwnSpace(*file_, structure_);
   }
   const uint64_t end = space.ShortestEnd(file_->Size(), {});
   if (end < file_->Size()) file_->DoAlone([&] { Shorten(space, end); });
+  mayReuse_ = false;  // somebody may have opened the file meanwhile
   StartAppending();
 }
 
@@ -108,6 +109,7 @@ void LevelFile::GiveBackSpace(const ExtentSet& given) {
   const OwnSpace space = FindOwnSpace(*file_, structure_);
   const uint64_t end = space.ShortestEnd(file_->Size(), given);
   if (end < file_->Size()) Shorten(space, end);
+  mayReuse_ = false;  // somebody may still read what was removed
   StartAppending();
 }
 

@@ -71,6 +71,8 @@ std::optional<StoredLevel> LevelAt(const PositionedFile& file, const TiffStructu
   const auto factor = FactorOf(image.width, image.height, width, height);
   try {
     stored.format = FormatOf(TiffHandle::OpenAt(file.Path(), directory.offset));
+  } catch (const OpenFailure&) {
+    throw;  // says nothing of the directory, which must not be taken for none
   } catch (const Exception&) {
     return std::nullopt;  // deliberate: what cannot be read is no level, and the rest of the file
                           // is fine

@@ -2,7 +2,6 @@
 #include "host/drivers/tiff/levelfile.h"
 
 #include <algorithm>
-#include <array>
 #include <cstdio>
 #include <filesystem>
 #include <utility>
@@ -24,6 +23,26 @@ std::vector<uint8_t> EmptyHeader(const TiffStructure& structure) {
   return header;
 }
 
+std::vector<uint64_t> OffsetsIn(const TiffStructure& structure) {
+  std::vector<uint64_t> offsets;
+  for (const TiffDirectory& directory : structure.directories) offsets.push_back(directory.offset);
+  return offsets;
+}
+
+/// True for a header that links to no directory, and for none, with nothing behind it.
+bool IsStartOfSideCar(const std::vector<uint8_t>& start) {
+  for (const bool isBig : {false, true})
+    for (const std::endian order : {std::endian::little, std::endian::big}) {
+      TiffStructure structure;
+      structure.isBig = isBig;
+      structure.byteOrder.order = order;
+      std::vector<uint8_t> header = EmptyHeader(structure);
+      header.resize(start.size());
+      if (start == header) return true;
+    }
+  return std::count(start.begin(), start.end(), 0) == std::ptrdiff_t(start.size());
+}
+
 }  // namespace
 
 LevelFile::LevelFile(std::string path, bool mayChange)
@@ -31,6 +50,9 @@ LevelFile::LevelFile(std::string path, bool mayChange)
       mayChange_(mayChange),
       isMade_(true),
       file_(std::make_unique<PositionedFile>(path_, PositionedFile::Mode::kRead)) {
+  // Who opens the file later knows its state of now. Where the system does not tell who has opened
+  // it before, space is reused once it was free for a whole build.
+  mayReuse_ = mayChange && file_->DoAlone([] {}) != PositionedFile::Alone::kOthersHaveItOpen;
   structure_ = ParseStructure(*file_);
 }
 
@@ -55,7 +77,9 @@ void LevelFile::OpenForChange() {
     auto changed = std::make_unique<PositionedFile>(path_, PositionedFile::Mode::kUpdate);
     changed->Lock();
     file_ = std::move(changed);
+    const std::vector<uint64_t> known = OffsetsIn(structure_);
     Refresh();  // another program may have changed the chain before
+    mayReuse_ = mayReuse_ && OffsetsIn(structure_) == known;
   } else {
     Make();
   }
@@ -63,19 +87,19 @@ void LevelFile::OpenForChange() {
 }
 
 void LevelFile::StartAppending() {
-  appender_ = std::make_unique<Appender>(*file_, structure_.isBig, structure_.byteOrder,
-                                         isMade_ ? FindOwnSpace(*file_, structure_) : OwnSpace());
+  OwnSpace space = isMade_ ? FindOwnSpace(*file_, structure_) : OwnSpace();
+  if (!mayReuse_) space.free = {};
+  appender_ =
+      std::make_unique<Appender>(*file_, structure_.isBig, structure_.byteOrder, std::move(space));
 }
 
-/// What bears the name already was begun by this program: a header without a directory, then a
-/// marker, as far as it was written.
+/// What bears the name already was begun by this program: it has the first marker, or nothing but a
+/// header without a directory.
 void LevelFile::RequireOursOrNew(const PositionedFile& partial) const {
-  const uint64_t size = partial.Size();
-  std::array<char, 2> order{};
-  if (size >= order.size()) partial.Read(0, order.data(), order.size());
-  const bool hasHeader = order[0] == order[1] && (order[0] == 'I' || order[0] == 'M');
-  const bool isBegun = size < 2 * kMarkerBytes || ReadMarker(partial, kMarkerBytes).has_value();
-  if (size > 0 && !(hasHeader && isBegun))
+  std::vector<uint8_t> start(std::min<uint64_t>(partial.Size(), 2 * kMarkerBytes));
+  partial.Read(0, start.data(), start.size());
+  start.resize(2 * kMarkerBytes);
+  if (!IsStartOfSideCar(start) && !ReadMarker(partial, kMarkerBytes))
     throw Exception(FormatString(_("%s: is no side-car that a build left behind. Delete it, or "
                                    "move it away, and run again."),
                                  partial.Path().c_str()),

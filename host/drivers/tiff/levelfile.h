@@ -86,6 +86,7 @@ class LevelFile {
   std::string path_;
   bool mayChange_ = false;
   bool isMade_ = false;
+  bool mayReuse_ = false;  ///< nobody reads what the file does not refer to
   TiffStructure structure_;
   std::unique_ptr<PositionedFile> file_;
   std::unique_ptr<Appender> appender_;  // null until the first change

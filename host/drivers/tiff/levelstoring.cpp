@@ -46,6 +46,8 @@ LevelMetadata TiffLevelStore::MetadataFor(unsigned level, const Pending& pending
   metadata.program = ProgramName();
   metadata.validity =
       before ? before->metadata.validity : std::string(pending.channels.size(), kAbsent);
+  if (before && before->metadata.method != pending.method)  // it would not be true of the others
+    std::replace(metadata.validity.begin(), metadata.validity.end(), kValid, kInvalid);
   for (size_t i = 0; i < pending.channels.size(); ++i)
     if (pending.channels[i]) metadata.validity[i] = kInvalid;
     else if (before && before->metadata.image.fingerprint != image.fingerprint)

@@ -9,7 +9,9 @@
 
 #include "basic/gobs/mask/mask.h"
 #include "host/drivers/tiff/sparsesample.h"
+#include "host/drivers/tiff/tiffhandle.h"
 #include "host/drivers/tiff/tifflevelstore.h"
+#include "host/services/text.h"
 
 namespace orin::drivers {
 
@@ -60,6 +62,10 @@ void LevelWriter::Begin() {
 
 void LevelWriter::Write(const Raster& block) {
   RequireFittingBlock(block, *this, file_);
+  WithMemory(file_, _("%s: not enough memory to write its levels."), [&] { WriteBlock(block); });
+}
+
+void LevelWriter::WriteBlock(const Raster& block) {
   if (!build_ || build_->isClosed) Begin();
   if (block.validity) WriteMask(block);
   const uint32_t tileWidth = format_.tileWidth;

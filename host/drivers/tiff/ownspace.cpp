@@ -56,6 +56,8 @@ class Finder {
   void FollowOn();
   void FollowTail();
   std::optional<Stretch> NextTo(uint64_t end) const;
+  /// False also where the machine stopped before everything was on disk.
+  bool IsClosed(const Stretch& stretch) const { return stretch.end != 0 && stretch.end <= size_; }
   bool AreApart() const;
 
   const PositionedFile& file_;
@@ -70,7 +72,7 @@ void Finder::FollowBack(uint64_t marker) {
   while (marker != 0 && !found_.contains(marker)) {
     const auto stretch = ReadMarker(file_, marker);
     if (!stretch) return;
-    if (stretch->end != 0) found_.emplace(marker, *stretch);
+    if (IsClosed(*stretch)) found_.emplace(marker, *stretch);
     marker = stretch->previous;
   }
 }
@@ -85,7 +87,7 @@ std::optional<Stretch> Finder::NextTo(uint64_t end) const {
 void Finder::FollowOn() {
   for (auto at = found_.begin(); at != found_.end(); ++at) {
     const auto next = NextTo(at->second.end);
-    if (next && next->end != 0) found_.emplace(next->marker, *next);
+    if (next && IsClosed(*next)) found_.emplace(next->marker, *next);
   }
 }
 
@@ -94,7 +96,7 @@ void Finder::FollowTail() {
   uint64_t end = space_.used.End();
   for (const auto& [marker, stretch] : found_) end = std::max(end, stretch.end);
   while (auto next = NextTo(end)) {
-    if (next->end == 0) {
+    if (!IsClosed(*next)) {
       next->end = size_;
       space_.unclosed.push_back(*next);
     }
@@ -172,10 +174,9 @@ std::optional<Stretch> ReadMarker(const PositionedFile& file, uint64_t position)
   const auto number = [&](unsigned i) { return kOrder.Number(&bytes[kMagic.size() + i * 8], 8); };
   const Stretch stretch{number(0), number(1), number(2), number(3)};
   if (stretch.marker != position || bytes != ComposeMarker(stretch)) return std::nullopt;
-  const bool isPlausible =
-      stretch.start <= position && position - stretch.start < kMarkerBytes &&
-      (stretch.end == 0 || (stretch.end >= stretch.Body() && stretch.end <= size)) &&
-      stretch.previous < position;
+  const bool isPlausible = stretch.start <= position && position - stretch.start < kMarkerBytes &&
+                           (stretch.end == 0 || stretch.end >= stretch.Body()) &&
+                           stretch.previous < position;
   return isPlausible ? std::optional(stretch) : std::nullopt;
 }
 

@@ -1,10 +1,10 @@
 /// Knows which bytes of a file were written by this program, and which of them nothing refers to.
-///
-/// What is appended without a break is a stretch. A stretch begins with a marker that says where it
-/// ends, and every directory in it is preceded by a pointer back to the marker. So the space of
-/// this program is found again from its levels; behind the last byte that anything refers to also
-/// without them, after a build that was killed. Bytes of other programs are in no stretch.
 // SPDX-License-Identifier: MIT
+//
+// What is appended without a break is a stretch. A stretch begins with a marker that says where it
+// ends, and every directory in it is preceded by a pointer back to the marker. So the space of
+// this program is found again from its levels; behind the last byte that anything refers to also
+// without them, after a build that was killed. Bytes of other programs are in no stretch.
 #pragma once
 
 #include <cstdint>

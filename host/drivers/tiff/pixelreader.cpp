@@ -81,6 +81,11 @@ TileDecoder& PixelReader::DecoderOf(size_t plane) {
 }
 
 void PixelReader::Read(gobs::Raster& block) {
+  WithMemory(decoder_.Path(), _("%s: not enough memory to read its pixels."),
+             [&] { ReadBlock(block); });
+}
+
+void PixelReader::ReadBlock(gobs::Raster& block) {
   gobs::Raster target(ByteInfo(block), block.Window(), block.data);
   const datasources::InsideWindow window =
       datasources::InsideOf(target, Format().width, Format().height);

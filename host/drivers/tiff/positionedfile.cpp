@@ -215,17 +215,18 @@ void PositionedFile::Remove() {
   SyncFolderOf(path_);
 }
 
-bool PositionedFile::DoAlone(const std::function<void()>& action) {
+PositionedFile::Alone PositionedFile::DoAlone(const std::function<void()>& action) {
   // Who opens the file meanwhile waits, and the system announces it by a signal: by one that is
   // ignored where nobody asked for it, not by the usual one, which ends the process.
-  if (fcntl(descriptor_, F_SETSIG, SIGURG) != 0 || fcntl(descriptor_, F_SETLEASE, F_WRLCK) != 0)
-    return false;
+  if (fcntl(descriptor_, F_SETSIG, SIGURG) != 0) return Alone::kCannotTell;
+  if (fcntl(descriptor_, F_SETLEASE, F_WRLCK) != 0)
+    return errno == EAGAIN ? Alone::kOthersHaveItOpen : Alone::kCannotTell;
   const struct Release {
     int descriptor;
     ~Release() { fcntl(descriptor, F_SETLEASE, F_UNLCK); }
   } release{descriptor_};
   action();
-  return true;
+  return Alone::kDone;
 }
 
 }  // namespace orin::drivers

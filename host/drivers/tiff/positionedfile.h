@@ -44,8 +44,8 @@ class PositionedFile {
   /// the system's clock escapes.
   bool TakeWasTouched();
   /// Keeps other programs that ask for it from changing the file, until this object goes.
-  /// \throws orin::Exception  another one has it (the text says who), or another file has taken over
-  ///                          the name since this one was opened
+  /// \throws orin::Exception  another one has it (the text says who), or another file has taken
+  ///                          over the name since this one was opened
   void Lock();
   /// Gives the file a new name, which no other file has, and makes the name durable.
   /// \throws orin::Exception  it cannot be renamed, or there is such a file
@@ -53,9 +53,10 @@ class PositionedFile {
   /// Removes the file's name, durably.
   void Remove();
 
-  /// Does `action` while nobody else has the file open, and nobody can open it.
-  /// \returns false: somebody has, or the system does not tell; nothing was done
-  bool DoAlone(const std::function<void()>& action);
+  enum class Alone { kDone, kOthersHaveItOpen, kCannotTell };
+  /// Does `action` while nothing else has the file open, in this process or another, and nobody can
+  /// open it. \returns whether it was done, or why not
+  Alone DoAlone(const std::function<void()>& action);
 
  private:
   int64_t Modified() const;

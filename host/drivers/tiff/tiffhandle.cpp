@@ -2,11 +2,15 @@
 #include "host/drivers/tiff/tiffhandle.h"
 
 #include <algorithm>
+#include <cerrno>
 #include <cstdarg>
 #include <cstdio>
+#include <cstring>
 #include <utility>
 
+#include <fcntl.h>
 #include <sys/stat.h>
+#include <unistd.h>
 
 #include "host/services/exception.h"
 #include "host/services/text.h"
@@ -32,12 +36,26 @@ struct OptionsDeleter {
   void operator()(TIFFOpenOptions* options) const { TIFFOpenOptionsFree(options); }
 };
 
+/// A descriptor of our own tells a file that cannot be opened from one that cannot be understood.
+int OpenToRead(const std::string& path) {
+  int descriptor = -1;
+  do descriptor = open(path.c_str(), O_RDONLY | O_CLOEXEC);
+  while (descriptor < 0 && errno == EINTR);
+  if (descriptor < 0)
+    throw OpenFailure(
+        FormatString(_("%s: cannot be opened: %s."), path.c_str(), std::strerror(errno)));
+  return descriptor;
+}
+
 TIFF* Open(const std::string& path, std::string& errors) {
+  const int descriptor = OpenToRead(path);
   const std::unique_ptr<TIFFOpenOptions, OptionsDeleter> options(TIFFOpenOptionsAlloc());
   TIFFOpenOptionsSetErrorHandlerExtR(options.get(), KeepFirst, &errors);
   TIFFOpenOptionsSetWarningHandlerExtR(options.get(), Ignore, nullptr);
   TIFFOpenOptionsSetMaxSingleMemAlloc(options.get(), kLargestAllocation);
-  return TIFFOpenExt(path.c_str(), kOpenMode, options.get());
+  TIFF* tiff = TIFFFdOpenExt(descriptor, path.c_str(), kOpenMode, options.get());
+  if (!tiff) close(descriptor);
+  return tiff;
 }
 
 /// The tag's definition when its value is text. Of a tag that libtiff does not know, a file defines
@@ -49,6 +67,14 @@ const TIFFField* FindTextField(TIFF* tiff, uint32_t tag) {
 }
 
 }  // namespace
+
+OpenFailure::OpenFailure(const std::string& message)
+    : Exception(message, "host/drivers/tiff/tiffhandle", "TiffHandle(const std::string&)", 0) {}
+
+void FailForMemory(const std::string& path, const char* format) {
+  throw Exception(FormatString(format, path.c_str()), "host/drivers/tiff/tiffhandle",
+                  "FailForMemory(const std::string&, const char*)", 0);
+}
 
 void FailToRead(const std::string& path, std::string reason) {
   if (reason.starts_with(path + ": ")) reason.erase(0, path.size() + 2);  // libtiff names it too

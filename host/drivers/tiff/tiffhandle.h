@@ -4,18 +4,30 @@
 
 #include <cstdint>
 #include <memory>
+#include <new>
 #include <string>
 
 #include <tiffio.h>
 
+#include "host/services/exception.h"
+
 namespace orin::drivers {
+
+/// The system does not open the file, whatever is in it.
+class OpenFailure : public Exception {
+ public:
+  explicit OpenFailure(const std::string& message);
+};
+
+[[noreturn]] void FailForMemory(const std::string& path, const char* format);
 
 /// Nothing is printed: what libtiff reports stays with the handle. Not for two threads at once.
 class TiffHandle {
  public:
   /// Opens `path` at one of its directories.
   /// \param directoryOffset  in bytes from the file's start; 0 is the first directory
-  /// \throws orin::Exception  not a TIFF file, or the directory cannot be read
+  /// \throws orin::Exception  not a TIFF file, or the directory cannot be read; an OpenFailure when
+  ///                          the file cannot be opened at all
   static TiffHandle OpenAt(const std::string& path, uint64_t directoryOffset);
 
   TIFF* Get() const { return tiff_.get(); }
@@ -46,6 +58,16 @@ class TiffHandle {
   std::unique_ptr<TIFF, Closer> tiff_;
   uint64_t fileSize_ = 0;
 };
+
+/// Calls `action`; memory that it does not get is an exception like any other.
+/// \param format  of the text, which takes the file's name
+void WithMemory(const std::string& path, const char* format, const auto& action) {
+  try {
+    action();
+  } catch (const std::bad_alloc&) {
+    FailForMemory(path, format);
+  }
+}
 
 /// Throws "FILE: cannot be read: REASON."
 [[noreturn]] void FailToRead(const std::string& path, std::string reason);

@@ -101,9 +101,11 @@ AuxiliaryData::Items ItemsOf(const std::vector<MetadataItem>& metadata,
 
 TiffSource::TiffSource(std::string file, datasources::AccessMode access) : file_(std::move(file)) {
   if (access == datasources::kUpdate) RequireWritable(file_);
-  const TiffHandle tiff = TiffHandle::OpenAt(file_, 0);
-  format_ = FormatOf(tiff);
-  metadata_ = ParseMetadata(tiff.TextOf(TIFFTAG_GDAL_METADATA));
+  {
+    const TiffHandle tiff = TiffHandle::OpenAt(file_, 0);
+    format_ = FormatOf(tiff);
+    metadata_ = ParseMetadata(tiff.TextOf(TIFFTAG_GDAL_METADATA));
+  }
   const bool declared = std::any_of(
       metadata_.begin(), metadata_.end(),
       [](const MetadataItem& item) { return item.domain.empty() && item.name == kNoDataKey; });
