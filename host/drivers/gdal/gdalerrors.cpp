@@ -2,6 +2,7 @@
 #include "host/drivers/gdal/gdalerrors.h"
 
 #include <cpl_error.h>
+#include <cpl_string.h>
 
 #include <string_view>
 
@@ -14,6 +15,16 @@ namespace {
 /// A file that ends too early is decoded to the end with grey, and only a warning tells.
 bool TellsOfMissingData(std::string_view message) {
   return message.find("remature end") != message.npos;
+}
+
+/// Without bytes that would disturb a terminal: a damaged file's own text may be in the message.
+std::string Printable(std::string text) {
+  const bool isUtf8 = CPLIsUTF8(text.c_str(), -1) != 0;
+  for (char& c : text) {
+    const auto byte = static_cast<unsigned char>(c);
+    if (byte < ' ' || byte == 0x7F || (byte > 0x7F && !isUtf8)) c = '?';
+  }
+  return text;
 }
 
 void CPL_STDCALL Collect(CPLErr kind, CPLErrorNum, const char* message) {
@@ -38,7 +49,7 @@ void GdalErrors::Add(bool isFailure, const char* message) {
 }
 
 std::string GdalErrors::Reason() const {
-  std::string reason = first_.substr(0, first_.find('\n'));
+  std::string reason = Printable(first_.substr(0, first_.find('\n')));
   while (!reason.empty() && (reason.back() == '.' || reason.back() == ' ')) reason.pop_back();
   return reason.empty() ? _("the file is damaged") : reason;
 }

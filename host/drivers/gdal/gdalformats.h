@@ -9,6 +9,13 @@
 
 namespace orin::drivers {
 
+/// What a driver decodes together.
+enum class Decoding {
+  kBlocks,             ///< rectangles
+  kRows,               ///< square windows cost more than windows as wide as the image
+  kRowsOfAllChannels,  ///< and reading one channel costs as much as reading all
+};
+
 /// One driver of the library.
 struct GdalFormat {
   const char* driver;        ///< the library's name of it: "JP2OpenJPEG"
@@ -17,7 +24,7 @@ struct GdalFormat {
   const char* name;
   const char* description;
   int nativeOverviews;
-  bool decodesRows;  ///< square windows cost more than windows as wide as the image
+  Decoding decoding;
 };
 
 /// Registers those of our drivers that the installed library has; once a process.

@@ -2,6 +2,9 @@
 #include "host/drivers/gdal/gdalreader.h"
 
 #include <algorithm>
+#include <cstring>
+#include <numeric>
+#include <optional>
 #include <utility>
 
 #include "host/drivers/gdal/gdalbands.h"
@@ -11,6 +14,34 @@
 #include "host/services/text.h"
 
 namespace orin::drivers {
+namespace {
+
+/// Copies `count` samples; steps are in samples.
+using CopySamples = void (*)(const uint8_t* from, uint64_t fromStep, uint8_t* to, uint64_t toStep,
+                             uint64_t count);
+
+template <size_t kBytes>
+void Copy(const uint8_t* from, uint64_t fromStep, uint8_t* to, uint64_t toStep, uint64_t count) {
+  for (uint64_t i = 0; i < count; ++i)
+    std::memcpy(to + i * toStep * kBytes, from + i * fromStep * kBytes, kBytes);
+}
+
+CopySamples CopierOf(uint64_t sampleBytes) {
+  switch (sampleBytes) {
+    case 1:
+      return Copy<1>;
+    case 2:
+      return Copy<2>;
+    case 4:
+      return Copy<4>;
+    case 8:
+      return Copy<8>;
+    default:
+      return Copy<16>;
+  }
+}
+
+}  // namespace
 
 gobs::DataType CommonTypeOf(const GdalHandle& handle, const std::vector<unsigned>& channels) {
   const auto refuse = [&](const char* format) {
@@ -29,8 +60,10 @@ gobs::DataType CommonTypeOf(const GdalHandle& handle, const std::vector<unsigned
 }
 
 GdalReader::GdalReader(const std::string& name, const GdalFormat& format,
-                       std::vector<unsigned> channels, datasources::AuxiliaryData metadata)
+                       std::vector<unsigned> channels, datasources::AuxiliaryData metadata,
+                       std::shared_ptr<DecodedRows> decoded)
     : handle_(name, format),
+      decoded_(std::move(decoded)),
       channels_(std::move(channels)),
       metadata_(std::move(metadata)),
       width_(static_cast<unsigned>(GDALGetRasterXSize(handle_.Get()))),
@@ -40,29 +73,64 @@ GdalReader::GdalReader(const std::string& name, const GdalFormat& format,
   int blockWidth = 1, blockHeight = 1;
   if (!channels_.empty())
     GDALGetBlockSize(handle_.Band(channels_.front()), &blockWidth, &blockHeight);
-  tileWidth_ = format.decodesRows ? width_ : std::min(static_cast<unsigned>(blockWidth), width_);
+  tileWidth_ = format.decoding != Decoding::kBlocks
+                   ? width_
+                   : std::min(static_cast<unsigned>(blockWidth), width_);
   tileHeight_ = std::min(static_cast<unsigned>(blockHeight), height_);
+}
+
+/// Reads `channels` side by side.
+void GdalReader::Fetch(const datasources::InsideWindow& window, const std::vector<int>& channels,
+                       const Target& target) {
+  const auto sample = GSpacing{BytesPerComponent(type_)} * ComponentsPerSample(type_);
+  const auto pixel = sample * static_cast<GSpacing>(channels.size());
+  const auto width = static_cast<int>(window.width);
+  const auto height = static_cast<int>(window.height);
+  std::vector<int> bands = channels;
+  const GdalErrors errors;
+  const CPLErr answer = GDALDatasetRasterIOEx(
+      handle_.Get(), GF_Read, static_cast<int>(window.x), static_cast<int>(window.y), width, height,
+      target.first, width, height, GDALGetRasterDataType(handle_.Band(channels_.front())),
+      static_cast<int>(bands.size()), bands.data(), pixel, static_cast<GSpacing>(target.lineBytes),
+      sample, nullptr);
+  errors.Require(answer == CE_None, _("%s: cannot be read: %s."), handle_.Name());
+}
+
+/// Takes this reader's channels out of the rows of all channels.
+void GdalReader::CopyDecoded(const datasources::InsideWindow& window, const Target& target) {
+  std::vector<int> all(static_cast<size_t>(GDALGetRasterCount(handle_.Get())));
+  std::iota(all.begin(), all.end(), 1);
+  const uint64_t sample = uint64_t{BytesPerComponent(type_)} * ComponentsPerSample(type_);
+  const CopySamples copy = CopierOf(sample);
+  const auto decode = [&](unsigned firstRow, unsigned rows, uint8_t* to) {
+    Fetch({0, firstRow, width_, rows}, all, {to, decoded_->RowBytes()});
+  };
+  for (int64_t y = window.y; y < window.y + window.height;) {
+    const auto number = static_cast<unsigned>(y / decoded_->BandRows());
+    const DecodedRows::Bytes band = decoded_->Band(number, decode);
+    const int64_t first = int64_t{number} * decoded_->BandRows();
+    const int64_t end = std::min(first + decoded_->BandRows(), window.y + window.height);
+    for (; y < end; ++y) {
+      const uint8_t* from = band->data() + uint64_t(y - first) * decoded_->RowBytes() +
+                            uint64_t(window.x) * all.size() * sample;
+      uint8_t* to = target.first + uint64_t(y - window.y) * target.lineBytes;
+      for (size_t i = 0; i < channels_.size(); ++i)
+        copy(from + (channels_[i] - 1) * sample, all.size(), to + i * sample, channels_.size(),
+             uint64_t(window.width));
+    }
+  }
 }
 
 void GdalReader::Read(gobs::Raster& block) {
   RequireFittingBlock(block, *this, handle_.Name());
   const datasources::InsideWindow inside = datasources::InsideOf(block, width_, height_);
   if (inside.width <= 0 || inside.height <= 0 || channels_.empty()) return;
-  std::vector<int> bands(channels_.begin(), channels_.end());
-  const auto pixel = static_cast<GSpacing>(PixelBytes(block));
-  const GSpacing sample = pixel / static_cast<GSpacing>(bands.size());
-  const GSpacing line = pixel * block.stride;
-  uint8_t* const first =
-      block.data +
-      LayoutOf(block).Index(inside.x - block.x, inside.y - block.y) * PixelBytes(block);
-  const GdalErrors errors;
-  const auto width = static_cast<int>(inside.width);
-  const auto height = static_cast<int>(inside.height);
-  const CPLErr answer = GDALDatasetRasterIOEx(
-      handle_.Get(), GF_Read, static_cast<int>(inside.x), static_cast<int>(inside.y), width, height,
-      first, width, height, GDALGetRasterDataType(handle_.Band(channels_.front())),
-      static_cast<int>(bands.size()), bands.data(), pixel, line, sample, nullptr);
-  errors.Require(answer == CE_None, _("%s: cannot be read: %s."), handle_.Name());
+  const uint64_t pixel = PixelBytes(block);
+  const Target target{
+      block.data + LayoutOf(block).Index(inside.x - block.x, inside.y - block.y) * pixel,
+      pixel * block.stride};
+  if (decoded_) CopyDecoded(inside, target);
+  else Fetch(inside, {channels_.begin(), channels_.end()}, target);
   RepeatEdges(block, inside);
 }
 

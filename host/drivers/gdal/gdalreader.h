@@ -2,10 +2,12 @@
 // SPDX-License-Identifier: MIT
 #pragma once
 
+#include <memory>
 #include <string>
 #include <vector>
 
 #include "host/datasources/rasterreader.h"
+#include "host/drivers/gdal/decodedrows.h"
 #include "host/drivers/gdal/gdalhandle.h"
 
 namespace orin::drivers {
@@ -14,9 +16,11 @@ namespace orin::drivers {
 class GdalReader final : public datasources::ReaderState<datasources::IRasterReader> {
  public:
   /// \param channels  1-based, in the order of the blocks' channels
+  /// \param decoded   where decoded rows of all channels are kept; null when each reader decodes
+  ///                  its own
   /// \throws orin::Exception  the file cannot be opened, or the channels differ in type
   GdalReader(const std::string& name, const GdalFormat& format, std::vector<unsigned> channels,
-             datasources::AuxiliaryData metadata);
+             datasources::AuxiliaryData metadata, std::shared_ptr<DecodedRows> decoded);
 
   unsigned GetWidth() const override { return width_; }
   unsigned GetHeight() const override { return height_; }
@@ -32,7 +36,17 @@ class GdalReader final : public datasources::ReaderState<datasources::IRasterRea
   unsigned StoredTileHeight() const override { return tileHeight_; }
 
  private:
+  struct Target {
+    uint8_t* first;      ///< sample of the window's first pixel
+    uint64_t lineBytes;  ///< from line to line
+  };
+
+  void Fetch(const datasources::InsideWindow& window, const std::vector<int>& channels,
+             const Target& target);
+  void CopyDecoded(const datasources::InsideWindow& window, const Target& target);
+
   GdalHandle handle_;
+  std::shared_ptr<DecodedRows> decoded_;
   std::vector<unsigned> channels_;
   datasources::AuxiliaryData metadata_;
   unsigned width_;

@@ -56,6 +56,7 @@ GdalSource::GdalSource(std::string name, const GdalFormat& format, datasources::
   height_ = static_cast<unsigned>(GDALGetRasterYSize(handle.Get()));
   items_ = ItemsOf(handle.Get());
   ReadChannels(handle);
+  KeepDecodedRows(handle);
   if (format_.code == kFormatErdas)
     levels_ = OpenHfaLevels(name_, format_, *this, access == datasources::kUpdate);
 }
@@ -76,6 +77,21 @@ void GdalSource::ReadChannels(const GdalHandle& handle) {
   AnswerNoData(declared);
 }
 
+/// Where reading one channel costs as much as reading all, and all fit into memory.
+void GdalSource::KeepDecodedRows(const GdalHandle& handle) {
+  constexpr int kFewestRows = 64, kMostRows = 1024;
+  const bool areAlike = std::all_of(types_.begin(), types_.end(),
+                                    [&](const gobs::DataType& type) { return type == types_[0]; });
+  if (format_.decoding != Decoding::kRowsOfAllChannels || types_.size() < 2 || !areAlike) return;
+  const uint64_t pixel =
+      uint64_t{BytesPerComponent(types_[0])} * ComponentsPerSample(types_[0]) * types_.size();
+  if (pixel > DecodedRows::kMostBytes / width_ / height_) return;
+  int blockWidth = 1, blockHeight = 1;
+  GDALGetBlockSize(handle.Band(1), &blockWidth, &blockHeight);
+  const auto rows = static_cast<unsigned>(std::clamp(blockHeight, kFewestRows, kMostRows));
+  decoded_ = std::make_shared<DecodedRows>(width_, height_, pixel, rows);
+}
+
 void GdalSource::AnswerNoData(const std::vector<std::string>& declared) {
   if (items_.contains(kNoDataKey)) return;
   const bool agree = std::all_of(declared.begin(), declared.end(),
@@ -94,7 +110,9 @@ AuxiliaryData GdalSource::MetadataOf(const std::vector<unsigned>& channels) cons
 
 std::unique_ptr<datasources::IRasterReader> GdalSource::OpenReader(
     const std::vector<unsigned>& channels) {
-  return std::make_unique<GdalReader>(name_, format_, channels, MetadataOf(channels));
+  const bool takesAll = channels.size() == types_.size();  // needs nothing for another reader
+  return std::make_unique<GdalReader>(name_, format_, channels, MetadataOf(channels),
+                                      takesAll ? nullptr : decoded_);
 }
 
 }  // namespace orin::drivers

@@ -8,6 +8,7 @@
 
 #include "host/datasources/dataset.h"
 #include "host/datasources/levelstore.h"
+#include "host/drivers/gdal/decodedrows.h"
 #include "host/drivers/gdal/gdalhandle.h"
 
 namespace orin::drivers {
@@ -36,6 +37,7 @@ class GdalSource final : public datasources::IRasterSource {
 
  private:
   void ReadChannels(const GdalHandle& handle);
+  void KeepDecodedRows(const GdalHandle& handle);
   void AnswerNoData(const std::vector<std::string>& declared);
 
   std::string name_;
@@ -47,6 +49,7 @@ class GdalSource final : public datasources::IRasterSource {
   datasources::AuxiliaryData::Items items_;
   std::vector<datasources::AuxiliaryData::Items> channelItems_;
   std::unique_ptr<datasources::ILevelStore> levels_;
+  std::shared_ptr<DecodedRows> decoded_;  ///< null when readers decode for themselves
 };
 
 }  // namespace orin::drivers

@@ -99,6 +99,19 @@ TEST_F(GdalReader, OfOneSourceCanWorkInSeveralThreads) {
   for (const std::string& message : wrong) EXPECT_EQ("", message);
 }
 
+TEST_F(GdalReader, DecodesAnImageOnceForAllItsChannels) {
+  const std::string file = File("image.png");
+  WritePicture(file, "PNG", {.width = 300, .height = 200, .channels = 3});
+  const auto dataset = Open(file);
+  const auto first = dataset->GetSource()->OpenReader({1});
+  EXPECT_EQ("", WrongSample<uint8_t>(*first, {0, 0, 0, 0}, 300, 200));
+  std::filesystem::resize_file(file, std::filesystem::file_size(file) / 2);
+  for (const unsigned channel : {2u, 3u}) {
+    const auto next = dataset->GetSource()->OpenReader({channel});
+    EXPECT_EQ("", WrongSample<uint8_t>(*next, {2, 2, 100, 100}, 150, 100));
+  }
+}
+
 TEST_F(GdalReader, RefusesDamagedPixelsNamingTheFileAndTheReason) {
   const std::string file = File("image.png");
   WritePicture(file, "PNG", {.width = 300, .height = 200});
