@@ -2,6 +2,7 @@
 #include "host/datasources/basicreader.h"
 
 #include "host/datasources/levelstore.h"
+#include "host/datasources/withmemory.h"
 #include "host/services/exception.h"
 #include "host/services/text.h"
 
@@ -9,11 +10,11 @@ namespace orin::datasources {
 namespace {
 
 std::unique_ptr<IRasterReader> Open(IDataset* dataset, const std::vector<unsigned>& channels) {
+  static constexpr char kFunction[] =
+      "orin::datasources::BasicReader::BasicReader(orin::datasources::IDataset*, "
+      "const std::vector<unsigned int>&, bool)";
   const auto refuse = [](const std::string& text) {
-    throw DataException(text, "host/datasources/basicreader",
-                        "orin::datasources::BasicReader::BasicReader(orin::datasources::IDataset*, "
-                        "const std::vector<unsigned int>&, bool)",
-                        0);
+    throw DataException(text, "host/datasources/basicreader", kFunction, 0);
   };
   auto* raster = dynamic_cast<IRasterDataset*>(dataset);
   if (!raster) refuse(_("A reader was asked for a dataset that is no raster."));
@@ -21,7 +22,8 @@ std::unique_ptr<IRasterReader> Open(IDataset* dataset, const std::vector<unsigne
     if (channel < 1 || channel > raster->GetChannelCount())
       refuse(FormatString(_("%s: there is no channel %u; the file has %u."),
                           raster->GetFileName().c_str(), channel, raster->GetChannelCount()));
-  return raster->GetSource()->OpenReader(channels);
+  return WithMemory(raster->GetFileName(), kFunction,
+                    [&] { return raster->GetSource()->OpenReader(channels); });
 }
 
 }  // namespace

@@ -58,9 +58,7 @@ bool HasSparseTiles(const PositionedFile& file, const TiffStructure& structure,
                     const TiffDirectory& directory) {
   const TiffEntry* counts = directory.Find(TIFFTAG_TILEBYTECOUNTS);
   if (!counts) counts = directory.Find(TIFFTAG_STRIPBYTECOUNTS);
-  if (!counts) return false;
-  const std::vector<uint64_t> numbers = ReadNumbers(file, structure, *counts);
-  return std::find(numbers.begin(), numbers.end(), 0) != numbers.end();
+  return counts && HoldsNumber(file, structure, *counts, 0);
 }
 
 void Inherit(const PositionedFile& file, const TiffStructure& structure,
@@ -76,7 +74,8 @@ void Inherit(const PositionedFile& file, const TiffStructure& structure,
 std::vector<uint64_t> NumbersIn(const PositionedFile& file, const TiffStructure& structure,
                                 const TiffDirectory& directory, uint16_t tag) {
   const TiffEntry* entry = directory.Find(tag);
-  return entry ? ReadNumbers(file, structure, *entry) : std::vector<uint64_t>();
+  return entry && entry->bytes <= kMostTagBytes ? ReadNumbers(file, structure, *entry)
+                                                : std::vector<uint64_t>();
 }
 
 }  // namespace
@@ -100,7 +99,8 @@ LevelCoding CodingOf(const PositionedFile& file, const TiffStructure& structure,
   }
   const auto lerc = NumbersIn(file, structure, directory, TIFFTAG_LERC_PARAMETERS);
   if (lerc.size() == 2) coding.lercExtra = static_cast<uint32_t>(lerc[1]);
-  if (const TiffEntry* tables = directory.Find(TIFFTAG_JPEGTABLES))
+  const TiffEntry* tables = directory.Find(TIFFTAG_JPEGTABLES);
+  if (tables && tables->bytes <= kMostTagBytes)
     coding.jpegQuality =
         JpegQualityOf(ReadBytes(file, structure, *tables)).value_or(coding.jpegQuality);
   coding.mayBeSparse = HasSparseTiles(file, structure, directory);

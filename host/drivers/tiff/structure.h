@@ -3,6 +3,7 @@
 // SPDX-License-Identifier: MIT
 #pragma once
 
+#include <array>
 #include <bit>
 #include <cstdint>
 #include <string>
@@ -27,10 +28,11 @@ struct ByteOrder {
 /// One entry whose value lies completely inside the file.
 struct TiffEntry {
   uint16_t tag = 0;
-  uint16_t type = 0;      ///< one of the TIFF types
-  uint64_t count = 0;     ///< elements
-  uint64_t position = 0;  ///< of the value, in the file
-  uint64_t bytes = 0;     ///< of the value
+  uint16_t type = 0;               ///< one of the TIFF types
+  uint64_t count = 0;              ///< elements
+  uint64_t position = 0;           ///< of the value, in the file
+  uint64_t bytes = 0;              ///< of the value
+  std::array<uint8_t, 8> field{};  ///< the entry's last bytes: the value where it fits there
 };
 
 struct TiffDirectory {
@@ -59,8 +61,9 @@ unsigned ElementBytes(uint16_t type);
 /// Bytes of the units that a byte order turns round: half an element for rationals.
 unsigned SwapBytes(uint16_t type);
 
-/// Follows the chain of directories. A link that points at nothing valid, or back, ends it. Nothing
-/// is read outside the file, and no more is allocated than the file holds.
+/// Follows the chain of directories. A link that points at nothing valid, or back, ends it, and so
+/// do directories that together are larger than the file: they overlap. Nothing is read outside the
+/// file, and no more is allocated than a few times what the file holds.
 /// \throws orin::Exception  the header or the first directory is not one of a TIFF file
 TiffStructure ParseStructure(const PositionedFile& file);
 
@@ -70,6 +73,9 @@ std::vector<uint8_t> ReadBytes(const PositionedFile& file, const TiffStructure& 
 /// The values of an unsigned integer entry (BYTE, SHORT, LONG, LONG8, IFD); empty for other types.
 std::vector<uint64_t> ReadNumbers(const PositionedFile& file, const TiffStructure& structure,
                                   const TiffEntry& entry);
+/// Whether the values of an unsigned integer entry, of any number, include `sought`.
+bool HoldsNumber(const PositionedFile& file, const TiffStructure& structure, const TiffEntry& entry,
+                 uint64_t sought);
 /// The first value of an unsigned integer tag, or `otherwise`.
 uint64_t NumberOf(const PositionedFile& file, const TiffStructure& structure,
                   const TiffDirectory& directory, uint16_t tag, uint64_t otherwise);

@@ -6,6 +6,7 @@
 #include <charconv>
 #include <cmath>
 #include <cstring>
+#include <map>
 #include <utility>
 
 #include <fcntl.h>
@@ -71,15 +72,6 @@ bool IsFiniteDecimal(const std::string& text) {
   return error == std::errc() && stop == end && std::isfinite(value);
 }
 
-/// Items of the file (no sample) or of one of its channels.
-AuxiliaryData::Items ItemsOf(const std::vector<MetadataItem>& metadata,
-                             std::optional<unsigned> sample) {
-  AuxiliaryData::Items items;
-  for (const MetadataItem& item : metadata)
-    if (item.domain.empty() && item.sample == sample) items.emplace(item.name, item.text);
-  return items;
-}
-
 }  // namespace
 
 TiffSource::TiffSource(std::string file, datasources::AccessMode access) : file_(std::move(file)) {
@@ -98,9 +90,12 @@ TiffSource::TiffSource(std::string file, datasources::AccessMode access) : file_
 TiffSource::~TiffSource() = default;
 
 AuxiliaryData TiffSource::MetadataOf(const std::vector<unsigned>& channels) const {
+  std::map<std::optional<unsigned>, AuxiliaryData::Items> bySample;  // none: of the file
+  for (const MetadataItem& item : metadata_)
+    if (item.domain.empty()) bySample[item.sample].emplace(item.name, item.text);
   std::vector<AuxiliaryData::Items> channelItems;
-  for (const unsigned channel : channels) channelItems.push_back(ItemsOf(metadata_, channel - 1));
-  return {ItemsOf(metadata_, std::nullopt), std::move(channelItems)};
+  for (const unsigned channel : channels) channelItems.push_back(bySample[channel - 1]);
+  return {bySample[std::nullopt], std::move(channelItems)};
 }
 
 std::unique_ptr<datasources::IRasterReader> TiffSource::OpenReader(
