@@ -34,7 +34,8 @@ def changed(tag, value, big=False):
 
 def tiles(blob, width, height, tile, **others):
     """An image of which a file holds the first tile only."""
-    return one(lambda file: image_tags(width, height, [file.add(blob)], [len(blob)], tile, **others))
+    return one(lambda file: image_tags(width, height, [file.add(blob)], [len(blob)], tile,
+                                       **others))
 
 
 def strip(blob, width, height, **others):
