@@ -51,16 +51,27 @@ std::string ValidText(const LevelDescription& level) {
   return FormatString(_("channels %s"), JoinNumbers(valid).c_str());
 }
 
-std::string OrDash(const std::string& text) { return text.empty() ? "-" : text; }
+/// A text that a file holds, which may be anything: cut short, and without what would steer a
+/// terminal.
+std::string ShownText(const std::string& text) {
+  constexpr size_t kMostBytes = 60;
+  std::string shown = text.substr(0, kMostBytes);
+  for (size_t i = 0; i < shown.size(); ++i) {
+    const auto byte = static_cast<unsigned char>(shown[i]);
+    const bool isSecondControl = i > 0 && shown[i - 1] == '\xC2' && byte >= 0x80 && byte < 0xA0;
+    if (byte < ' ' || byte == 0x7F || isSecondControl) shown[i] = '?';
+  }
+  return shown.empty() ? "-" : shown;
+}
 
 Row RowOf(const LevelDescription& level) {
   return {std::to_string(level.level),
           std::to_string(level.width) + " x " + std::to_string(level.height),
           PlaceText(level),
-          OrDash(level.method),
+          ShownText(level.method),
           level.sourceLevel == 0 ? "-" : std::to_string(level.sourceLevel),
           ValidText(level),
-          OrDash(level.program)};
+          ShownText(level.program)};
 }
 
 std::string TextOf(const std::vector<Row>& rows) {

@@ -3,17 +3,19 @@
 
 #include "host/datasources/levelstore.h"
 #include "host/datasources/nodataanswers.h"
+#include "host/datasources/withmemory.h"
 #include "host/services/exception.h"
 #include "host/services/text.h"
 
 namespace orin::datasources {
 namespace {
 
+constexpr char kFunction[] =
+    "orin::datasources::BasicReader::BasicReader(orin::datasources::IDataset*, "
+    "const std::vector<unsigned int>&, bool)";
+
 [[noreturn]] void Refuse(const std::string& text) {
-  throw DataException(text, "host/datasources/basicreader",
-                      "orin::datasources::BasicReader::BasicReader(orin::datasources::IDataset*, "
-                      "const std::vector<unsigned int>&, bool)",
-                      0);
+  throw DataException(text, "host/datasources/basicreader", kFunction, 0);
 }
 
 IRasterDataset& RasterOf(IDataset* dataset) {
@@ -27,7 +29,8 @@ std::unique_ptr<IRasterReader> Open(IRasterDataset& raster, const std::vector<un
     if (channel < 1 || channel > raster.GetChannelCount())
       Refuse(FormatString(_("%s: there is no channel %u; the file has %u."),
                           raster.GetFileName().c_str(), channel, raster.GetChannelCount()));
-  return raster.GetSource()->OpenReader(channels);
+  return WithMemory(raster.GetFileName(), kFunction,
+                    [&] { return raster.GetSource()->OpenReader(channels); });
 }
 
 }  // namespace

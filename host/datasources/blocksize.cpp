@@ -2,6 +2,7 @@
 #include "host/datasources/blocksize.h"
 
 #include <algorithm>
+#include <bit>
 #include <cmath>
 #include <cstdint>
 #include <numeric>
@@ -29,6 +30,7 @@ bool IsExact(const Scale& scale, unsigned length) {
   if (scale.target % scale.source != 0) return false;
   const double ratio = scale.Ratio();
   const uint64_t whole = scale.target / scale.source;
+  if (std::has_single_bit(whole)) return true;  // dividing only moves the exponent
   const auto factor = static_cast<double>(whole);
   for (unsigned i = 0; i <= length; ++i)
     if (i / ratio != i * factor || (i + 0.5) / ratio != (i + 0.5) * factor) return false;

@@ -10,6 +10,7 @@
 #include "host/datasources/formats.h"
 #include "host/datasources/genericlayer.h"
 #include "host/datasources/sourcedataset.h"
+#include "host/datasources/withmemory.h"
 #include "host/services/exception.h"
 #include "host/services/text.h"
 
@@ -71,22 +72,25 @@ DatasetManager* DatasetManager::GetInstance() {
 }
 
 IDataset* DatasetManager::Open(const std::string& file, AccessMode mode) {
+  constexpr char kFunction[] =
+      "orin::datasources::DatasetManager::Open(const std::string&, "
+      "orin::datasources::AccessMode)";
   if (mode == kUpdate && refusesUpdates_)
     Refuse(FormatString(_("%s: is not opened for writing: levels are to stand beside it."),
                         file.c_str()),
-           "orin::datasources::DatasetManager::Open(const std::string&, "
-           "orin::datasources::AccessMode)");
-  return OpenThrough(kFormatUnknown, file, mode,
-                     "orin::datasources::DatasetManager::Open(const std::string&, "
-                     "orin::datasources::AccessMode)");
+           kFunction);
+  return WithMemory(file, kFunction,
+                    [&] { return OpenThrough(kFormatUnknown, file, mode, kFunction); });
 }
 
 IDataset* DatasetManager::OpenFormat(const std::string& format, const std::string& file,
                                      AccessMode mode) {
   FormatRegistry::Instance();  // fills the table's fixed records
-  return OpenThrough(CodeOfName(format), file, mode,
-                     "orin::datasources::DatasetManager::OpenFormat(const std::string&, "
-                     "const std::string&, orin::datasources::AccessMode)");
+  constexpr char kFunction[] =
+      "orin::datasources::DatasetManager::OpenFormat(const std::string&, "
+      "const std::string&, orin::datasources::AccessMode)";
+  return WithMemory(file, kFunction,
+                    [&] { return OpenThrough(CodeOfName(format), file, mode, kFunction); });
 }
 
 }  // namespace orin::datasources

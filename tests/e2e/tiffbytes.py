@@ -107,3 +107,27 @@ def image_tags(width, height, offsets, sizes, tile=None, samples=1, bits=8, **ot
              "format": SAMPLE_FORMAT, "metadata": METADATA, "no_data": NO_DATA}
     tags.update({names[name]: value for name, value in others.items()})
     return tags
+
+
+def boundaries(content):
+    """Positions in a file's bytes where its directories and their values start and end."""
+    order = "<" if content[:2] == b"II" else ">"
+    big = content[2:4] in (b"+\0", b"\0+")
+    link, width, entry_bytes = ("Q", 8, 20) if big else ("I", 4, 12)
+
+    def at(code, position):
+        return struct.unpack_from(order + code, content, position)[0]
+
+    found, position = set(), at(link, 8 if big else 4)
+    while position and position not in found:
+        head = 8 if big else 2
+        count = at("Q" if big else "H", position)
+        first, end = position + head, position + head + count * entry_bytes
+        found.update((position, first, end, end + width))
+        for entry in range(first, end, entry_bytes):
+            size = SIZES.get(at("H", entry + 2), 1) * at(link, entry + 4)
+            if size > width:
+                start = at(link, entry + 4 + width)
+                found.update((start, start + size))
+        position = at(link, end)
+    return sorted(found)

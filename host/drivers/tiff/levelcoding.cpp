@@ -4,7 +4,6 @@
 #include <algorithm>
 #include <array>
 #include <cstdlib>
-#include <numeric>
 #include <tuple>
 #include <utility>
 
@@ -53,19 +52,22 @@ void LookAtStoredSizes(const PositionedFile& file, const TiffStructure& structur
   const TiffEntry* counts = directory.Find(TIFFTAG_TILEBYTECOUNTS);
   if (!counts) counts = directory.Find(TIFFTAG_STRIPBYTECOUNTS);
   if (!counts) return;
-  const std::vector<uint64_t> numbers = ReadNumbers(file, structure, *counts);
-  coding.mayBeSparse = std::find(numbers.begin(), numbers.end(), 0) != numbers.end();
+  double stored = 0;
+  VisitNumbers(file, structure, *counts, [&](uint64_t bytes) {
+    stored += double(bytes);
+    coding.mayBeSparse = coding.mayBeSparse || bytes == 0;
+  });
   const PixelFormat& format = coding.format;
   const double samples = double(format.width) * format.height * format.samplesPerPixel;
-  const double stored = std::accumulate(numbers.begin(), numbers.end(), 0.0);
   coding.storedPart = std::min(1.0, stored / (samples * format.SampleBytes()));
-  coding.imageBytes = std::min(file.Size(), static_cast<uint64_t>(stored));
+  coding.imageBytes = static_cast<uint64_t>(std::min(double(file.Size()), stored));
 }
 
 /// The quality of a JPEG image: by its common tables, else by those of its first tile.
 int JpegQualityIn(const PositionedFile& file, const TiffStructure& structure,
                   const TiffDirectory& directory, int otherwise) {
-  if (const TiffEntry* tables = directory.Find(TIFFTAG_JPEGTABLES))
+  const TiffEntry* tables = directory.Find(TIFFTAG_JPEGTABLES);
+  if (tables && tables->bytes <= kMostTagBytes)
     if (const auto quality = JpegQualityOf(ReadBytes(file, structure, *tables))) return *quality;
   for (const auto& [offsets, counts] : {std::pair{TIFFTAG_TILEOFFSETS, TIFFTAG_TILEBYTECOUNTS},
                                         std::pair{TIFFTAG_STRIPOFFSETS, TIFFTAG_STRIPBYTECOUNTS}}) {
@@ -93,7 +95,8 @@ void Inherit(const PositionedFile& file, const TiffStructure& structure,
 std::vector<uint64_t> NumbersIn(const PositionedFile& file, const TiffStructure& structure,
                                 const TiffDirectory& directory, uint16_t tag) {
   const TiffEntry* entry = directory.Find(tag);
-  return entry ? ReadNumbers(file, structure, *entry) : std::vector<uint64_t>();
+  return entry && entry->bytes <= kMostTagBytes ? ReadNumbers(file, structure, *entry)
+                                                : std::vector<uint64_t>();
 }
 
 }  // namespace

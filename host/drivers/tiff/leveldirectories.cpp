@@ -10,6 +10,8 @@
 namespace orin::drivers {
 namespace {
 
+constexpr size_t kMostCandidates = 1000;  // an image has a dozen levels; a damaged chain is cut off
+
 struct Range {
   uint64_t low;
   uint64_t high;
@@ -61,16 +63,18 @@ bool IsOurs(const StoredLevel& stored, const ImageShape& image) {
 }
 
 /// The level that directory `index` holds, if it is one of this image.
+/// \param factor  of its size
+/// \param handle  of the file, opened when it is needed
 std::optional<StoredLevel> LevelAt(const PositionedFile& file, const TiffStructure& structure,
-                                   const ImageShape& image, size_t index) {
+                                   const ImageShape& image, size_t index, unsigned factor,
+                                   std::optional<TiffHandle>& handle) {
   StoredLevel stored;
   stored.index = index;
   const TiffDirectory& directory = structure.directories[index];
-  const uint32_t width = Size(file, structure, directory, TIFFTAG_IMAGEWIDTH);
-  const uint32_t height = Size(file, structure, directory, TIFFTAG_IMAGELENGTH);
-  const auto factor = FactorOf(image.width, image.height, width, height);
   try {
-    stored.format = FormatOf(TiffHandle::OpenAt(file.Path(), directory.offset));
+    if (!handle) handle = TiffHandle::OpenAt(file.Path(), 0);
+    handle->MoveTo(directory.offset);
+    stored.format = FormatOf(*handle);
   } catch (const OpenFailure&) {
     throw;  // says nothing of the directory, which must not be taken for none
   } catch (const Exception&) {
@@ -81,8 +85,7 @@ std::optional<StoredLevel> LevelAt(const PositionedFile& file, const TiffStructu
     return std::nullopt;
   ReadMetadata(file, structure, directory, stored);
   stored.isOurs = IsOurs(stored, image);
-  if (!stored.isOurs && !factor) return std::nullopt;
-  stored.level = stored.isOurs ? stored.metadata.level : *factor;
+  stored.level = stored.isOurs ? stored.metadata.level : factor;
   return stored;
 }
 
@@ -111,6 +114,8 @@ std::vector<StoredLevel> FindLevels(const PositionedFile& file, const TiffStruct
                                     const ImageShape& image) {
   std::vector<StoredLevel> levels;
   std::vector<std::pair<uint32_t, uint32_t>> otherImages;
+  std::optional<TiffHandle> handle;
+  size_t candidates = 0;
   for (size_t i = image.isInFile ? 1 : 0; i < structure.directories.size(); ++i) {
     const TiffDirectory& directory = structure.directories[i];
     const uint64_t subfile = Subfile(file, structure, directory);
@@ -121,12 +126,16 @@ std::vector<StoredLevel> FindLevels(const PositionedFile& file, const TiffStruct
       otherImages.emplace_back(width, height);
       continue;
     }
+    const auto factor = FactorOf(image.width, image.height, width, height);
+    if (!factor) continue;
+    if (++candidates > kMostCandidates) break;
     const bool belongsToOther =
         std::any_of(otherImages.begin(), otherImages.end(), [&](const auto& other) {
           return FactorOf(other.first, other.second, width, height).has_value();
         });
     if (belongsToOther) continue;
-    if (auto stored = LevelAt(file, structure, image, i)) levels.push_back(std::move(*stored));
+    if (auto stored = LevelAt(file, structure, image, i, *factor, handle))
+      levels.push_back(std::move(*stored));
   }
   return levels;
 }

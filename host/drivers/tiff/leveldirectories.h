@@ -38,7 +38,8 @@ struct StoredLevel {
 std::optional<unsigned> FactorOf(uint32_t width, uint32_t height, uint32_t levelWidth,
                                  uint32_t levelHeight);
 
-/// The levels of the image, in the order of the chain; directories that fit no level are left out.
+/// The levels of the image, in the order of the chain; directories that fit no level are left out,
+/// and so is what follows the first thousand of fitting size.
 std::vector<StoredLevel> FindLevels(const PositionedFile& file, const TiffStructure& structure,
                                     const ImageShape& image);
 

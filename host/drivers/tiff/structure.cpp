@@ -77,6 +77,7 @@ void Parser::AddEntry(const uint8_t* raw, uint64_t position, TiffDirectory& dire
   if (element == 0 || entry.count > size_ / element) return;
   entry.bytes = entry.count * element;
   const bool isInline = entry.bytes <= width;
+  std::copy_n(raw + 4 + width, width, entry.field.begin());
   entry.position = isInline ? position + 4 + width : order.Number(raw + 4 + width, width);
   if (Holds(entry.position, entry.bytes)) directory.entries.push_back(entry);
 }
@@ -89,12 +90,13 @@ std::optional<TiffDirectory> Parser::ReadDirectory(uint64_t offset) const {
   if (count == 0 || count > size_ / entryBytes) return std::nullopt;
   const uint64_t start = offset + countBytes;
   if (!Holds(start, count * entryBytes + structure_.LinkBytes())) return std::nullopt;
-  std::vector<uint8_t> raw(count * entryBytes);
+  const uint64_t held = count * entryBytes;
+  std::vector<uint8_t> raw(held + structure_.LinkBytes());
   file_.Read(start, raw.data(), raw.size());
   TiffDirectory directory;
   directory.offset = offset;
-  directory.linkPosition = start + raw.size();
-  directory.next = Number(directory.linkPosition, structure_.LinkBytes());
+  directory.linkPosition = start + held;
+  directory.next = structure_.byteOrder.Number(&raw[held], structure_.LinkBytes());
   for (uint64_t i = 0; i < count; ++i)
     AddEntry(&raw[i * entryBytes], start + i * entryBytes, directory);
   return directory;
@@ -169,12 +171,14 @@ TiffStructure ParseStructure(const PositionedFile& file) {
   const Parser parser(file, structure);
   uint64_t offset = parser.ReadHeader(structure);
   std::set<uint64_t> seen;
+  uint64_t unread = file.Size();  // directories that do not overlap are not larger than the file
   while (offset != 0 && structure.directories.size() < kMostDirectories &&
          seen.insert(offset).second) {
     auto directory = parser.ReadDirectory(offset);
     const bool isImage =
         directory && directory->Find(TIFFTAG_IMAGEWIDTH) && directory->Find(TIFFTAG_IMAGELENGTH);
-    if (!isImage) break;
+    if (!isImage || directory->linkPosition - offset > unread) break;
+    unread -= directory->linkPosition - offset;
     offset = directory->next;
     structure.directories.push_back(std::move(*directory));
   }
@@ -216,10 +220,28 @@ std::vector<uint64_t> ReadNumbers(const PositionedFile& file, const TiffStructur
   return numbers;
 }
 
+void VisitNumbers(const PositionedFile& file, const TiffStructure& structure,
+                  const TiffEntry& entry, const std::function<void(uint64_t)>& visit) {
+  constexpr uint64_t kAtOnce = 1 << 16;
+  const unsigned width = ElementBytes(entry.type);
+  for (uint64_t done = 0; done < entry.count; done += kAtOnce) {
+    TiffEntry part = entry;
+    part.count = std::min(kAtOnce, entry.count - done);
+    part.bytes = part.count * width;
+    part.position = entry.position + done * width;
+    for (const uint64_t number : ReadNumbers(file, structure, part)) visit(number);
+  }
+}
+
 uint64_t NumberOf(const PositionedFile& file, const TiffStructure& structure,
                   const TiffDirectory& directory, uint16_t tag, uint64_t otherwise) {
   const TiffEntry* entry = directory.Find(tag);
   if (!entry || entry->count == 0) return otherwise;
+  const bool isUnsigned = entry->type == TIFF_BYTE || entry->type == TIFF_SHORT ||
+                          entry->type == TIFF_LONG || entry->type == TIFF_LONG8;
+  const bool isAtHand = isUnsigned && entry->bytes <= structure.LinkBytes();
+  if (isAtHand)  // no read: a file may have very many directories
+    return structure.byteOrder.Number(entry->field.data(), ElementBytes(entry->type));
   TiffEntry first = *entry;
   first.count = 1;
   first.bytes = ElementBytes(entry->type);

@@ -3,8 +3,10 @@
 // SPDX-License-Identifier: MIT
 #pragma once
 
+#include <array>
 #include <bit>
 #include <cstdint>
+#include <functional>
 #include <optional>
 #include <string>
 #include <vector>
@@ -28,10 +30,11 @@ struct ByteOrder {
 /// One entry whose value lies completely inside the file.
 struct TiffEntry {
   uint16_t tag = 0;
-  uint16_t type = 0;      ///< one of the TIFF types
-  uint64_t count = 0;     ///< elements
-  uint64_t position = 0;  ///< of the value, in the file
-  uint64_t bytes = 0;     ///< of the value
+  uint16_t type = 0;               ///< one of the TIFF types
+  uint64_t count = 0;              ///< elements
+  uint64_t position = 0;           ///< of the value, in the file
+  uint64_t bytes = 0;              ///< of the value
+  std::array<uint8_t, 8> field{};  ///< the entry's last bytes: the value where it fits there
 };
 
 struct TiffDirectory {
@@ -61,8 +64,9 @@ unsigned ElementBytes(uint16_t type);
 /// Bytes of the units that a byte order turns round: half an element for rationals.
 unsigned SwapBytes(uint16_t type);
 
-/// Follows the chain of directories. A link that points at nothing valid, or back, ends it. Nothing
-/// is read outside the file, and no more is allocated than the file holds.
+/// Follows the chain of directories. A link that points at nothing valid, or back, ends it, and so
+/// do directories that together are larger than the file: they overlap. Nothing is read outside the
+/// file, and no more is allocated than a few times what the file holds.
 /// \throws orin::Exception  the header or the first directory is not one of a TIFF file
 TiffStructure ParseStructure(const PositionedFile& file);
 
@@ -77,6 +81,9 @@ std::vector<uint8_t> ReadBytes(const PositionedFile& file, const TiffStructure& 
 /// The values of an unsigned integer entry (BYTE, SHORT, LONG, LONG8, IFD); empty for other types.
 std::vector<uint64_t> ReadNumbers(const PositionedFile& file, const TiffStructure& structure,
                                   const TiffEntry& entry);
+/// Hands the same values over in turn, however many there are, in little memory.
+void VisitNumbers(const PositionedFile& file, const TiffStructure& structure,
+                  const TiffEntry& entry, const std::function<void(uint64_t)>& visit);
 /// The first value of an unsigned integer tag, or `otherwise`.
 uint64_t NumberOf(const PositionedFile& file, const TiffStructure& structure,
                   const TiffDirectory& directory, uint16_t tag, uint64_t otherwise);

@@ -6,6 +6,7 @@
 #include <cstdarg>
 #include <cstdio>
 #include <cstring>
+#include <string_view>
 #include <utility>
 
 #include <fcntl.h>
@@ -30,7 +31,13 @@ int KeepFirst(TIFF*, void* errors, const char*, const char* format, va_list argu
   return 1;  // handled: libtiff prints nothing
 }
 
-int Ignore(TIFF*, void*, const char*, const char*, va_list) { return 1; }
+/// A warning is not passed on, except the one that libtiff gives for a JPEG image that does not
+/// fill its tile, where the rest of the pixels would be whatever the memory held: that is an error.
+int KeepIfPixelsAreMissing(TIFF* tiff, void* errors, const char* module, const char* format,
+                           va_list arguments) {
+  const bool isMissing = std::string_view(format).starts_with("Improper JPEG strip/tile size");
+  return isMissing ? KeepFirst(tiff, errors, module, format, arguments) : 1;
+}
 
 struct OptionsDeleter {
   void operator()(TIFFOpenOptions* options) const { TIFFOpenOptionsFree(options); }
@@ -51,7 +58,7 @@ TIFF* Open(const std::string& path, std::string& errors) {
   const int descriptor = OpenToRead(path);
   const std::unique_ptr<TIFFOpenOptions, OptionsDeleter> options(TIFFOpenOptionsAlloc());
   TIFFOpenOptionsSetErrorHandlerExtR(options.get(), KeepFirst, &errors);
-  TIFFOpenOptionsSetWarningHandlerExtR(options.get(), Ignore, nullptr);
+  TIFFOpenOptionsSetWarningHandlerExtR(options.get(), KeepIfPixelsAreMissing, &errors);
   TIFFOpenOptionsSetMaxSingleMemAlloc(options.get(), kLargestAllocation);
   TIFF* tiff = TIFFFdOpenExt(descriptor, path.c_str(), kOpenMode, options.get());
   if (!tiff) close(descriptor);

@@ -30,6 +30,11 @@ class TiffHandle {
   ///                          the file cannot be opened at all
   static TiffHandle OpenAt(const std::string& path, uint64_t directoryOffset);
 
+  /// Goes to another directory of the main chain. On a handle's first move libtiff walks the whole
+  /// chain, so that many directories are looked at through one handle.
+  /// \throws orin::Exception  the directory cannot be read; the handle can still move elsewhere
+  void MoveTo(uint64_t directoryOffset);
+
   TIFF* Get() const { return tiff_.get(); }
   const std::string& Path() const { return path_; }
   /// The file's descriptor, for positioned reads. Belongs to the handle.
@@ -51,7 +56,6 @@ class TiffHandle {
   };
 
   explicit TiffHandle(const std::string& path);
-  void MoveTo(uint64_t directoryOffset);
 
   std::string path_;
   std::unique_ptr<std::string> errors_;  // before tiff_: closing may still report

@@ -6,6 +6,7 @@
 #include <cstring>
 #include <filesystem>
 #include <fstream>
+#include <map>
 #include <utility>
 
 #include <fcntl.h>
@@ -88,15 +89,6 @@ bool NamesCategories(const std::string& auxiliaryFile) {
   return file.gcount() > 0 && text.find("<CategoryNames>") != std::string::npos;
 }
 
-/// Items of the file (no sample) or of one of its channels.
-AuxiliaryData::Items ItemsOf(const std::vector<MetadataItem>& metadata,
-                             std::optional<unsigned> sample) {
-  AuxiliaryData::Items items;
-  for (const MetadataItem& item : metadata)
-    if (item.domain.empty() && item.sample == sample) items.emplace(item.name, item.text);
-  return items;
-}
-
 }  // namespace
 
 TiffSource::TiffSource(std::string file, datasources::AccessMode access) : file_(std::move(file)) {
@@ -135,9 +127,12 @@ std::unique_ptr<datasources::IValidityReader> TiffSource::OpenMask() {
 TiffSource::~TiffSource() = default;
 
 AuxiliaryData TiffSource::MetadataOf(const std::vector<unsigned>& channels) const {
+  std::map<std::optional<unsigned>, AuxiliaryData::Items> bySample;  // none: of the file
+  for (const MetadataItem& item : metadata_)
+    if (item.domain.empty()) bySample[item.sample].emplace(item.name, item.text);
   std::vector<AuxiliaryData::Items> channelItems;
-  for (const unsigned channel : channels) channelItems.push_back(ItemsOf(metadata_, channel - 1));
-  return {ItemsOf(metadata_, std::nullopt), std::move(channelItems)};
+  for (const unsigned channel : channels) channelItems.push_back(bySample[channel - 1]);
+  return {bySample[std::nullopt], std::move(channelItems)};
 }
 
 bool TiffSource::HoldsClasses() const {

@@ -27,6 +27,22 @@ bool PartsAreExchanged(const PixelFormat& format) {
   return format.swapped && format.type.isComplex && format.bitsPerSample == 16;
 }
 
+/// Codecs that may leave pixels of a damaged tile as they were, and say nothing.
+bool MayLeaveGaps(uint16_t compression) {
+  switch (compression) {
+    case COMPRESSION_NONE:
+    case COMPRESSION_LZW:
+    case COMPRESSION_ADOBE_DEFLATE:
+    case COMPRESSION_DEFLATE:
+    case COMPRESSION_PACKBITS:
+    case COMPRESSION_LZMA:
+    case COMPRESSION_ZSTD:
+      return false;
+    default:
+      return true;
+  }
+}
+
 bool IsRawLayout(const PixelFormat& format) {
   return format.compression == COMPRESSION_NONE && format.fillOrder == FILLORDER_MSB2LSB &&
          format.WholeBytes() && (!format.swapped || format.bitsPerSample == 8);
@@ -121,6 +137,7 @@ void TileDecoder::DecodeStored(uint32_t tile, uint32_t rows, uint8_t* samples) {
   RequireDecodable(tile, rows);
   const uint64_t bytes = rows * storedRowBytes_;
   uint8_t* target = StoredRows(bytes, samples);
+  if (MayLeaveGaps(format_.compression)) std::memset(target, 0, bytes);
   tiff_.ClearErrors();
   const auto size = static_cast<tmsize_t>(bytes);
   const tmsize_t got = format_.tiled ? TIFFReadEncodedTile(tiff_.Get(), tile, target, size)
@@ -146,6 +163,7 @@ const uint8_t* TileDecoder::DecodeRow(uint8_t* samples) {
   const auto plane = static_cast<uint16_t>(openStrip_ / format_.TilesPerPlane());
   const uint64_t stripRow = openStrip_ % format_.TilesPerPlane() * format_.tileHeight;
   uint8_t* target = StoredRows(storedRowBytes_, samples);
+  if (MayLeaveGaps(format_.compression)) std::memset(target, 0, storedRowBytes_);
   const auto row = static_cast<uint32_t>(stripRow + nextRow_++);
   tiff_.ClearErrors();
   const bool decoded = TIFFReadScanline(tiff_.Get(), target, row, plane) == 1;
