@@ -55,14 +55,14 @@ bool LevelFile::MoveDown(size_t index, uint64_t end) {
   return true;
 }
 
-/// Moves the directories of this program, the last ones in the file first.
+/// Moves the directories of this program, the first ones in the file first.
 /// \pre nobody reads what is free. \returns false: nothing could be moved
 bool LevelFile::MoveDown() {
   mayReuse_ = true;
   StartAppending();
   const OwnSpace space = FindOwnSpace(*file_, structure_);
   std::vector<uint64_t> own = space.directories;
-  std::sort(own.rbegin(), own.rend());
+  std::sort(own.begin(), own.end());  // as they were built: so they fit where others of them were
   bool isMoved = false;
   for (const uint64_t offset : own) {
     const auto& all = structure_.directories;
@@ -88,8 +88,8 @@ void LevelFile::Shorten(const OwnSpace& space, uint64_t end) {
 
 void LevelFile::GiveBackSpace() {
   if (!appender_ || !isMade_) return;
-  constexpr uint64_t kWorthMoving = 20;  // a twentieth of the file
-  constexpr int kMostPasses = 3;         // what one pass leaves room for, the next one moves
+  constexpr uint64_t kWorthMoving = 50;  // a fiftieth of the file
+  constexpr int kMostPasses = 4;         // what one pass leaves room for, the next one moves
   const auto isAlone = [this] { return file_->DoAlone([] {}) == PositionedFile::Alone::kDone; };
   structure_ = ParseStructure(*file_);
   OwnSpace space = FindOwnSpace(*file_, structure_);
