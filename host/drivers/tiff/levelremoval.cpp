@@ -71,6 +71,7 @@ void TiffLevelStore::RemoveStored(const std::vector<unsigned>& levels) {
   Unlink(indices);
   file_->GiveBackSpace(given);
   file_->Refresh();
+  TidyMasks(std::nullopt);
 }
 
 void TiffLevelStore::Remove(const std::vector<unsigned>& levels) {

@@ -97,7 +97,8 @@ TiffSource::TiffSource(std::string file, datasources::AccessMode access) : file_
     const TiffHandle tiff = TiffHandle::OpenAt(file_, 0);
     format_ = FormatOf(tiff);
     metadata_ = ParseMetadata(tiff.TextOf(TIFFTAG_GDAL_METADATA));
-  }
+    alphaChannel_ = AlphaChannelOf(tiff, format_);
+  }  // closed: who gives space back asks whether somebody has the file open
   const bool declared = std::any_of(
       metadata_.begin(), metadata_.end(),
       [](const MetadataItem& item) { return item.domain.empty() && item.name == kNoDataKey; });
@@ -105,7 +106,6 @@ TiffSource::TiffSource(std::string file, datasources::AccessMode access) : file_
     metadata_.push_back({kNoDataKey, std::nullopt, "", "", format_.noData});
   watch_ = std::make_shared<datasources::ImageWatch>(
       file_, [path = file_](const std::stop_token& stop) { return FingerprintOfTiff(path, stop); });
-  alphaChannel_ = AlphaChannelOf(tiff, format_);
   FindMasks();
   const ImageValidity validity = ValidityOf(*this);
   levels_ = OpenInternalLevels(file_, format_, access == datasources::kUpdate, watch_, validity);
