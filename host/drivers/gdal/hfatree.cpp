@@ -132,8 +132,9 @@ std::vector<HfaLevelName> ParseNames(std::string_view data) {
 
 bool HfaPyramid::NamesAnotherFileThan(const std::string& name) const {
   return std::any_of(channels.begin(), channels.end(), [&](const auto& levels) {
-    return std::any_of(levels.begin(), levels.end(),
-                       [&](const HfaLevelName& level) { return level.file != name; });
+    return std::any_of(levels.begin(), levels.end(), [&](const HfaLevelName& level) {
+      return !level.file.empty() && level.file != name;
+    });
   });
 }
 
@@ -150,15 +151,14 @@ HfaPyramid ReadHfaPyramid(const std::string& path) {
   HfaPyramid pyramid;
   for (const Node& layer : tree.ChildrenOf(tree.Root())) {
     if (layer.type != "Eimg_Layer") continue;
-    std::vector<HfaLevelName> names;
-    size_t stored = 0;
+    std::vector<HfaLevelName> names, unlisted;
     for (const Node& part : tree.ChildrenOf(layer)) {
       if (part.type == "Eimg_RRDNamesList") names = ParseNames(tree.DataOf(part));
-      if (part.type == "Eimg_Layer_SubSample") ++stored;
+      if (part.type == "Eimg_Layer_SubSample") unlisted.push_back(ParseName("(:" + part.name));
       if (part.type == "ImgExternalRaster") pyramid.isSpilled = true;
     }
-    if (stored > names.size()) pyramid.hasUnlisted = true;
-    pyramid.channels.push_back(std::move(names));
+    // As the library does: without a list, what is there counts in the order of the nodes.
+    pyramid.channels.push_back(std::move(names.empty() ? unlisted : names));
   }
   return pyramid;
 }

@@ -9,15 +9,15 @@ namespace orin::drivers {
 
 /// An entry of a channel's list of levels.
 struct HfaLevelName {
-  std::string file;     ///< name, without folder, of the file that is said to hold the level
+  std::string file;     ///< name, without folder, of the file that is said to hold the level;
+                        ///< empty: this one, without a list
   unsigned factor = 0;  ///< decimation factor
 };
 
 struct HfaPyramid {
   /// One list a channel, in the order of the list in the file.
   std::vector<std::vector<HfaLevelName>> channels;
-  bool isSpilled = false;    ///< pixels stand in a second file (.ige)
-  bool hasUnlisted = false;  ///< some level is in no list
+  bool isSpilled = false;  ///< pixels stand in a second file (.ige)
 
   /// True when a list names another file than `name`: the file was copied or renamed, or its levels
   /// stand elsewhere. What the lists lead to is not this file's then.

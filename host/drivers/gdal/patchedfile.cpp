@@ -133,6 +133,8 @@ std::vector<FilePatch> PatchedFile::Waiting() const {
     }
     lastPage = number;
   }
+  // Lists stand before what they name: the names come last, so that none leads to nothing.
+  std::reverse(patches.begin(), patches.end());
   return patches;
 }
 

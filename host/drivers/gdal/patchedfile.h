@@ -35,7 +35,7 @@ class PatchedFile {
 
   /// Its last part is the file's own name.
   const std::string& LibraryName() const { return libraryName_; }
-  /// The overwrites that wait and change something, by ascending position.
+  /// The overwrites that wait and change something, by descending position.
   std::vector<FilePatch> Waiting() const;
   /// Makes what was appended durable, then the waiting overwrites, each by one write.
   /// \throws orin::Exception  a write of the library failed, or one of these does

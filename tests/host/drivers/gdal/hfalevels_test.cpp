@@ -209,7 +209,8 @@ void AddLevel(const std::string& libraryName, int factor) {
   EXPECT_FALSE(errors.Any()) << errors.Reason();
 }
 
-/// The process may end between any two of the writes that a commit consists of.
+/// The process may end between any two of the writes that a commit consists of; the next build
+/// finishes the level.
 TEST_F(HfaLevels, AreWholeOrAbsentAfterEveryWriteOfACommit) {
   std::filesystem::create_directory(File("state"));
   for (const int factor : {2, 3, 5, 9, 17}) {
@@ -224,6 +225,12 @@ TEST_F(HfaLevels, AreWholeOrAbsentAfterEveryWriteOfACommit) {
                       patches[done - 1].bytes);
       WriteBytes(File("state/image.img"), state);  // its own name is stored in the file
       EXPECT_EQ("", WrongPixels(File("state/image.img"))) << factor << " after " << done;
+      EXPECT_EQ("", RefusalOf([&] {
+                  Build(*Open(File("state/image.img"), kUpdate), unsigned(factor), {1, 2});
+                }))
+          << factor << " after " << done << " of " << patches.size();
+      EXPECT_EQ("11", Validity(File("state/image.img"), unsigned(factor)));
+      EXPECT_EQ("", WrongPixels(File("state/image.img"))) << factor << " built after " << done;
     }
     patched.Commit();
     EXPECT_EQ(state, BytesOf(file_));

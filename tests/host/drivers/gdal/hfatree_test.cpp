@@ -26,7 +26,6 @@ TEST_F(HfaTree, OfAnImageWithoutLevelsHasAnEmptyListForEachChannel) {
   for (const auto& levels : pyramid.channels) EXPECT_TRUE(levels.empty());
   EXPECT_FALSE(pyramid.NamesAnotherFileThan("image.img"));
   EXPECT_FALSE(pyramid.isSpilled);
-  EXPECT_FALSE(pyramid.hasUnlisted);
 }
 
 TEST_F(HfaTree, ListsFactorsInTheOrderInWhichTheyWereMade) {

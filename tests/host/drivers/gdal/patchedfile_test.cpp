@@ -72,10 +72,10 @@ TEST_F(Patched, WaitsOnlyWithWhatChangesSomethingInOneWriteEach) {
   PutAt(file, 500, "yaay");
   const std::vector<FilePatch> waiting = file.Waiting();
   ASSERT_EQ(2u, waiting.size());
-  EXPECT_EQ(500u, waiting[0].position);
-  EXPECT_EQ("yaay", waiting[0].bytes);
-  EXPECT_EQ(9000u, waiting[1].position);
-  EXPECT_EQ("x", waiting[1].bytes);
+  EXPECT_EQ(500u, waiting[1].position);
+  EXPECT_EQ("yaay", waiting[1].bytes);
+  EXPECT_EQ(9000u, waiting[0].position);
+  EXPECT_EQ("x", waiting[0].bytes);
 }
 
 TEST_F(Patched, NeverCutsANumberThatLiesAcrossTwoPages) {
