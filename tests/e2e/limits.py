@@ -10,7 +10,7 @@ TOOL = os.environ["ORIN_TOOL"]
 IS_SANITIZED = os.environ.get("ORIN_SANITIZE", "") != ""   # takes several times the memory and time
 MOST_MEMORY = 256 << 10   # KiB
 INFO_SECONDS, BUILD_SECONDS = 30, 120   # far above what they take, also on a busy machine
-SOME_FAILED, CANNOT_OPEN, CANNOT_BUILD = 1, 4, 5
+SOME_FAILED, NOT_UP_TO_DATE, CANNOT_OPEN, CANNOT_BUILD = 1, 3, 4, 5
 
 
 class Ended:
@@ -62,7 +62,7 @@ def fault(ended, path, refused):
         return f"ended by signal {-ended.code}"
     if ended.memory > MOST_MEMORY and not IS_SANITIZED:
         return f"took {ended.memory >> 10} MiB"
-    if ended.code == 0:
+    if ended.code in (0, NOT_UP_TO_DATE):
         return None
     if ended.code != refused:
         return f"exit code {ended.code}: {ended.error}"
