@@ -139,6 +139,8 @@ FILES = {   # what makes it, whether `info` works, whether a level can be built
     "too-few-bytes": (lambda: tiles(bytes(255), 16, 16, (16, 16)), WORKS, REFUSED),
     "metadata-of-1-GiB": (lambda: changed(tb.METADATA, Value(tb.ASCII, b"x", 1 << 30, 8)),
                           WORKS, WORKS),
+    "short-table": (lambda: one(lambda file: image_tags(
+        64, 64, [file.add(bytes(1024))] * 3, [1024] * 3, (32, 32))), WORKS, REFUSED),
     "overlapping-tiles": (lambda: one(lambda file: image_tags(
         64, 64, [file.add(bytes(1024))] * 4, [1024] * 4, (32, 32))), WORKS, WORKS),
     # Directories.

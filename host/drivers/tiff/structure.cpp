@@ -24,11 +24,12 @@ constexpr size_t kMostDirectories = 65535;
 /// Reads the directories of one file.
 class Parser {
  public:
-  Parser(const PositionedFile& file, TiffStructure& structure)
+  Parser(const PositionedFile& file, const TiffStructure& structure)
       : file_(file), structure_(structure), size_(file.Size()) {}
 
-  /// Reads the header. \returns the link to the first directory
-  uint64_t ReadHeader();
+  /// Reads the header into `structure`, which is the parser's. \returns the link to the first
+  /// directory
+  uint64_t ReadHeader(TiffStructure& structure) const;
   /// The directory at `offset`, or none when there is no valid one.
   std::optional<TiffDirectory> ReadDirectory(uint64_t offset) const;
 
@@ -40,7 +41,7 @@ class Parser {
   void AddEntry(const uint8_t* raw, uint64_t position, TiffDirectory& directory) const;
 
   const PositionedFile& file_;
-  TiffStructure& structure_;
+  const TiffStructure& structure_;
   uint64_t size_;
 };
 
@@ -50,15 +51,15 @@ uint64_t Parser::Number(uint64_t position, unsigned width) const {
   return structure_.byteOrder.Number(bytes.data(), width);
 }
 
-uint64_t Parser::ReadHeader() {
+uint64_t Parser::ReadHeader(TiffStructure& structure) const {
   std::array<uint8_t, 4> start{};
   if (!Holds(0, 8)) Refuse(file_, _("it is no TIFF file"));
   file_.Read(0, start.data(), start.size());
   const bool little = start[0] == 'I' && start[1] == 'I';
   if (!little && !(start[0] == 'M' && start[1] == 'M')) Refuse(file_, _("it is no TIFF file"));
-  structure_.byteOrder.order = little ? std::endian::little : std::endian::big;
+  structure.byteOrder.order = little ? std::endian::little : std::endian::big;
   const uint64_t version = structure_.byteOrder.Number(&start[2], 2);
-  structure_.isBig = version == TIFF_VERSION_BIG;
+  structure.isBig = version == TIFF_VERSION_BIG;
   const bool isKnown = version == TIFF_VERSION_CLASSIC ||
                        (structure_.isBig && Holds(0, 16) && Number(4, 2) == 8 && Number(6, 2) == 0);
   if (!isKnown) Refuse(file_, _("it is no TIFF file"));
@@ -98,8 +99,6 @@ std::optional<TiffDirectory> Parser::ReadDirectory(uint64_t offset) const {
   directory.next = structure_.byteOrder.Number(&raw[held], structure_.LinkBytes());
   for (uint64_t i = 0; i < count; ++i)
     AddEntry(&raw[i * entryBytes], start + i * entryBytes, directory);
-  if (!directory.Find(TIFFTAG_IMAGEWIDTH) || !directory.Find(TIFFTAG_IMAGELENGTH))
-    return std::nullopt;
   return directory;
 }
 
@@ -162,21 +161,29 @@ const TiffEntry* TiffDirectory::Find(uint16_t tag) const {
   return found == entries.end() ? nullptr : &*found;
 }
 
+std::optional<TiffDirectory> ReadDirectoryAt(const PositionedFile& file,
+                                             const TiffStructure& structure, uint64_t offset) {
+  return Parser(file, structure).ReadDirectory(offset);
+}
+
 TiffStructure ParseStructure(const PositionedFile& file) {
   TiffStructure structure;
-  Parser parser(file, structure);
-  uint64_t offset = parser.ReadHeader();
+  const Parser parser(file, structure);
+  uint64_t offset = parser.ReadHeader(structure);
   std::set<uint64_t> seen;
   uint64_t unread = file.Size();  // directories that do not overlap are not larger than the file
   while (offset != 0 && structure.directories.size() < kMostDirectories &&
          seen.insert(offset).second) {
     auto directory = parser.ReadDirectory(offset);
-    if (!directory || directory->linkPosition - offset > unread) break;
+    const bool isImage =
+        directory && directory->Find(TIFFTAG_IMAGEWIDTH) && directory->Find(TIFFTAG_IMAGELENGTH);
+    if (!isImage || directory->linkPosition - offset > unread) break;
     unread -= directory->linkPosition - offset;
     offset = directory->next;
     structure.directories.push_back(std::move(*directory));
   }
   if (structure.directories.empty()) Refuse(file, _("it holds no directory of an image"));
+  structure.isBroken = offset != 0;
   const bool isCut = structure.directories.size() < kMostDirectories;
   if (isCut) structure.directories.back().next = 0;  // a dangling or looping link ends the chain
   return structure;

@@ -6,6 +6,7 @@
 #include <array>
 #include <bit>
 #include <cstdint>
+#include <optional>
 #include <string>
 #include <vector>
 
@@ -49,6 +50,7 @@ struct TiffStructure {
   bool isBig = false;
   ByteOrder byteOrder;
   std::vector<TiffDirectory> directories;  ///< in the order of the chain
+  bool isBroken = false;  ///< the chain ended at a link that leads nowhere, or back
 
   unsigned LinkBytes() const { return isBig ? 8 : 4; }
   unsigned HeaderBytes() const { return isBig ? 16 : 8; }
@@ -66,6 +68,11 @@ unsigned SwapBytes(uint16_t type);
 /// file, and no more is allocated than a few times what the file holds.
 /// \throws orin::Exception  the header or the first directory is not one of a TIFF file
 TiffStructure ParseStructure(const PositionedFile& file);
+
+/// A directory of any kind, also one without an image, at `offset`; none when there is no valid
+/// one.
+std::optional<TiffDirectory> ReadDirectoryAt(const PositionedFile& file,
+                                             const TiffStructure& structure, uint64_t offset);
 
 /// The value's bytes, elements in the machine's byte order.
 std::vector<uint8_t> ReadBytes(const PositionedFile& file, const TiffStructure& structure,
