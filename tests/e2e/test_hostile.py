@@ -222,6 +222,16 @@ class Hostile(Case):
         self.assertTrue(all(len(line) < 200 for line in ended.out.splitlines()), ended.out)
         self.assertTrue(ended.out.replace("\n", "").isprintable())
 
+    def test_a_side_car_that_is_no_file_is_refused_at_once(self):
+        kinds = {"pipe": os.mkfifo, "folder": os.mkdir,
+                 "device": lambda name: os.symlink("/dev/zero", name)}
+        for kind, make in kinds.items():
+            path = one(plain).write(self.path(f"{kind}.tif"))
+            make(path + ".ovr")
+            for arguments in (["info"], ["build", "--external", "--levels", "2"]):
+                ended = limits.run(*arguments, path, seconds=limits.INFO_SECONDS)
+                self.check(ended, path, REFUSED, limits.CANNOT_OPEN)
+
     def test_memory_that_runs_out_is_a_refusal(self):
         if limits.IS_SANITIZED:
             self.skipTest("a sanitizer needs more address space than a limit can leave it")

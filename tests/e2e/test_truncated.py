@@ -13,8 +13,8 @@ import limits
 from orin_e2e import Case, random_pixels, run, write_tiff
 from tiffbytes import boundaries
 
-# Every length up to this one; behind it, wherever something starts or ends, and some more. What runs
-# under a sanitizer takes a tenth of a second to start, and so gets fewer of them.
+# Every length up to this one; behind it, wherever something starts or ends, and some more. A
+# sanitizer makes each start of the tool slow, and so gets fewer of them.
 EVERY_BYTE = 64 if limits.IS_SANITIZED else 1024
 SAMPLES = 60
 TILES = ["TILED=YES", "BLOCKXSIZE=16", "BLOCKYSIZE=16"]
