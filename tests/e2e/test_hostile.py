@@ -139,6 +139,8 @@ FILES = {   # what makes it, whether `info` works, whether a level can be built
     "too-few-bytes": (lambda: tiles(bytes(255), 16, 16, (16, 16)), WORKS, REFUSED),
     "metadata-of-1-GiB": (lambda: changed(tb.METADATA, Value(tb.ASCII, b"x", 1 << 30, 8)),
                           WORKS, WORKS),
+    "short-table": (lambda: one(lambda file: image_tags(
+        64, 64, [file.add(bytes(1024))] * 3, [1024] * 3, (32, 32))), WORKS, REFUSED),
     "overlapping-tiles": (lambda: one(lambda file: image_tags(
         64, 64, [file.add(bytes(1024))] * 4, [1024] * 4, (32, 32))), WORKS, WORKS),
     # Directories.
@@ -219,6 +221,16 @@ class Hostile(Case):
         self.assertIn("?[31mRED?", ended.out)
         self.assertTrue(all(len(line) < 200 for line in ended.out.splitlines()), ended.out)
         self.assertTrue(ended.out.replace("\n", "").isprintable())
+
+    def test_a_side_car_that_is_no_file_is_refused_at_once(self):
+        kinds = {"pipe": os.mkfifo, "folder": os.mkdir,
+                 "device": lambda name: os.symlink("/dev/zero", name)}
+        for kind, make in kinds.items():
+            path = one(plain).write(self.path(f"{kind}.tif"))
+            make(path + ".ovr")
+            for arguments in (["info"], ["build", "--external", "--levels", "2"]):
+                ended = limits.run(*arguments, path, seconds=limits.INFO_SECONDS)
+                self.check(ended, path, REFUSED, limits.CANNOT_OPEN)
 
     def test_memory_that_runs_out_is_a_refusal(self):
         if limits.IS_SANITIZED:

@@ -36,7 +36,7 @@ constexpr char kCannotWrite[] =
 int FlagsOf(PositionedFile::Mode mode) {
   switch (mode) {
     case PositionedFile::Mode::kRead:
-      return O_RDONLY;
+      return O_RDONLY | O_NONBLOCK;  // a pipe of that name must not keep its reader waiting
     case PositionedFile::Mode::kUpdate:
       return O_RDWR;
     case PositionedFile::Mode::kCreate:

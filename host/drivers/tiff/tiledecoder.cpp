@@ -10,6 +10,7 @@
 
 #include "host/drivers/tiff/samplebits.h"
 #include "host/drivers/tiff/sparsesample.h"
+#include "host/drivers/tiff/structure.h"
 #include "host/services/exception.h"
 #include "host/services/text.h"
 
@@ -48,6 +49,19 @@ bool IsRawLayout(const PixelFormat& format) {
          format.WholeBytes() && (!format.swapped || format.bitsPerSample == 8);
 }
 
+/// What the directory at which `tiff` stands claims to tell; libtiff fills a short table up with
+/// tiles that are not stored.
+uint64_t TableLength(const TiffHandle& tiff) {
+  TiffStructure structure;
+  structure.isBig = TIFFIsBigTIFF(tiff.Get()) != 0;
+  structure.byteOrder.order = TIFFIsBigEndian(tiff.Get()) ? std::endian::big : std::endian::little;
+  const PositionedFile file(tiff.Path(), PositionedFile::Mode::kRead);
+  const auto directory = ReadDirectoryAt(file, structure, TIFFCurrentDirOffset(tiff.Get()));
+  const TiffEntry* table = directory ? directory->Find(TIFFTAG_TILEOFFSETS) : nullptr;
+  if (directory && !table) table = directory->Find(TIFFTAG_STRIPOFFSETS);
+  return table ? table->count : 0;
+}
+
 }  // namespace
 
 TileDecoder::TileDecoder(const std::string& path, uint64_t directoryOffset)
@@ -55,7 +69,8 @@ TileDecoder::TileDecoder(const std::string& path, uint64_t directoryOffset)
       format_(FormatOf(tiff_)),
       storedRowBytes_(StoredRowBytes(tiff_, format_)),
       raw_(IsRawLayout(format_)),
-      sparseSample_(orin::drivers::SparseSample(format_.noData, format_.type)) {
+      sparseSample_(orin::drivers::SparseSample(format_.noData, format_.type)),
+      tableLength_(TableLength(tiff_)) {
   const uint64_t samples = uint64_t{format_.tileWidth} * format_.TileSamples();
   if (storedRowBytes_ != PackedBytes(samples, format_.bitsPerSample))
     FailToRead(path, _("its rows have a length that its layout does not explain"));
@@ -68,6 +83,7 @@ void TileDecoder::Fail(uint32_t tile, const std::string& reason) const {
 }
 
 bool TileDecoder::IsSparse(uint32_t tile) const {
+  if (tile >= tableLength_) Fail(tile, _("the file's table of tiles ends before it"));
   return TIFFGetStrileByteCount(tiff_.Get(), tile) == 0 ||
          TIFFGetStrileOffset(tiff_.Get(), tile) == 0;
 }

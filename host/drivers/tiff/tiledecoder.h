@@ -25,6 +25,7 @@ class TileDecoder {
   const TiffHandle& Handle() const { return tiff_; }
 
   /// True when the file does not hold the tile: all its samples are `SparseSample()`.
+  /// \throws orin::Exception  the file's table of tiles does not go as far
   bool IsSparse(uint32_t tile) const;
   /// One delivered sample: the declared no-data value where the type holds it, else 0.
   const std::vector<uint8_t>& SparseSample() const { return sparseSample_; }
@@ -60,6 +61,7 @@ class TileDecoder {
   uint64_t storedRowBytes_;  ///< as libtiff hands a row out
   bool raw_;
   std::vector<uint8_t> sparseSample_;
+  uint64_t tableLength_;               ///< tiles of which the directory tells the position
   std::unique_ptr<uint8_t[]> stored_;  ///< libtiff's rows, where they are not delivered rows
   uint64_t storedCapacity_ = 0;
   uint32_t openStrip_ = UINT32_MAX;  ///< the strip that is decoded row by row
