@@ -15,8 +15,9 @@ using datasources::LevelStatus;
 
 bool Remembers(const StoredLevel& level) { return level.isOurs && !level.metadata.image.IsBlank(); }
 
+/// Channels that are absent count: other programs show them empty.
 bool IsFinished(const StoredLevel& level) {
-  return !level.isOurs || level.metadata.validity.find(kInvalid) == std::string::npos;
+  return !level.isOurs || level.metadata.validity.find_first_not_of(kValid) == std::string::npos;
 }
 
 /// \param fingerprint  of the image now; empty when it is unknown

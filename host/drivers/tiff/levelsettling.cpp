@@ -20,6 +20,7 @@ ImageRecord TiffLevelStore::RecordOrGiveUp(unsigned level, const Pending& pendin
   } catch (const Exception&) {
     const std::shared_ptr<LevelBuild> build = pending.build;
     GiveUp(level, *build);
+    freshness_.EndChange(std::nullopt);
     throw;
   }
 }
@@ -48,7 +49,9 @@ void TiffLevelStore::Settle() {
   if (!file_->Exists()) return freshness_.EndChange(std::nullopt);
   const std::string fingerprint = freshness_.KnownFingerprint();
   std::optional<ImageStamp> stamp = freshness_.Now();
-  if (fingerprint.empty() || !stamp) return freshness_.EndChange(std::nullopt);
+  // Who changed the file meanwhile may have changed the image: then the next answer reads it.
+  const bool wasTouched = freshness_.IsInImage() && file_->TakeWasTouched();
+  if (fingerprint.empty() || !stamp || wasTouched) return freshness_.EndChange(std::nullopt);
   if (freshness_.IsInImage()) {
     const auto now = std::chrono::system_clock::now().time_since_epoch();
     stamp->bytes = file_->File().Size();

@@ -1,6 +1,7 @@
 /// How a complete level gets into the file: by a directory that is added, then linked.
 // SPDX-License-Identifier: MIT
 #include <algorithm>
+#include <set>
 
 #include "host/drivers/tiff/tifflevelstore.h"
 
@@ -107,6 +108,47 @@ void TiffLevelStore::TidyMasks(std::optional<uint64_t> strayMask) {
   const auto changes = MaskTypeChanges(file_->File(), file_->Structure());
   for (const TypeChange& change : changes) file_->Overwrite(change.position, change.bytes);
   if (!changes.empty()) file_->Sync();
+}
+
+/// Whether finished channels are kept back, and keeps them: other programs would show a level of
+/// which the rest is empty. What is kept back is lost when the program is killed.
+/// \param image  that they were computed from
+bool TiffLevelStore::Waits(unsigned level, Pending& pending, const std::vector<unsigned>& channels,
+                           const datasources::ImageRecord& image) const {
+  const bool joinsMasks = settings_.validity.hasMask;  // from channel to channel, in the file
+  if (!pending.coding.format.planar || joinsMasks || FindOurs(level)) return false;
+  std::set<unsigned> all(pending.waiting.begin(), pending.waiting.end());
+  all.insert(channels.begin(), channels.end());
+  pending.waiting.assign(all.begin(), all.end());
+  pending.waitingImage = image;
+  pending.waitingSource = lastRead_;
+  return pending.waiting.size() < settings_.image.samples;
+}
+
+void TiffLevelStore::StoreWaiting(unsigned level) {
+  const auto entry = pending_.find(level);
+  if (entry == pending_.end() || entry->second.waiting.empty()) return;
+  lastRead_ = entry->second.waitingSource;
+  StoreFinished(level, entry->second, {}, datasources::ImageRecord(entry->second.waitingImage));
+}
+
+void TiffLevelStore::StoreAllWaitingBut(unsigned level) {
+  std::vector<unsigned> levels;
+  for (const auto& [other, pending] : pending_)
+    if (other != level && !pending.waiting.empty()) levels.push_back(other);
+  for (const unsigned other : levels) StoreWaiting(other);
+}
+
+/// Stores `channels` and those that wait, and marks them valid.
+void TiffLevelStore::StoreFinished(unsigned level, Pending& pending,
+                                   const std::vector<unsigned>& channels,
+                                   const datasources::ImageRecord& image) {
+  std::set<unsigned> all(channels.begin(), channels.end());
+  all.insert(pending.waiting.begin(), pending.waiting.end());
+  pending.waiting.clear();
+  const std::vector<unsigned> finished(all.begin(), all.end());
+  Store(level, pending, PlanesOf(pending.coding, finished), image);
+  MarkStored(level, finished, true);
 }
 
 /// Puts the tiles of `planes` into the level's directory; its validity is turned on by nobody here.

@@ -35,6 +35,7 @@ TiffLevelStore::TiffLevelStore(std::unique_ptr<LevelFile> file, Settings setting
 
 TiffLevelStore::~TiffLevelStore() {
   try {
+    StoreAllWaitingBut(0);
     if (!file_->IsChanged()) return;
     freshness_.BeginChange(levels_);
     file_->GiveBackSpace();
@@ -128,6 +129,7 @@ void TiffLevelStore::AddPending(unsigned level, const Pending& pending,
   }
   for (size_t i = 0; i < pending.channels.size(); ++i)
     if (pending.channels[i]) entry->presentChannels[i] = true;
+  for (const unsigned channel : pending.waiting) entry->validChannels.at(channel - 1) = true;
 }
 
 std::vector<LevelDescription> TiffLevelStore::List() const {
@@ -162,6 +164,7 @@ void TiffLevelStore::Create(unsigned level, const std::vector<unsigned>& channel
   const std::lock_guard lock(mutex_);
   if (!file_->MayChange())
     Fail(_("%s: is open for reading only; level %u cannot be made."), level, "Create");
+  StoreAllWaitingBut(level);
   auto entry = pending_.find(level);
   if (entry == pending_.end()) {
     RequireRoomFor(level, channels);
@@ -188,6 +191,7 @@ std::unique_ptr<datasources::IRasterWriter> TiffLevelStore::OpenWriter(
 std::unique_ptr<PixelReader> TiffLevelStore::OpenPixels(unsigned level,
                                                         const std::vector<unsigned>& channels) {
   const std::lock_guard lock(mutex_);
+  if (!Find(level)) StoreWaiting(level);
   const StoredLevel* stored = Find(level);
   if (!stored) Fail(_("%s: level %u is not finished and cannot be read."), level, "OpenPixels");
   if (!pending_.contains(level)) NoteSource(*stored, channels);
@@ -248,6 +252,9 @@ std::shared_ptr<LevelBuild> TiffLevelStore::BeginWriting(unsigned level,
   for (const unsigned channel : channels)
     if (ours && ours->metadata.validity[channel - 1] == kValid) valid.push_back(channel);
   if (!valid.empty()) Mark(*ours, valid, kInvalid);
+  std::erase_if(pending.waiting, [&](unsigned waiting) {
+    return std::find(channels.begin(), channels.end(), waiting) != channels.end();
+  });
   if (!pending.build)
     pending.build = std::make_shared<LevelBuild>(pending.coding, file_->ToAppend().End());
   if (!source_) freshness_.Prepare(pending.imageAtStart);
@@ -275,8 +282,12 @@ void TiffLevelStore::GiveUp(unsigned level, LevelBuild& build) {
 void TiffLevelStore::EndWriting(unsigned level, LevelBuild& build) noexcept {
   const std::lock_guard lock(mutex_);
   if (--build.writers > 0 || build.isClosed) return;
+  const auto pending = pending_.find(level);
+  const bool isWaited = pending != pending_.end() && !pending->second.waiting.empty();
+  if (isWaited && build.HasOnlyCompletePlanes()) return;
   try {
-    if (!build.IsEmpty() && build.HasOnlyCompletePlanes())
+    if (isWaited) StoreWaiting(level);
+    else if (!build.IsEmpty() && build.HasOnlyCompletePlanes())
       Store(level, pending_.at(level), CompletePlanes(build), std::nullopt);
   } catch (const std::exception&) {
     // deliberate: a destructor calls this; the level stays what it was in the file
@@ -299,10 +310,17 @@ void TiffLevelStore::SetValid(unsigned level, const std::vector<unsigned>& chann
         Fail(_("%s: level %u is not complete and cannot be marked valid."), level, "SetValid");
     if (const LevelBuild* mask = pending->second.build->mask.get(); mask && !mask->IsComplete(0))
       Fail(_("%s: level %u is not complete and cannot be marked valid."), level, "SetValid");
-    Store(level, pending->second, planes, RecordOrGiveUp(level, pending->second));
-  } else if (file_->Exists()) {
-    CatchUp();
+    const datasources::ImageRecord image = RecordOrGiveUp(level, pending->second);
+    if (!Waits(level, pending->second, channels, image))
+      StoreFinished(level, pending->second, channels, image);
+    return;
   }
+  if (!Find(level)) StoreWaiting(level);
+  if (file_->Exists()) CatchUp();
+  MarkStored(level, channels, valid);
+}
+
+void TiffLevelStore::MarkStored(unsigned level, const std::vector<unsigned>& channels, bool valid) {
   const StoredLevel* stored = Find(level);
   RequireStored(stored, level, channels);
   if (stored->isOurs) Mark(*stored, channels, valid ? kValid : kInvalid);

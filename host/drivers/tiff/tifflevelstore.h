@@ -31,7 +31,8 @@ std::unique_ptr<datasources::ILevelStore> OpenInternalLevels(
 
 /// A level appears in the file when it is complete: tiles first, then its directory, then the link
 /// to it, then its validity, each durable before the next. Until then it is pending here; a pending
-/// level that is given up leaves nothing behind.
+/// level that is given up leaves nothing behind. A new level of planes appears with all of its
+/// channels: finished ones wait for the others, as long as the level is the one being made.
 ///
 /// Operations may be called from several threads.
 class TiffLevelStore final : public datasources::ILevelStore {
@@ -92,6 +93,9 @@ class TiffLevelStore final : public datasources::ILevelStore {
     bool isRecoded = false;             ///< stored tiles have another form and are given up
     std::shared_ptr<LevelBuild> build;  ///< null until the first write
     std::optional<datasources::ImageStamp> imageAtStart;
+    std::vector<unsigned> waiting;          ///< channels that are finished and wait for the others
+    datasources::ImageRecord waitingImage;  ///< what these were computed from
+    unsigned waitingSource = 0;             ///< and from which level; 0 as for `lastRead_`
   };
 
   const StoredLevel* Find(unsigned level) const;
@@ -123,6 +127,13 @@ class TiffLevelStore final : public datasources::ILevelStore {
   std::vector<uint32_t> CompletePlanes(const LevelBuild& build) const;
   void RequireStored(const StoredLevel* stored, unsigned level,
                      const std::vector<unsigned>& channels) const;
+  bool Waits(unsigned level, Pending& pending, const std::vector<unsigned>& channels,
+             const datasources::ImageRecord& image) const;
+  void StoreWaiting(unsigned level);
+  void StoreAllWaitingBut(unsigned level);
+  void StoreFinished(unsigned level, Pending& pending, const std::vector<unsigned>& channels,
+                     const datasources::ImageRecord& image);
+  void MarkStored(unsigned level, const std::vector<unsigned>& channels, bool valid);
   void Store(unsigned level, Pending& pending, const std::vector<uint32_t>& planes,
              const std::optional<datasources::ImageRecord>& image);
   void AddDirectory(const Pending& pending, const LevelMetadata& metadata,

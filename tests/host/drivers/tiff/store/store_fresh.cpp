@@ -182,7 +182,7 @@ TEST_F(Fresh, ChannelsOfAnEarlierImageAreDroppedFromALevel) {
   Flip(file_, TileAt(file_, 3).first);
   Build(file_, kImage, {.level = 2, .channels = {2}});
   EXPECT_EQ("-1-", ValidityOf(Level()));
-  EXPECT_EQ(LevelStatus::kCurrent, Level().status);
+  EXPECT_EQ(LevelStatus::kUnfinished, Level().status);
 }
 
 TEST_F(Fresh, LevelThatAnotherProgramTookOverIsUnverified) {
