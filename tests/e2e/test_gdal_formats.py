@@ -10,6 +10,7 @@ import numpy
 from osgeo import gdal
 import rasterio
 
+from mask_twin import disc, level_validity
 from orin_e2e import (Case, NUMPY_TYPES, info, nearest, overview_sizes, random_pixels, read_pixels,
                       run)
 
@@ -165,6 +166,33 @@ class NoData(Formats):
         self.assertTrue((read_pixels("image.bmp", 0)[0, 25:30, 25:30] == 200).all())
         self.assertEqual(before, os.stat("image.bmp.aux.xml").st_mtime_ns)
 
+    def test_nan_and_infinities_leave_no_rim(self):
+        places = (("ENVI", "heights.envi"), ("netCDF", "field.nc"), ("GTiff", "heights.tif"))
+        for driver, file in places:
+            for value in (float("nan"), float("-inf")):
+                name = file
+                with self.subTest(format=driver, value=value):
+                    pixels = random_pixels((1, ROWS, COLUMNS), numpy.float32, 3) + 9000
+                    pixels[0, 50:90, 40:101] = value
+                    write(name, driver, pixels, "Float32", no_data=[value])
+                    if driver == "GTiff":
+                        gdal.Translate("heights.vrt", name)
+                        name = "heights.vrt"
+                    self.assertRan(run("build", name, "--levels", "2,4", "--method", "average"))
+                    for index, level in ((0, 2), (1, 4)):
+                        stored = read_pixels(name, index)[0]
+                        hole = ~numpy.isfinite(stored)
+                        rows, columns = (slice(-(-50 // level), 90 // level),
+                                         slice(40 // level, 100 // level))
+                        self.assertTrue(hole[rows, columns].all())
+                        self.assertTrue(numpy.array_equal(
+                            stored[hole], numpy.full(hole.sum(), value, stored.dtype),
+                            equal_nan=True))
+                        self.assertGreater(stored[~hole].min(), 4000)
+                        self.assertLess(hole.sum(), 42 * 64 // (level * level) + 60)
+                    for other in os.listdir("."):
+                        os.remove(other)
+
     def test_of_64_bits_is_exact(self):
         value = 2**63 - 1
         pixels = numpy.full((1, 64, 64), value - 1, numpy.int64)
@@ -176,6 +204,57 @@ class NoData(Formats):
         gdal.Translate("image.vrt", "image.tif")
         self.assertRan(run("build", "image.vrt", "--levels", "2", "--method", "nearest"))
         self.assertSamePixels(pixels[:, ::2, ::2], read_pixels("image.vrt", 0))
+
+
+class Channels(Formats):
+    def test_of_opacity_say_what_is_valid(self):
+        for method in ("average", "bilinear", "nearest"):
+            with self.subTest(method=method):
+                valid = disc(COLUMNS, ROWS)
+                pixels = numpy.empty((4, ROWS, COLUMNS), numpy.uint8)
+                pixels[:3] = numpy.where(valid, 150, 3)  # 3: colours that nobody sees
+                pixels[3] = valid * 255
+                write("rgba.png", "PNG", pixels, "Byte")
+                self.assertRan(run("build", "rgba.png", "--levels", "2,4", "--method", method))
+                two = level_validity(valid, 1, 2, (COLUMNS, ROWS), method, 1)
+                four = level_validity(two, 2, 4, (COLUMNS, ROWS), method, 1)
+                for index, expected in enumerate((two, four)):
+                    level = read_pixels("rgba.png", index)
+                    self.assertTrue(((level[3] > 0) == expected).all())
+                    self.assertEqual({150}, set(level[:3, expected].flatten().tolist()))
+                    self.assertEqual({0}, set(level[:3, ~expected].flatten().tolist()))
+                with rasterio.open("rgba.png.ovr") as levels:
+                    self.assertEqual("alpha", levels.colorinterp[3].name)
+                os.remove("rgba.png.ovr")
+
+    def test_of_classes_are_not_blended_without_a_warning(self):
+        pixels = random_pixels((1, ROWS, COLUMNS), numpy.uint8, 1) % 3
+        write("classes.gif", "GIF", pixels, "Byte")
+        memory = gdal.GetDriverByName("MEM").Create("", COLUMNS, ROWS, 1)
+        memory.GetRasterBand(1).WriteArray(pixels[0])
+        colours = gdal.ColorTable()
+        for index in range(3):
+            colours.SetColorEntry(index, (index * 50, 0, 0, 255))
+        memory.GetRasterBand(1).SetColorTable(colours)
+        gdal.GetDriverByName("PNG").CreateCopy("classes.png", memory)
+        gdal.GetDriverByName("HFA").CreateCopy("classes.img", memory)
+        for name in ("classes.gif", "classes.png", "classes.img"):
+            with self.subTest(name=name):
+                answer = run("build", name, "--levels", "2", "--method", "average")
+                self.assertRan(answer)
+                self.assertIn("numbers of palette colours or classes", answer.stderr)
+                answer = run("build", name, "--levels", "2", "--method", "mode", "--force")
+                self.assertRan(answer)
+                self.assertEqual("", answer.stderr)
+
+    def test_of_few_bits_stay_so(self):
+        pixels = random_pixels((1, ROWS, COLUMNS), numpy.uint16, 1) % 4096
+        write("deep.jp2", "JP2OpenJPEG", pixels, "UInt16",
+              ["NBITS=12", "REVERSIBLE=YES", "QUALITY=100"])
+        self.assertRan(run("build", "deep.jp2", "--levels", "2", "--method", "bicubic"))
+        self.assertLessEqual(read_pixels("deep.jp2", 0).max(), 4095)
+        with rasterio.open("deep.jp2.ovr") as levels:
+            self.assertEqual("12", levels.tags(1, ns="IMAGE_STRUCTURE")["NBITS"])
 
 
 class Damaged(Formats):

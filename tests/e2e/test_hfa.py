@@ -153,6 +153,26 @@ class Inside(Hfa):
         self.assertRan(run("build", self.file, "--levels", "2", "--method", "average"))
         self.assertTrue((read_pixels(self.file, 0)[0, 20:50, 5:30] == -9999).all())
 
+    def test_nan_and_infinities_leave_no_rim(self):
+        for value in (float("nan"), float("inf")):
+            for type_name in ("Float32", "Float64"):
+                with self.subTest(value=value, type=type_name):
+                    dtype = NUMPY_TYPES[type_name]
+                    pixels = random_pixels((2, 205, 333), dtype, 5) + dtype(9000)
+                    pixels[:, 40:101, 10:61] = value
+                    write(self.file, pixels, type_name, no_data=value)
+                    self.assertRan(run("build", self.file, "--levels", "2,4", "--method",
+                                       "average"))
+                    self.assertEqual(["scene.img"], os.listdir(self.folder))
+                    for index, level in ((0, 2), (1, 4)):
+                        stored = read_pixels(self.file, index)
+                        hole = ~numpy.isfinite(stored)
+                        self.assertTrue(hole[:, 40 // level:100 // level,
+                                             12 // level:60 // level].all())
+                        self.assertEqual({str(value)}, set(map(str, stored[hole].tolist())))
+                        self.assertGreater(stored[~hole].min(), 4000)
+                    os.remove(self.file)
+
 
 class Beside(Hfa):
     def check_beside(self, file, pixels):

@@ -5,8 +5,6 @@
 
 #include <algorithm>
 #include <cerrno>
-#include <charconv>
-#include <cmath>
 #include <cstring>
 #include <utility>
 
@@ -38,13 +36,6 @@ void RequireWritable(const std::string& name) {
                         std::strerror(errno)));
 }
 
-bool IsFiniteDecimal(const std::string& text) {
-  double value = 0;
-  const char* end = text.data() + text.size();
-  const auto [stop, error] = std::from_chars(text.data(), end, value);
-  return error == std::errc() && stop == end && std::isfinite(value);
-}
-
 }  // namespace
 
 GdalSource::GdalSource(std::string name, const GdalFormat& format, datasources::AccessMode access)
@@ -71,10 +62,12 @@ void GdalSource::ReadChannels(const GdalHandle& handle) {
     types_.push_back(CommonTypeOf(handle, {channel}));
     channelItems_.push_back(ItemsOf(band));
     declared.push_back(NoDataTextOf(band));
+    storedBits_.push_back(StoredBitsOfBand(band, types_.back()));
+    holdsClasses_ = holdsClasses_ || HoldsClassNumbers(band);
     if (alphaChannel_ == 0 && GDALGetRasterColorInterpretation(band) == GCI_AlphaBand)
       alphaChannel_ = channel;
   }
-  AnswerNoData(declared);
+  DeclareNoData(declared);
 }
 
 /// Where reading one channel costs as much as reading all, and all fit into memory.
@@ -92,14 +85,14 @@ void GdalSource::KeepDecodedRows(const GdalHandle& handle) {
   decoded_ = std::make_shared<DecodedRows>(width_, height_, pixel, rows);
 }
 
-void GdalSource::AnswerNoData(const std::vector<std::string>& declared) {
+void GdalSource::DeclareNoData(const std::vector<std::string>& declared) {
   if (items_.contains(kNoDataKey)) return;
   const bool agree = std::all_of(declared.begin(), declared.end(),
                                  [&](const std::string& text) { return text == declared[0]; });
-  if (agree && IsFiniteDecimal(declared[0])) items_[kNoDataKey] = declared[0];
+  if (agree && !declared[0].empty()) items_[kNoDataKey] = declared[0];
   if (agree) return;
   for (size_t i = 0; i < declared.size(); ++i)
-    if (IsFiniteDecimal(declared[i])) channelItems_[i].emplace(kNoDataKey, declared[i]);
+    if (!declared[i].empty()) channelItems_[i].emplace(kNoDataKey, declared[i]);
 }
 
 AuxiliaryData GdalSource::MetadataOf(const std::vector<unsigned>& channels) const {

@@ -24,28 +24,31 @@ class GdalSource final : public datasources::IRasterSource {
   unsigned Height() const override { return height_; }
   unsigned ChannelCount() const override { return static_cast<unsigned>(types_.size()); }
   gobs::DataType TypeOf(unsigned channel) const override { return types_.at(channel - 1); }
-  /// Items of the default domain. The no-data value is the item of that name, else what is declared
-  /// where that is a finite number: for the file when all of its channels agree.
+  unsigned StoredBitsOf(unsigned channel) const override { return storedBits_.at(channel - 1); }
+  /// A colour table, category names, or a layer that is called thematic.
+  bool HoldsClasses() const override { return holdsClasses_; }
+  unsigned AlphaChannel() const override { return alphaChannel_; }
+  /// Items of the default domain. The no-data value is the item of that name, else what is
+  /// declared, NaN and infinities included: for the file when all of its channels agree.
   datasources::AuxiliaryData MetadataOf(const std::vector<unsigned>& channels) const override;
   std::unique_ptr<datasources::IRasterReader> OpenReader(
       const std::vector<unsigned>& channels) override;
   /// Levels inside the file; what the format makes up without storing it is none.
   datasources::ILevelStore* Levels() override { return levels_.get(); }
 
-  /// The channel that holds opacity, 1-based; 0 when there is none.
-  unsigned AlphaChannel() const { return alphaChannel_; }
-
  private:
   void ReadChannels(const GdalHandle& handle);
   void KeepDecodedRows(const GdalHandle& handle);
-  void AnswerNoData(const std::vector<std::string>& declared);
+  void DeclareNoData(const std::vector<std::string>& declared);
 
   std::string name_;
   const GdalFormat& format_;
   unsigned width_ = 0;
   unsigned height_ = 0;
   unsigned alphaChannel_ = 0;
+  bool holdsClasses_ = false;
   std::vector<gobs::DataType> types_;
+  std::vector<unsigned> storedBits_;  ///< one a channel
   datasources::AuxiliaryData::Items items_;
   std::vector<datasources::AuxiliaryData::Items> channelItems_;
   std::unique_ptr<datasources::ILevelStore> levels_;
