@@ -11,6 +11,7 @@
 #include "host/drivers/gdal/gdalbands.h"
 #include "host/drivers/gdal/gdalerrors.h"
 #include "host/drivers/gdal/gdalreader.h"
+#include "host/drivers/gdal/gdalwatch.h"
 #include "host/drivers/gdal/hfalevelstore.h"
 #include "host/drivers/gdal/subdatasets.h"
 #include "host/services/exception.h"
@@ -48,6 +49,7 @@ GdalSource::GdalSource(std::string name, const GdalFormat& format, datasources::
   items_ = ItemsOf(handle.Get());
   ReadChannels(handle);
   KeepDecodedRows(handle);
+  watch_ = WatchOf(handle, format_);
   if (format_.code == kFormatErdas)
     levels_ = OpenHfaLevels(name_, format_, *this, access == datasources::kUpdate);
 }

@@ -35,6 +35,7 @@ class GdalSource final : public datasources::IRasterSource {
       const std::vector<unsigned>& channels) override;
   /// Levels inside the file; what the format makes up without storing it is none.
   datasources::ILevelStore* Levels() override { return levels_.get(); }
+  std::shared_ptr<datasources::ImageWatch> Watch() override { return watch_; }
 
  private:
   void ReadChannels(const GdalHandle& handle);
@@ -51,6 +52,7 @@ class GdalSource final : public datasources::IRasterSource {
   std::vector<unsigned> storedBits_;  ///< one a channel
   datasources::AuxiliaryData::Items items_;
   std::vector<datasources::AuxiliaryData::Items> channelItems_;
+  std::shared_ptr<datasources::ImageWatch> watch_;
   std::unique_ptr<datasources::ILevelStore> levels_;
   std::shared_ptr<DecodedRows> decoded_;  ///< null when readers decode for themselves
 };

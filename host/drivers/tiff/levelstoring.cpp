@@ -117,7 +117,8 @@ void TiffLevelStore::Store(unsigned level, Pending& pending, const std::vector<u
   file_->Sync();
   CatchUp();
   const StoredLevel* before = pending.isRecoded ? nullptr : FindOurs(level);
-  const datasources::ImageRecord kept = before ? before->metadata.image : datasources::ImageRecord();
+  const datasources::ImageRecord kept =
+      before ? before->metadata.image : datasources::ImageRecord();
   AddDirectory(pending, MetadataFor(level, pending, before, image.value_or(kept)), planes);
   pending.isRecoded = false;
   Reload();
