@@ -174,6 +174,56 @@ class Inside(Hfa):
                     os.remove(self.file)
 
 
+class Cleaned(Hfa):
+    def setUp(self):
+        super().setUp()
+        write(self.file, self.pixels, "Byte")
+        dataset = gdal.Open(self.file, gdal.GA_Update)
+        dataset.SetMetadataItem("SENSOR", "camera")
+        del dataset
+        self.assertRan(run("build", self.file, "--levels", "2,4", "--method", "nearest"))
+
+    def check_clean(self):
+        self.assertEqual([], info(self.file)["levels"])
+        self.assertEqual([], overview_sizes(self.file))
+        self.assertSamePixels(self.pixels, read_pixels(self.file))
+        self.assertEqual({"SENSOR": "camera"}, gdal.Open(self.file).GetMetadata())
+
+    def test_takes_levels_and_their_records_away(self):
+        answer = run("clean", self.file)
+        self.assertRan(answer)
+        self.assertIn("levels removed: 2, 4 (inside the file)", answer.stdout)
+        self.check_clean()
+        self.assertIn("nothing to do", run("clean", self.file).stdout)
+        self.assertRan(run("build", self.file, "--levels", "2,4", "--method", "nearest"))
+        self.check_levels(self.file, self.pixels)
+        self.assertRan(run("clean", self.file, "--levels", "2,4,8"))
+        self.check_clean()
+
+    def test_takes_all_levels_or_none(self):
+        before = pathlib.Path(self.file).read_bytes()
+        answer = run("clean", self.file, "--levels", "2")
+        self.assertNotEqual(0, answer.returncode)
+        self.assertIn("scene.img: levels inside this format are removed all together, and level 4 "
+                      "is to stay", answer.stderr)
+        self.assertEqual(before, pathlib.Path(self.file).read_bytes())
+
+    def test_takes_levels_of_other_programs(self):
+        dataset = gdal.Open(self.file, gdal.GA_Update)
+        dataset.BuildOverviews("AVERAGE", [8])
+        del dataset
+        self.assertRan(run("clean", self.file))
+        self.check_clean()
+
+    def test_a_read_only_file_keeps_them(self):
+        os.chmod(self.file, 0o444)
+        os.chmod(self.folder, 0o777)
+        answer = run("clean", self.file, **SOMEBODY)
+        self.assertNotEqual(0, answer.returncode)
+        self.assertIn("scene.img: cannot be opened for writing: Permission denied", answer.stderr)
+        self.assertEqual([2, 4], all_valid(self.file))
+
+
 class Beside(Hfa):
     def check_beside(self, file, pixels):
         self.assertTrue(os.path.exists(file + ".ovr"))

@@ -39,9 +39,9 @@ void RequireWritable(const std::string& name) {
 
 }  // namespace
 
-GdalSource::GdalSource(std::string name, const GdalFormat& format, datasources::AccessMode access)
+GdalSource::GdalSource(std::string name, const GdalFormat& format, SourceUse use)
     : name_(std::move(name)), format_(format) {
-  if (access == datasources::kUpdate) RequireWritable(name_);
+  if (use != SourceUse::kRead) RequireWritable(name_);
   const GdalHandle handle(name_, format_);
   if (GDALGetRasterCount(handle.Get()) == 0) Refuse(NoRasterText(handle));
   width_ = static_cast<unsigned>(GDALGetRasterXSize(handle.Get()));
@@ -50,8 +50,7 @@ GdalSource::GdalSource(std::string name, const GdalFormat& format, datasources::
   ReadChannels(handle);
   KeepDecodedRows(handle);
   watch_ = WatchOf(handle, format_);
-  if (format_.code == kFormatErdas)
-    levels_ = OpenHfaLevels(name_, format_, *this, access == datasources::kUpdate);
+  if (format_.code == kFormatErdas) levels_ = OpenHfaLevels(name_, format_, *this, use);
 }
 
 GdalSource::~GdalSource() = default;

@@ -10,14 +10,15 @@
 #include "host/datasources/levelstore.h"
 #include "host/drivers/gdal/decodedrows.h"
 #include "host/drivers/gdal/gdalhandle.h"
+#include "host/drivers/gdal/sourceuse.h"
 
 namespace orin::drivers {
 
 class GdalSource final : public datasources::IRasterSource {
  public:
-  /// \throws orin::Exception  it cannot be opened, it holds no raster, or for kUpdate: the file
+  /// \throws orin::Exception  it cannot be opened, it holds no raster, or unless for kRead: the file
   ///                          cannot be written, or it cannot hold levels that its format could
-  GdalSource(std::string name, const GdalFormat& format, datasources::AccessMode access);
+  GdalSource(std::string name, const GdalFormat& format, SourceUse use);
   ~GdalSource() override;
 
   unsigned Width() const override { return width_; }

@@ -51,23 +51,23 @@ bool HasRoom(const std::string& path, const datasources::IRasterSource& image) {
 std::unique_ptr<datasources::ILevelStore> OpenHfaLevels(const std::string& name,
                                                         const GdalFormat& format,
                                                         datasources::IRasterSource& image,
-                                                        bool update) {
+                                                        SourceUse use) {
   std::error_code none;
   const std::filesystem::path real = std::filesystem::canonical(name, none);
   const std::string path = none ? name : real.string();
   const HfaPyramid pyramid = ReadHfaPyramid(path);
   const bool isForeign =
       pyramid.NamesAnotherFileThan(std::filesystem::path(path).filename().string());
-  if (update && isForeign)
+  if (use != SourceUse::kRead && isForeign)
     Refuse(_("%s: holds a list of levels under another file's name, for it was copied or renamed; "
              "levels inside it would change that file. Build with --external."),
            name);
-  if (update && (pyramid.isSpilled || !HasRoom(path, image)))
+  if (use == SourceUse::kUpdate && (pyramid.isSpilled || !HasRoom(path, image)))
     Refuse(_("%s: would grow beyond the 2 GB that the format keeps in one file. Build with "
              "--external."),
            name);
   if (isForeign) return nullptr;
-  return std::make_unique<HfaLevelStore>(path, format, image, update);
+  return std::make_unique<HfaLevelStore>(path, format, image, use != SourceUse::kRead);
 }
 
 HfaLevelStore::HfaLevelStore(std::string path, const GdalFormat& format,
@@ -110,12 +110,6 @@ void HfaLevelStore::LockFile() {
   Refuse(_("%s: another build is writing levels into it. Wait until it is finished, then run "
            "again."),
          path_);
-}
-
-void HfaLevelStore::Remove(const std::vector<unsigned>& levels) {
-  for (const unsigned level : levels)
-    if (!PositionsOf(level, {1}).empty())
-      Fail(_("%s: level %u stands inside, from where this format has no way to remove it."), level);
 }
 
 /// The format rounds up; what we make ends where it should.

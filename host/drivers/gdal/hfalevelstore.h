@@ -14,17 +14,17 @@
 #include "host/drivers/gdal/hfarecord.h"
 #include "host/drivers/gdal/hfatree.h"
 #include "host/drivers/gdal/hfaupdate.h"
+#include "host/drivers/gdal/sourceuse.h"
 
 namespace orin::drivers {
 
 /// The levels inside `name`, or null when it holds none that are its own and cannot take any.
-/// \param image   its full resolution; outlives the store
-/// \param update  levels may be made and changed
-/// \throws orin::Exception  the file cannot be read, or for an update: it cannot hold levels
+/// \param image  its full resolution; outlives the store
+/// \throws orin::Exception  the file cannot be read, or it cannot be used so
 std::unique_ptr<datasources::ILevelStore> OpenHfaLevels(const std::string& name,
                                                         const GdalFormat& format,
                                                         datasources::IRasterSource& image,
-                                                        bool update);
+                                                        SourceUse use);
 
 /// The pixels of one level that are being written, and which of them are.
 struct HfaBuild {

@@ -1,4 +1,5 @@
-/// How a level gets into an ERDAS Imagine file: not valid first, then its pixels, then valid.
+/// How a level gets into an ERDAS Imagine file: not valid first, then its pixels, then valid; and
+/// how levels leave it.
 // SPDX-License-Identifier: MIT
 #include <algorithm>
 #include <filesystem>
@@ -119,6 +120,31 @@ void HfaLevelStore::SetValid(unsigned level, const std::vector<unsigned>& channe
   for (const unsigned channel : channels)
     now.validity.at(channel - 1) = valid ? kHfaValid : kHfaInvalid;
   Record(level, now);
+}
+
+/// The library knows no other way than to remove all of them; the space that they took stays.
+void HfaLevelStore::Remove(const std::vector<unsigned>& levels) {
+  const std::lock_guard lock(mutex_);
+  std::vector<std::string> keys;
+  std::optional<unsigned> going, staying;
+  for (const auto& names : pyramid_.channels)
+    for (const HfaLevelName& name : names) {
+      const bool goes = std::find(levels.begin(), levels.end(), name.factor) != levels.end();
+      if (name.factor >= 2) (goes ? going : staying) = name.factor;
+      keys.push_back(HfaRecordKey(name.factor));
+    }
+  if (!going) return;
+  if (staying)
+    Fail(
+        _("%s: levels inside this format are removed all together, and level %u is to stay. Remove "
+          "all of them, then build those again that are wanted."),
+        *staying);
+  if (!mayChange_) Fail(_("%s: is open for reading only; level %u cannot be removed."), *going);
+  LockFile();
+  HfaUpdate update(path_, Overwrites::kWait);
+  update.RemoveLevels(keys);
+  update.Commit();
+  Reload();
 }
 
 }  // namespace orin::drivers
