@@ -13,6 +13,8 @@ import numpy
 from osgeo import gdal
 import rasterio
 
+from mask_case import write_mask_beside
+from mask_twin import disc, level_validity, masks_of_levels
 from orin_e2e import (Case, NUMPY_TYPES, TOOL, info, nearest, overview_sizes, random_pixels,
                       read_pixels, run)
 
@@ -274,6 +276,30 @@ class Beside(Hfa):
         os.rename(self.file, renamed)
         self.assertRan(run("build", renamed, "--levels", "2", "--method", "nearest"))
         self.check_beside(renamed, self.pixels)
+
+    def test_an_image_with_a_mask_gets_a_side_car_with_masks(self):
+        valid = disc(333, 205)
+        self.pixels[:, ~valid] = 3
+        self.pixels[:, valid] = 200
+        write(self.file, self.pixels, "Byte")
+        write_mask_beside(self.file, valid)
+        before = pathlib.Path(self.file).read_bytes()
+        answer = run("build", self.file, "--levels", "2", "--internal")
+        self.assertNotEqual(0, answer.returncode)
+        self.assertFalse(os.path.exists(self.file + ".ovr"))
+        self.assertRan(run("build", self.file, "--levels", "2", "--method", "bilinear"))
+        self.assertEqual(before, pathlib.Path(self.file).read_bytes())
+        expected = level_validity(valid, 1, 2, (333, 205), "bilinear", 1)
+        self.assertTrue((expected == masks_of_levels(self.file)[0]).all())
+        self.assertEqual({200}, set(read_pixels(self.file, 0)[:, expected].flatten().tolist()))
+
+    def test_a_mask_that_came_later_does_not_keep_levels_inside(self):
+        write(self.file, self.pixels, "Byte")
+        self.assertRan(run("build", self.file, "--levels", "2,4", "--method", "nearest"))
+        write_mask_beside(self.file, disc(333, 205))
+        self.assertRan(run("clean", self.file))
+        self.assertEqual([], info(self.file)["levels"])
+        self.assertSamePixels(self.pixels, read_pixels(self.file))
 
     def test_a_link_leads_to_the_file(self):
         write(self.file, self.pixels, "Byte")

@@ -50,10 +50,21 @@ GdalSource::GdalSource(std::string name, const GdalFormat& format, SourceUse use
   ReadChannels(handle);
   KeepDecodedRows(handle);
   watch_ = WatchOf(handle, format_);
-  if (format_.code == kFormatErdas) levels_ = OpenHfaLevels(name_, format_, *this, use);
+  if (format_.code != kFormatErdas) return;
+  if (use == SourceUse::kUpdate) RequireAllValid();
+  levels_ = OpenHfaLevels(name_, format_, *this, use);
 }
 
 GdalSource::~GdalSource() = default;
+
+/// Levels inside could not say which of their pixels hold data.
+void GdalSource::RequireAllValid() const {
+  datasources::ISideCarFormat* beside = datasources::FormatRegistry::Instance().SideCarFormat();
+  if (alphaChannel_ != 0 || (beside && beside->OpenMaskBeside(name_, width_, height_)))
+    Refuse(FormatString(_("%s: has a mask or opacity, which levels inside this format cannot have. "
+                          "Build with --external."),
+                        name_.c_str()));
+}
 
 void GdalSource::ReadChannels(const GdalHandle& handle) {
   std::vector<std::string> declared;

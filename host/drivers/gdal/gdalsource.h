@@ -16,8 +16,8 @@ namespace orin::drivers {
 
 class GdalSource final : public datasources::IRasterSource {
  public:
-  /// \throws orin::Exception  it cannot be opened, it holds no raster, or unless for kRead: the file
-  ///                          cannot be written, or it cannot hold levels that its format could
+  /// \throws orin::Exception  it cannot be opened, it holds no raster, or unless for kRead: it cannot
+  ///                          be written, or it cannot hold levels that its format could
   GdalSource(std::string name, const GdalFormat& format, SourceUse use);
   ~GdalSource() override;
 
@@ -41,6 +41,7 @@ class GdalSource final : public datasources::IRasterSource {
  private:
   void ReadChannels(const GdalHandle& handle);
   void KeepDecodedRows(const GdalHandle& handle);
+  void RequireAllValid() const;
   void DeclareNoData(const std::vector<std::string>& declared);
 
   std::string name_;
