@@ -16,8 +16,8 @@ namespace orin::drivers {
 
 class GdalSource final : public datasources::IRasterSource {
  public:
-  /// \throws orin::Exception  it cannot be opened, it holds no raster, or unless for kRead: it cannot
-  ///                          be written, or it cannot hold levels that its format could
+  /// \throws orin::Exception  it cannot be opened, it holds no raster, or unless for kRead: it
+  ///                          cannot be written, or cannot hold levels that its format could
   GdalSource(std::string name, const GdalFormat& format, SourceUse use);
   ~GdalSource() override;
 

@@ -72,7 +72,11 @@ std::unique_ptr<datasources::ILevelStore> OpenHfaLevels(const std::string& name,
 
 HfaLevelStore::HfaLevelStore(std::string path, const GdalFormat& format,
                              datasources::IRasterSource& image, bool mayChange)
-    : path_(std::move(path)), format_(format), image_(image), mayChange_(mayChange) {
+    : path_(std::move(path)),
+      format_(format),
+      image_(image),
+      mayChange_(mayChange),
+      watch_(image.Watch()) {
   Reload();
 }
 
@@ -120,7 +124,8 @@ unsigned HfaLevelStore::HeightOf(unsigned level, bool isOurs) const {
   return image_.Height() / level + (!isOurs && image_.Height() % level != 0);
 }
 
-LevelDescription HfaLevelStore::Describe(unsigned level) const {
+/// \param fingerprint  of the image now; empty when it is unknown
+LevelDescription HfaLevelStore::Describe(unsigned level, const std::string& fingerprint) const {
   const auto record = records_.find(level);
   const auto pending = pending_.find(level);
   const bool isOurs = record != records_.end() || pending != pending_.end();
@@ -129,18 +134,21 @@ LevelDescription HfaLevelStore::Describe(unsigned level) const {
   entry.width = WidthOf(level, isOurs);
   entry.height = HeightOf(level, isOurs);
   entry.file = path_;
+  entry.status = StatusOf(level, fingerprint);
+  const bool isStale = entry.status == datasources::LevelStatus::kStale;
   for (unsigned channel = 1; channel <= image_.ChannelCount(); ++channel) {
     const bool isStored = pyramid_.Find(channel, level) >= 0;
     const bool isPending = pending != pending_.end() && pending->second.channels[channel - 1];
     const bool isValid =
         record != records_.end() ? record->second.validity[channel - 1] == kHfaValid : !isPending;
     entry.presentChannels.push_back(isStored || isPending);
-    entry.validChannels.push_back(isStored && isValid);
+    entry.validChannels.push_back(isStored && isValid && !isStale);
   }
   if (record != records_.end()) {
     entry.method = record->second.method;
     entry.sourceLevel = record->second.sourceLevel;
     entry.program = record->second.program;
+    entry.image = record->second.image;
   } else if (isOurs) {
     entry.method = pending->second.method;
     entry.program = HfaProgramName();
@@ -156,7 +164,8 @@ std::vector<LevelDescription> HfaLevelStore::List() const {
       if (name.factor >= 2) levels.insert(name.factor);
   for (const auto& [level, pending] : pending_) levels.insert(level);
   std::vector<LevelDescription> list;
-  for (const unsigned level : levels) list.push_back(Describe(level));
+  const std::string fingerprint = FingerprintNow();
+  for (const unsigned level : levels) list.push_back(Describe(level, fingerprint));
   return list;
 }
 
