@@ -263,7 +263,9 @@ class Beside(Hfa):
         del dataset
         self.assertEqual([], info(copy)["levels"])
         answer = run("build", copy, "--levels", "2", "--internal")
-        self.assertNotEqual(0, answer.returncode)
+        self.assertRan(answer, 5)
+        self.assertIn("copy.img: holds a list of levels under another file's name", answer.stderr)
+        self.assertIn("Use --external", answer.stderr)
         self.assertRan(run("build", copy, "--levels", "2", "--method", "nearest"))
         self.check_beside(copy, other)
         self.assertEqual(original, pathlib.Path(self.file).read_bytes())
@@ -285,7 +287,8 @@ class Beside(Hfa):
         write_mask_beside(self.file, valid)
         before = pathlib.Path(self.file).read_bytes()
         answer = run("build", self.file, "--levels", "2", "--internal")
-        self.assertNotEqual(0, answer.returncode)
+        self.assertRan(answer, 5)
+        self.assertIn("scene.img: has a mask or opacity", answer.stderr)
         self.assertFalse(os.path.exists(self.file + ".ovr"))
         self.assertRan(run("build", self.file, "--levels", "2", "--method", "bilinear"))
         self.assertEqual(before, pathlib.Path(self.file).read_bytes())
@@ -300,6 +303,18 @@ class Beside(Hfa):
         self.assertRan(run("clean", self.file))
         self.assertEqual([], info(self.file)["levels"])
         self.assertSamePixels(self.pixels, read_pixels(self.file))
+
+    def test_an_image_near_the_limit_of_the_format_gets_a_side_car(self):
+        write(self.file, self.pixels, "Byte")
+        self.assertRan(run("build", self.file, "--levels", "2", "--method", "nearest"))
+        os.truncate(self.file, 2000000000)  # a hole: no level fits in front of the limit
+        answer = run("build", self.file, "--levels", "4", "--internal")
+        self.assertRan(answer, 5)
+        self.assertIn("scene.img: would grow beyond the 2 GB", answer.stderr)
+        self.assertRan(run("build", self.file, "--levels", "4", "--method", "nearest"))
+        self.assertTrue(os.path.exists(self.file + ".ovr"))
+        self.assertRan(run("clean", self.file))
+        self.assertEqual([], info(self.file)["levels"])
 
     def test_a_link_leads_to_the_file(self):
         write(self.file, self.pixels, "Byte")

@@ -61,8 +61,8 @@ GdalSource::~GdalSource() = default;
 void GdalSource::RequireAllValid() const {
   datasources::ISideCarFormat* beside = datasources::FormatRegistry::Instance().SideCarFormat();
   if (alphaChannel_ != 0 || (beside && beside->OpenMaskBeside(name_, width_, height_)))
-    Refuse(FormatString(_("%s: has a mask or opacity, which levels inside this format cannot have. "
-                          "Build with --external."),
+    Refuse(FormatString(_("%s: has a mask or opacity, which levels inside this format cannot "
+                          "have."),
                         name_.c_str()));
 }
 

@@ -60,12 +60,10 @@ std::unique_ptr<datasources::ILevelStore> OpenHfaLevels(const std::string& name,
       pyramid.NamesAnotherFileThan(std::filesystem::path(path).filename().string());
   if (use != SourceUse::kRead && isForeign)
     Refuse(_("%s: holds a list of levels under another file's name, for it was copied or renamed; "
-             "levels inside it would change that file. Build with --external."),
+             "levels inside it would change that file."),
            name);
   if (use == SourceUse::kUpdate && (pyramid.isSpilled || !HasRoom(path, image)))
-    Refuse(_("%s: would grow beyond the 2 GB that the format keeps in one file. Build with "
-             "--external."),
-           name);
+    Refuse(_("%s: would grow beyond the 2 GB that the format keeps in one file."), name);
   if (isForeign) return nullptr;
   return std::make_unique<HfaLevelStore>(path, format, image, use != SourceUse::kRead);
 }
