@@ -35,6 +35,7 @@ FORMATS = (
     ("AAIGrid", "grid.asc", "Int32", 1, ()),
     ("netCDF", "field.nc", "Float32", 1, ()),
     ("NITF", "scene.ntf", "Byte", 3, ()),
+    ("GRIB", "field.grib2", "Float64", 2, ("DATA_ENCODING=IEEE_FLOATING_POINT",)),
     ("MRF", "tiles.mrf", "Byte", 3, ()),
 )
 
@@ -45,6 +46,10 @@ def write(path, driver, pixels, type_name, options=(), no_data=()):
                                                 pixels.shape[0], gdal.GetDataTypeByName(type_name))
     if driver != "NITF":  # takes no georeference without a coordinate system
         memory.SetGeoTransform((10, 0.01, 0, 50, 0, -0.01))
+    if driver == "GRIB":  # takes none without
+        memory.SetProjection('GEOGCS["WGS 84",DATUM["WGS_1984",SPHEROID["WGS 84",6378137,'
+                             '298.257223563]],PRIMEM["Greenwich",0],UNIT["degree",'
+                             '0.0174532925199433]]')
     for index, channel in enumerate(pixels):
         memory.GetRasterBand(index + 1).WriteArray(channel)
     for index, value in enumerate(no_data):
@@ -79,6 +84,8 @@ class SideCars(Formats):
         for number, (driver, name, type_name, channels, options) in enumerate(FORMATS):
             with self.subTest(format=driver, name=name):
                 pixels = random_pixels((channels, ROWS, COLUMNS), NUMPY_TYPES[type_name], number)
+                if name == "alpha.png":
+                    pixels[3] |= 1  # transparent pixels are no data
                 write(name, driver, pixels, type_name, options)
                 stored = read_pixels(name)  # codecs may be lossy, GIF renumbers
                 files = set(os.listdir("."))
@@ -271,7 +278,7 @@ class Damaged(Formats):
 
     def test_files_cut_in_the_middle_are_refused_and_leave_no_valid_level(self):
         cut = ("rgb.png", "photo.jpg", "photo.jp2", "photo.webp", "classes.gif", "rgb.bmp",
-               "cube.envi", "heights.bil", "grid.asc", "field.nc", "scene.ntf")
+               "cube.envi", "heights.bil", "grid.asc", "field.nc", "scene.ntf", "field.grib2")
         for number, (driver, name, type_name, channels, options) in enumerate(FORMATS):
             if name not in cut:
                 continue
@@ -316,6 +323,30 @@ class Containers(Formats):
         self.assertIn(name + ".ovr", answer.stderr)
         self.assertIn("VRT", answer.stderr)
         self.assertEqual(["field.nc"], os.listdir("."))
+
+    def test_one_that_holds_one_raster_is_that_raster(self):
+        write("one.nc", "netCDF", self.pixels, "Float32", ["FORMAT=NC4"])
+        os.rename("one.nc", "one.h5")
+        self.assertEqual("HDF5", info("one.h5")["format"]["name"])
+        stored = read_pixels("one.h5")
+        self.assertRan(run("build", "one.h5", "--method", "nearest", "--levels", "2,4"))
+        # The library looks for no side-car of it; the levels are there all the same.
+        self.assertSamePixels(nearest(stored, 1, 2, (COLUMNS, ROWS)), read_pixels("one.h5.ovr"))
+        self.assertIn("nothing to do", run("build", "one.h5", "--levels", "2,4").stdout)
+        self.assertEqual({"field.nc", "one.h5", "one.h5.ovr"}, set(os.listdir(".")))
+
+    def test_of_hdf5_work_alike(self):
+        write("two.nc", "netCDF", numpy.concatenate([self.pixels] * 2), "Float32", ["FORMAT=NC4"])
+        os.rename("two.nc", "two.h5")
+        self.assertIn("'HDF5:\"two.h5\"://Band2'", run("info", "two.h5").stderr)
+        name = 'HDF5:"two.h5"://Band2'
+        self.assertEqual((COLUMNS, ROWS), (info(name)["width"], info(name)["height"]))
+        self.assertIn(name + ".ovr", run("build", name).stderr)
+        gdal.Translate("band2.vrt", name)
+        stored = read_pixels("band2.vrt")
+        self.assertSamePixels(numpy.sort(self.pixels, axis=None), numpy.sort(stored, axis=None))
+        self.assertRan(run("build", "band2.vrt", "--method", "nearest", "--levels", "2,4"))
+        self.check_levels("band2.vrt", stored)
 
     def test_rasters_inside_get_levels_through_a_virtual_raster(self):
         gdal.Translate("band2.vrt", 'NETCDF:"field.nc":Band2')
