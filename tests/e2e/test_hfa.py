@@ -87,6 +87,18 @@ class Inside(Hfa):
         expected = numpy.trunc(blocks + numpy.copysign(0.5, blocks)).astype(numpy.int8)
         self.assertSamePixels(expected, read_pixels(self.file, 0)[0].view(numpy.int8))
 
+    def test_few_bits_hold_the_largest_value_instead_of_what_is_beyond_it(self):
+        pixels = numpy.zeros((2, 64, 300), numpy.uint8)
+        pixels[:, :, 150:] = 15
+        pixels[1, ::7, ::5] = 9
+        wide = self.path("wide.img")
+        write(wide, pixels, "Byte")
+        write(self.file, pixels, "Byte", ["NBITS=4"])
+        for file in (wide, self.file):
+            self.assertRan(run("build", file, "--method", "bicubic", "--levels", "2"))
+        self.assertGreater(read_pixels(wide, 0).max(), 15)
+        self.assertSamePixels(numpy.minimum(read_pixels(wide, 0), 15), read_pixels(self.file, 0))
+
     def test_sizes_around_tiles_and_thin_images(self):
         for rows, columns in ((1, 300), (2, 2), (3, 129), (127, 128), (129, 65), (130, 3)):
             with self.subTest(rows=rows, columns=columns):

@@ -196,7 +196,9 @@ std::unique_ptr<datasources::IRasterWriter> HfaLevelStore::OpenWriter(
                              HeightOf(level, isOurs),
                              channels,
                              image_.TypeOf(channels.empty() ? 1 : channels.front()),
-                             image_.MetadataOf(channels)};
+                             image_.MetadataOf(channels),
+                             {}};
+  for (const unsigned channel : channels) what.storedBits.push_back(image_.StoredBitsOf(channel));
   return std::make_unique<HfaLevelWriter>(*this, std::move(what));
 }
 
