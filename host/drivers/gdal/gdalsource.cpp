@@ -10,6 +10,7 @@
 
 #include "host/drivers/gdal/gdalbands.h"
 #include "host/drivers/gdal/gdalerrors.h"
+#include "host/drivers/gdal/gdalmask.h"
 #include "host/drivers/gdal/gdalreader.h"
 #include "host/drivers/gdal/gdalwatch.h"
 #include "host/drivers/gdal/hfalevelstore.h"
@@ -49,6 +50,7 @@ GdalSource::GdalSource(std::string name, const GdalFormat& format, SourceUse use
   items_ = ItemsOf(handle.Get());
   ReadChannels(handle);
   KeepDecodedRows(handle);
+  hasMask_ = HasMaskInside(handle);
   watch_ = WatchOf(handle, format_);
   if (format_.code != kFormatErdas) return;
   if (use == SourceUse::kUpdate) RequireAllValid();
@@ -60,10 +62,14 @@ GdalSource::~GdalSource() = default;
 /// Levels inside could not say which of their pixels hold data.
 void GdalSource::RequireAllValid() const {
   datasources::ISideCarFormat* beside = datasources::FormatRegistry::Instance().SideCarFormat();
-  if (alphaChannel_ != 0 || (beside && beside->OpenMaskBeside(name_, width_, height_)))
+  if (alphaChannel_ != 0 || hasMask_ || (beside && beside->OpenMaskBeside(name_, width_, height_)))
     Refuse(FormatString(_("%s: has a mask or opacity, which levels inside this format cannot "
                           "have."),
                         name_.c_str()));
+}
+
+std::unique_ptr<datasources::IValidityReader> GdalSource::OpenMask() {
+  return hasMask_ ? OpenMaskInside(name_, format_) : nullptr;
 }
 
 void GdalSource::ReadChannels(const GdalHandle& handle) {

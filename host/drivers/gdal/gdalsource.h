@@ -29,6 +29,9 @@ class GdalSource final : public datasources::IRasterSource {
   /// A colour table, category names, or a layer that is called thematic.
   bool HoldsClasses() const override { return holdsClasses_; }
   unsigned AlphaChannel() const override { return alphaChannel_; }
+  /// A mask that is part of the raster. One in a file beside it is left to others.
+  bool HasMask() const override { return hasMask_; }
+  std::unique_ptr<datasources::IValidityReader> OpenMask() override;
   /// Items of the default domain. The no-data value is the item of that name, else what is
   /// declared, NaN and infinities included: for the file when all of its channels agree.
   datasources::AuxiliaryData MetadataOf(const std::vector<unsigned>& channels) const override;
@@ -50,6 +53,7 @@ class GdalSource final : public datasources::IRasterSource {
   unsigned height_ = 0;
   unsigned alphaChannel_ = 0;
   bool holdsClasses_ = false;
+  bool hasMask_ = false;
   std::vector<gobs::DataType> types_;
   std::vector<unsigned> storedBits_;  ///< one a channel
   datasources::AuxiliaryData::Items items_;
