@@ -2,6 +2,7 @@
 #include "apps/orin-overviews/build.h"
 
 #include <algorithm>
+#include <memory>
 
 #include "apps/orin-overviews/buildplan.h"
 #include "apps/orin-overviews/buildreport.h"
@@ -15,6 +16,7 @@
 #include "host/services/warning.h"
 #include "processes/overviews/createoverviews.h"
 #include "processes/overviews/levelplanning.h"
+#include "processes/overviews/statusqueries.h"
 
 namespace orin::app {
 namespace {
@@ -161,13 +163,31 @@ ExitCode BuildFile(BuildOptions options, const std::string& file, const Interrup
   return kDone;
 }
 
+/// Levels that are to stand inside need a file that takes them. The run would say that it does not;
+/// only the file's driver says why.
+/// \throws orin::Exception  with its reason
+void RequireRoomInside(datasources::IDataset& dataset, const std::string& file) {
+  if (dataset.GetAccessMode() != datasources::kReadOnly || !SupportsInternalOverviews(&dataset))
+    return;
+  try {
+    const std::unique_ptr<datasources::IDataset> forUpdate(
+        datasources::DatasetManager::GetInstance()->Open(file, datasources::kUpdate));
+  } catch (const Exception& reason) {
+    const std::string advice =
+        _("Use --external instead of --internal: the levels go to a file beside it.");
+    throw Exception(reason.GetMessage() + " " + advice, "apps/orin-overviews/build",
+                    "orin::app::RequireRoomInside", 0);
+  }
+}
+
 /// The same with every failure reported.
 ExitCode TryFile(const BuildOptions& options, const std::string& file,
                  const Interruption& interruption, Console& console) {
   ExitCode code = kCannotOpen;
   try {
-    OpenForBuild(file, options.placement);
+    const auto dataset = OpenForBuild(file, options.placement);
     code = kCannotBuild;
+    if (options.placement == Placement::kInternal) RequireRoomInside(*dataset, file);
     return BuildFile(options, file, interruption, console);
   } catch (const datasources::OptionException& error) {
     console.Error(AfterFileName(file, error.GetMessage()));

@@ -7,6 +7,7 @@
 #include "apps/orin-overviews/buildreport.h"
 #include "apps/orin-overviews/numberlist.h"
 #include "host/datasources/datasetmanager.h"
+#include "host/datasources/formats.h"
 #include "host/datasources/levelstore.h"
 #include "host/services/exception.h"
 #include "host/services/text.h"
@@ -47,13 +48,14 @@ std::vector<unsigned> FactorsOf(const std::vector<LevelDescription>& levels) {
 
 /// \returns what was removed
 std::vector<LevelDescription> CleanInside(const CleanOptions& options, const std::string& file) {
-  DatasetManager& manager = *DatasetManager::GetInstance();
-  std::unique_ptr<IDataset> dataset(manager.Open(file, datasources::kReadOnly));
+  std::unique_ptr<IDataset> dataset(
+      DatasetManager::GetInstance()->Open(file, datasources::kReadOnly));
   const auto chosen = Chosen(LevelsOf(*dataset), LevelPlace::kInternal, options);
   if (chosen.empty()) return chosen;
   dataset.reset();
-  dataset.reset(manager.Open(file, datasources::kUpdate));
-  LevelsOf(*dataset)->Remove(FactorsOf(chosen));
+  ZMBFormatType code = kFormatUnknown;
+  datasources::IFormatDriver* driver = datasources::FormatRegistry::Instance().DriverOf(file, code);
+  driver->OpenToRemoveLevels(file)->Levels()->Remove(FactorsOf(chosen));
   return chosen;
 }
 

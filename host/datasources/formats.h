@@ -48,6 +48,10 @@ class IFormatDriver {
   virtual ZMBFormatType Identify(const std::string& file) const = 0;
   /// \throws orin::Exception  the file cannot be opened in that mode; the text says why
   virtual std::unique_ptr<IRasterSource> Open(const std::string& file, AccessMode access) = 0;
+  /// The same as `Open` for kUpdate, but for files too that can lose levels and take none.
+  virtual std::unique_ptr<IRasterSource> OpenToRemoveLevels(const std::string& file) {
+    return Open(file, kUpdate);
+  }
   /// True when `file` is a path, beside which a side-car can stand and programs look for one; false
   /// for a part of a container file, or a file on a server.
   virtual bool IsPath(const std::string& /*file*/) const { return true; }

@@ -145,7 +145,7 @@ class ReadOnlyFile(Case):
     def test_levels_inside_are_refused(self):
         answer = self.build("--internal")
         self.assertRan(answer, 5)
-        self.assertIn("not possible for a read-only file", answer.stderr)
+        self.assertIn("scene.tif: cannot be opened for writing: Permission denied.", answer.stderr)
         self.assertIn("--external", answer.stderr)
 
 

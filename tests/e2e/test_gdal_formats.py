@@ -10,6 +10,7 @@ import numpy
 from osgeo import gdal
 import rasterio
 
+from mask_twin import disc, level_validity
 from orin_e2e import (Case, NUMPY_TYPES, info, nearest, overview_sizes, random_pixels, read_pixels,
                       run)
 
@@ -34,6 +35,7 @@ FORMATS = (
     ("AAIGrid", "grid.asc", "Int32", 1, ()),
     ("netCDF", "field.nc", "Float32", 1, ()),
     ("NITF", "scene.ntf", "Byte", 3, ()),
+    ("GRIB", "field.grib2", "Float64", 2, ("DATA_ENCODING=IEEE_FLOATING_POINT",)),
     ("MRF", "tiles.mrf", "Byte", 3, ()),
 )
 
@@ -44,6 +46,10 @@ def write(path, driver, pixels, type_name, options=(), no_data=()):
                                                 pixels.shape[0], gdal.GetDataTypeByName(type_name))
     if driver != "NITF":  # takes no georeference without a coordinate system
         memory.SetGeoTransform((10, 0.01, 0, 50, 0, -0.01))
+    if driver == "GRIB":  # takes none without
+        memory.SetProjection('GEOGCS["WGS 84",DATUM["WGS_1984",SPHEROID["WGS 84",6378137,'
+                             '298.257223563]],PRIMEM["Greenwich",0],UNIT["degree",'
+                             '0.0174532925199433]]')
     for index, channel in enumerate(pixels):
         memory.GetRasterBand(index + 1).WriteArray(channel)
     for index, value in enumerate(no_data):
@@ -78,6 +84,8 @@ class SideCars(Formats):
         for number, (driver, name, type_name, channels, options) in enumerate(FORMATS):
             with self.subTest(format=driver, name=name):
                 pixels = random_pixels((channels, ROWS, COLUMNS), NUMPY_TYPES[type_name], number)
+                if name == "alpha.png":
+                    pixels[3] |= 1  # transparent pixels are no data
                 write(name, driver, pixels, type_name, options)
                 stored = read_pixels(name)  # codecs may be lossy, GIF renumbers
                 files = set(os.listdir("."))
@@ -165,6 +173,33 @@ class NoData(Formats):
         self.assertTrue((read_pixels("image.bmp", 0)[0, 25:30, 25:30] == 200).all())
         self.assertEqual(before, os.stat("image.bmp.aux.xml").st_mtime_ns)
 
+    def test_nan_and_infinities_leave_no_rim(self):
+        places = (("ENVI", "heights.envi"), ("netCDF", "field.nc"), ("GTiff", "heights.tif"))
+        for driver, file in places:
+            for value in (float("nan"), float("-inf")):
+                name = file
+                with self.subTest(format=driver, value=value):
+                    pixels = random_pixels((1, ROWS, COLUMNS), numpy.float32, 3) + 9000
+                    pixels[0, 50:90, 40:101] = value
+                    write(name, driver, pixels, "Float32", no_data=[value])
+                    if driver == "GTiff":
+                        gdal.Translate("heights.vrt", name)
+                        name = "heights.vrt"
+                    self.assertRan(run("build", name, "--levels", "2,4", "--method", "average"))
+                    for index, level in ((0, 2), (1, 4)):
+                        stored = read_pixels(name, index)[0]
+                        hole = ~numpy.isfinite(stored)
+                        rows, columns = (slice(-(-50 // level), 90 // level),
+                                         slice(40 // level, 100 // level))
+                        self.assertTrue(hole[rows, columns].all())
+                        self.assertTrue(numpy.array_equal(
+                            stored[hole], numpy.full(hole.sum(), value, stored.dtype),
+                            equal_nan=True))
+                        self.assertGreater(stored[~hole].min(), 4000)
+                        self.assertLess(hole.sum(), 42 * 64 // (level * level) + 60)
+                    for other in os.listdir("."):
+                        os.remove(other)
+
     def test_of_64_bits_is_exact(self):
         value = 2**63 - 1
         pixels = numpy.full((1, 64, 64), value - 1, numpy.int64)
@@ -176,6 +211,57 @@ class NoData(Formats):
         gdal.Translate("image.vrt", "image.tif")
         self.assertRan(run("build", "image.vrt", "--levels", "2", "--method", "nearest"))
         self.assertSamePixels(pixels[:, ::2, ::2], read_pixels("image.vrt", 0))
+
+
+class Channels(Formats):
+    def test_of_opacity_say_what_is_valid(self):
+        for method in ("average", "bilinear", "nearest"):
+            with self.subTest(method=method):
+                valid = disc(COLUMNS, ROWS)
+                pixels = numpy.empty((4, ROWS, COLUMNS), numpy.uint8)
+                pixels[:3] = numpy.where(valid, 150, 3)  # 3: colours that nobody sees
+                pixels[3] = valid * 255
+                write("rgba.png", "PNG", pixels, "Byte")
+                self.assertRan(run("build", "rgba.png", "--levels", "2,4", "--method", method))
+                two = level_validity(valid, 1, 2, (COLUMNS, ROWS), method, 1)
+                four = level_validity(two, 2, 4, (COLUMNS, ROWS), method, 1)
+                for index, expected in enumerate((two, four)):
+                    level = read_pixels("rgba.png", index)
+                    self.assertTrue(((level[3] > 0) == expected).all())
+                    self.assertEqual({150}, set(level[:3, expected].flatten().tolist()))
+                    self.assertEqual({0}, set(level[:3, ~expected].flatten().tolist()))
+                with rasterio.open("rgba.png.ovr") as levels:
+                    self.assertEqual("alpha", levels.colorinterp[3].name)
+                os.remove("rgba.png.ovr")
+
+    def test_of_classes_are_not_blended_without_a_warning(self):
+        pixels = random_pixels((1, ROWS, COLUMNS), numpy.uint8, 1) % 3
+        write("classes.gif", "GIF", pixels, "Byte")
+        memory = gdal.GetDriverByName("MEM").Create("", COLUMNS, ROWS, 1)
+        memory.GetRasterBand(1).WriteArray(pixels[0])
+        colours = gdal.ColorTable()
+        for index in range(3):
+            colours.SetColorEntry(index, (index * 50, 0, 0, 255))
+        memory.GetRasterBand(1).SetColorTable(colours)
+        gdal.GetDriverByName("PNG").CreateCopy("classes.png", memory)
+        gdal.GetDriverByName("HFA").CreateCopy("classes.img", memory)
+        for name in ("classes.gif", "classes.png", "classes.img"):
+            with self.subTest(name=name):
+                answer = run("build", name, "--levels", "2", "--method", "average")
+                self.assertRan(answer)
+                self.assertIn("numbers of palette colours or classes", answer.stderr)
+                answer = run("build", name, "--levels", "2", "--method", "mode", "--force")
+                self.assertRan(answer)
+                self.assertEqual("", answer.stderr)
+
+    def test_of_few_bits_stay_so(self):
+        pixels = random_pixels((1, ROWS, COLUMNS), numpy.uint16, 1) % 4096
+        write("deep.jp2", "JP2OpenJPEG", pixels, "UInt16",
+              ["NBITS=12", "REVERSIBLE=YES", "QUALITY=100"])
+        self.assertRan(run("build", "deep.jp2", "--levels", "2", "--method", "bicubic"))
+        self.assertLessEqual(read_pixels("deep.jp2", 0).max(), 4095)
+        with rasterio.open("deep.jp2.ovr") as levels:
+            self.assertEqual("12", levels.tags(1, ns="IMAGE_STRUCTURE")["NBITS"])
 
 
 class Damaged(Formats):
@@ -192,7 +278,7 @@ class Damaged(Formats):
 
     def test_files_cut_in_the_middle_are_refused_and_leave_no_valid_level(self):
         cut = ("rgb.png", "photo.jpg", "photo.jp2", "photo.webp", "classes.gif", "rgb.bmp",
-               "cube.envi", "heights.bil", "grid.asc", "field.nc", "scene.ntf")
+               "cube.envi", "heights.bil", "grid.asc", "field.nc", "scene.ntf", "field.grib2")
         for number, (driver, name, type_name, channels, options) in enumerate(FORMATS):
             if name not in cut:
                 continue
@@ -237,6 +323,30 @@ class Containers(Formats):
         self.assertIn(name + ".ovr", answer.stderr)
         self.assertIn("VRT", answer.stderr)
         self.assertEqual(["field.nc"], os.listdir("."))
+
+    def test_one_that_holds_one_raster_is_that_raster(self):
+        write("one.nc", "netCDF", self.pixels, "Float32", ["FORMAT=NC4"])
+        os.rename("one.nc", "one.h5")
+        self.assertEqual("HDF5", info("one.h5")["format"]["name"])
+        stored = read_pixels("one.h5")
+        self.assertRan(run("build", "one.h5", "--method", "nearest", "--levels", "2,4"))
+        # The library looks for no side-car of it; the levels are there all the same.
+        self.assertSamePixels(nearest(stored, 1, 2, (COLUMNS, ROWS)), read_pixels("one.h5.ovr"))
+        self.assertIn("nothing to do", run("build", "one.h5", "--levels", "2,4").stdout)
+        self.assertEqual({"field.nc", "one.h5", "one.h5.ovr"}, set(os.listdir(".")))
+
+    def test_of_hdf5_work_alike(self):
+        write("two.nc", "netCDF", numpy.concatenate([self.pixels] * 2), "Float32", ["FORMAT=NC4"])
+        os.rename("two.nc", "two.h5")
+        self.assertIn("'HDF5:\"two.h5\"://Band2'", run("info", "two.h5").stderr)
+        name = 'HDF5:"two.h5"://Band2'
+        self.assertEqual((COLUMNS, ROWS), (info(name)["width"], info(name)["height"]))
+        self.assertIn(name + ".ovr", run("build", name).stderr)
+        gdal.Translate("band2.vrt", name)
+        stored = read_pixels("band2.vrt")
+        self.assertSamePixels(numpy.sort(self.pixels, axis=None), numpy.sort(stored, axis=None))
+        self.assertRan(run("build", "band2.vrt", "--method", "nearest", "--levels", "2,4"))
+        self.check_levels("band2.vrt", stored)
 
     def test_rasters_inside_get_levels_through_a_virtual_raster(self):
         gdal.Translate("band2.vrt", 'NETCDF:"field.nc":Band2')

@@ -13,6 +13,8 @@ import numpy
 from osgeo import gdal
 import rasterio
 
+from mask_case import write_mask_beside
+from mask_twin import disc, level_validity, masks_of_levels
 from orin_e2e import (Case, NUMPY_TYPES, TOOL, info, nearest, overview_sizes, random_pixels,
                       read_pixels, run)
 
@@ -85,6 +87,18 @@ class Inside(Hfa):
         expected = numpy.trunc(blocks + numpy.copysign(0.5, blocks)).astype(numpy.int8)
         self.assertSamePixels(expected, read_pixels(self.file, 0)[0].view(numpy.int8))
 
+    def test_few_bits_hold_the_largest_value_instead_of_what_is_beyond_it(self):
+        pixels = numpy.zeros((2, 64, 300), numpy.uint8)
+        pixels[:, :, 150:] = 15
+        pixels[1, ::7, ::5] = 9
+        wide = self.path("wide.img")
+        write(wide, pixels, "Byte")
+        write(self.file, pixels, "Byte", ["NBITS=4"])
+        for file in (wide, self.file):
+            self.assertRan(run("build", file, "--method", "bicubic", "--levels", "2"))
+        self.assertGreater(read_pixels(wide, 0).max(), 15)
+        self.assertSamePixels(numpy.minimum(read_pixels(wide, 0), 15), read_pixels(self.file, 0))
+
     def test_sizes_around_tiles_and_thin_images(self):
         for rows, columns in ((1, 300), (2, 2), (3, 129), (127, 128), (129, 65), (130, 3)):
             with self.subTest(rows=rows, columns=columns):
@@ -153,6 +167,76 @@ class Inside(Hfa):
         self.assertRan(run("build", self.file, "--levels", "2", "--method", "average"))
         self.assertTrue((read_pixels(self.file, 0)[0, 20:50, 5:30] == -9999).all())
 
+    def test_nan_and_infinities_leave_no_rim(self):
+        for value in (float("nan"), float("inf")):
+            for type_name in ("Float32", "Float64"):
+                with self.subTest(value=value, type=type_name):
+                    dtype = NUMPY_TYPES[type_name]
+                    pixels = random_pixels((2, 205, 333), dtype, 5) + dtype(9000)
+                    pixels[:, 40:101, 10:61] = value
+                    write(self.file, pixels, type_name, no_data=value)
+                    self.assertRan(run("build", self.file, "--levels", "2,4", "--method",
+                                       "average"))
+                    self.assertEqual(["scene.img"], os.listdir(self.folder))
+                    for index, level in ((0, 2), (1, 4)):
+                        stored = read_pixels(self.file, index)
+                        hole = ~numpy.isfinite(stored)
+                        self.assertTrue(hole[:, 40 // level:100 // level,
+                                             12 // level:60 // level].all())
+                        self.assertEqual({str(value)}, set(map(str, stored[hole].tolist())))
+                        self.assertGreater(stored[~hole].min(), 4000)
+                    os.remove(self.file)
+
+
+class Cleaned(Hfa):
+    def setUp(self):
+        super().setUp()
+        write(self.file, self.pixels, "Byte")
+        dataset = gdal.Open(self.file, gdal.GA_Update)
+        dataset.SetMetadataItem("SENSOR", "camera")
+        del dataset
+        self.assertRan(run("build", self.file, "--levels", "2,4", "--method", "nearest"))
+
+    def check_clean(self):
+        self.assertEqual([], info(self.file)["levels"])
+        self.assertEqual([], overview_sizes(self.file))
+        self.assertSamePixels(self.pixels, read_pixels(self.file))
+        self.assertEqual({"SENSOR": "camera"}, gdal.Open(self.file).GetMetadata())
+
+    def test_takes_levels_and_their_records_away(self):
+        answer = run("clean", self.file)
+        self.assertRan(answer)
+        self.assertIn("levels removed: 2, 4 (inside the file)", answer.stdout)
+        self.check_clean()
+        self.assertIn("nothing to do", run("clean", self.file).stdout)
+        self.assertRan(run("build", self.file, "--levels", "2,4", "--method", "nearest"))
+        self.check_levels(self.file, self.pixels)
+        self.assertRan(run("clean", self.file, "--levels", "2,4,8"))
+        self.check_clean()
+
+    def test_takes_all_levels_or_none(self):
+        before = pathlib.Path(self.file).read_bytes()
+        answer = run("clean", self.file, "--levels", "2")
+        self.assertNotEqual(0, answer.returncode)
+        self.assertIn("scene.img: levels inside this format are removed all together, and level 4 "
+                      "is to stay", answer.stderr)
+        self.assertEqual(before, pathlib.Path(self.file).read_bytes())
+
+    def test_takes_levels_of_other_programs(self):
+        dataset = gdal.Open(self.file, gdal.GA_Update)
+        dataset.BuildOverviews("AVERAGE", [8])
+        del dataset
+        self.assertRan(run("clean", self.file))
+        self.check_clean()
+
+    def test_a_read_only_file_keeps_them(self):
+        os.chmod(self.file, 0o444)
+        os.chmod(self.folder, 0o777)
+        answer = run("clean", self.file, **SOMEBODY)
+        self.assertNotEqual(0, answer.returncode)
+        self.assertIn("scene.img: cannot be opened for writing: Permission denied", answer.stderr)
+        self.assertEqual([2, 4], all_valid(self.file))
+
 
 class Beside(Hfa):
     def check_beside(self, file, pixels):
@@ -191,7 +275,9 @@ class Beside(Hfa):
         del dataset
         self.assertEqual([], info(copy)["levels"])
         answer = run("build", copy, "--levels", "2", "--internal")
-        self.assertNotEqual(0, answer.returncode)
+        self.assertRan(answer, 5)
+        self.assertIn("copy.img: holds a list of levels under another file's name", answer.stderr)
+        self.assertIn("Use --external", answer.stderr)
         self.assertRan(run("build", copy, "--levels", "2", "--method", "nearest"))
         self.check_beside(copy, other)
         self.assertEqual(original, pathlib.Path(self.file).read_bytes())
@@ -204,6 +290,43 @@ class Beside(Hfa):
         os.rename(self.file, renamed)
         self.assertRan(run("build", renamed, "--levels", "2", "--method", "nearest"))
         self.check_beside(renamed, self.pixels)
+
+    def test_an_image_with_a_mask_gets_a_side_car_with_masks(self):
+        valid = disc(333, 205)
+        self.pixels[:, ~valid] = 3
+        self.pixels[:, valid] = 200
+        write(self.file, self.pixels, "Byte")
+        write_mask_beside(self.file, valid)
+        before = pathlib.Path(self.file).read_bytes()
+        answer = run("build", self.file, "--levels", "2", "--internal")
+        self.assertRan(answer, 5)
+        self.assertIn("scene.img: has a mask or opacity", answer.stderr)
+        self.assertFalse(os.path.exists(self.file + ".ovr"))
+        self.assertRan(run("build", self.file, "--levels", "2", "--method", "bilinear"))
+        self.assertEqual(before, pathlib.Path(self.file).read_bytes())
+        expected = level_validity(valid, 1, 2, (333, 205), "bilinear", 1)
+        self.assertTrue((expected == masks_of_levels(self.file)[0]).all())
+        self.assertEqual({200}, set(read_pixels(self.file, 0)[:, expected].flatten().tolist()))
+
+    def test_a_mask_that_came_later_does_not_keep_levels_inside(self):
+        write(self.file, self.pixels, "Byte")
+        self.assertRan(run("build", self.file, "--levels", "2,4", "--method", "nearest"))
+        write_mask_beside(self.file, disc(333, 205))
+        self.assertRan(run("clean", self.file))
+        self.assertEqual([], info(self.file)["levels"])
+        self.assertSamePixels(self.pixels, read_pixels(self.file))
+
+    def test_an_image_near_the_limit_of_the_format_gets_a_side_car(self):
+        write(self.file, self.pixels, "Byte")
+        self.assertRan(run("build", self.file, "--levels", "2", "--method", "nearest"))
+        os.truncate(self.file, 2000000000)  # a hole: no level fits in front of the limit
+        answer = run("build", self.file, "--levels", "4", "--internal")
+        self.assertRan(answer, 5)
+        self.assertIn("scene.img: would grow beyond the 2 GB", answer.stderr)
+        self.assertRan(run("build", self.file, "--levels", "4", "--method", "nearest"))
+        self.assertTrue(os.path.exists(self.file + ".ovr"))
+        self.assertRan(run("clean", self.file))
+        self.assertEqual([], info(self.file)["levels"])
 
     def test_a_link_leads_to_the_file(self):
         write(self.file, self.pixels, "Byte")

@@ -125,6 +125,20 @@ class Layouts(MaskCase):
         self.build(file, "--levels", "2,3,4", "--method", "bilinear")
         self.assert_levels(file, valid, "bilinear", 3, as_one=False)
 
+    def test_the_mask_of_a_virtual_raster_or_a_jpeg_file(self):
+        image, valid = self.make("scene.tif")
+        for driver, name in (("VRT", "scene.vrt"), ("JPEG", "scene.jpg")):
+            file = self.path(name)
+            gdal.Translate(file, image, format=driver)
+            if run("info", file).returncode != 0:
+                self.skipTest("this build reads no other formats")
+            self.build(file, "--levels", "2,4", "--method", "bilinear")
+            two = level_validity(valid, 1, 2, SIZE, "bilinear", 1)
+            four = level_validity(two, 2, 4, SIZE, "bilinear", 1)
+            for expected, mask in zip((two, four), masks_of_levels(file)):
+                self.assertTrue((expected == mask).all())
+            self.assertTrue((read_pixels(file, 0)[:, ~two] == 0).all())
+
 
 class NoDataToo(MaskCase):
     def test_a_declared_value_fills_and_counts_beside_the_mask(self):

@@ -67,6 +67,20 @@ std::optional<gobs::DataType> TypeOfBand(GDALRasterBandH band) {
   }
 }
 
+unsigned StoredBitsOfBand(GDALRasterBandH band, const gobs::DataType& type) {
+  const std::string text = StructureItem(band, "NBITS");
+  unsigned bits = 0;
+  std::from_chars(text.data(), text.data() + text.size(), bits);
+  return bits >= 1 && bits < type.bits && !type.isFloat && !type.isComplex ? bits : type.bits;
+}
+
+bool HoldsClassNumbers(GDALRasterBandH band) {
+  if (GDALGetRasterColorInterpretation(band) == GCI_PaletteIndex) return true;
+  if (GDALGetRasterColorTable(band) || GDALGetRasterCategoryNames(band)) return true;
+  const char* layer = GDALGetMetadataItem(band, "LAYER_TYPE", nullptr);
+  return layer && EQUAL(layer, "thematic");
+}
+
 std::string NoDataTextOf(GDALRasterBandH band) {
   int isDeclared = 0;
   switch (GDALGetRasterDataType(band)) {

@@ -16,6 +16,12 @@ namespace orin::drivers {
 /// delivered as one byte a sample.
 std::optional<gobs::DataType> TypeOfBand(GDALRasterBandH band);
 
+/// Bits that the file keeps of a sample of `band`, whose type is `type`: fewer where that is said.
+unsigned StoredBitsOfBand(GDALRasterBandH band, const gobs::DataType& type);
+
+/// True when numbers of the channel stand for entries of a colour table or for classes.
+bool HoldsClassNumbers(GDALRasterBandH band);
+
 /// The declared no-data value with all its digits, whatever the channel's type: "-9999", "nan",
 /// "18446744073709551615"; empty when none is declared.
 std::string NoDataTextOf(GDALRasterBandH band);

@@ -40,14 +40,24 @@ class GdalDriver final : public datasources::IFormatDriver {
 
   std::unique_ptr<datasources::IRasterSource> Open(const std::string& file,
                                                    datasources::AccessMode access) override {
+    return OpenFor(file, access == datasources::kUpdate ? SourceUse::kUpdate : SourceUse::kRead);
+  }
+
+  std::unique_ptr<datasources::IRasterSource> OpenToRemoveLevels(const std::string& file) override {
+    return OpenFor(file, SourceUse::kRemoveLevels);
+  }
+
+  bool IsPath(const std::string& file) const override { return IsRegularFile(file); }
+
+ private:
+  static std::unique_ptr<datasources::IRasterSource> OpenFor(const std::string& file,
+                                                             SourceUse use) {
     const GdalFormat* format = IdentifyGdalFormat(file);
     if (!format)
       throw Exception(FormatString(_("%s: is not a raster file of a known format."), file.c_str()),
                       "host/drivers/gdal/gdaldriver", "GdalDriver::Open", 0);
-    return std::make_unique<GdalSource>(file, *format, access);
+    return std::make_unique<GdalSource>(file, *format, use);
   }
-
-  bool IsPath(const std::string& file) const override { return IsRegularFile(file); }
 };
 
 void SetUpLibrary() {

@@ -5,14 +5,14 @@
 
 #include <algorithm>
 #include <cerrno>
-#include <charconv>
-#include <cmath>
 #include <cstring>
 #include <utility>
 
 #include "host/drivers/gdal/gdalbands.h"
 #include "host/drivers/gdal/gdalerrors.h"
+#include "host/drivers/gdal/gdalmask.h"
 #include "host/drivers/gdal/gdalreader.h"
+#include "host/drivers/gdal/gdalwatch.h"
 #include "host/drivers/gdal/hfalevelstore.h"
 #include "host/drivers/gdal/subdatasets.h"
 #include "host/services/exception.h"
@@ -38,18 +38,11 @@ void RequireWritable(const std::string& name) {
                         std::strerror(errno)));
 }
 
-bool IsFiniteDecimal(const std::string& text) {
-  double value = 0;
-  const char* end = text.data() + text.size();
-  const auto [stop, error] = std::from_chars(text.data(), end, value);
-  return error == std::errc() && stop == end && std::isfinite(value);
-}
-
 }  // namespace
 
-GdalSource::GdalSource(std::string name, const GdalFormat& format, datasources::AccessMode access)
+GdalSource::GdalSource(std::string name, const GdalFormat& format, SourceUse use)
     : name_(std::move(name)), format_(format) {
-  if (access == datasources::kUpdate) RequireWritable(name_);
+  if (use != SourceUse::kRead) RequireWritable(name_);
   const GdalHandle handle(name_, format_);
   if (GDALGetRasterCount(handle.Get()) == 0) Refuse(NoRasterText(handle));
   width_ = static_cast<unsigned>(GDALGetRasterXSize(handle.Get()));
@@ -57,11 +50,27 @@ GdalSource::GdalSource(std::string name, const GdalFormat& format, datasources::
   items_ = ItemsOf(handle.Get());
   ReadChannels(handle);
   KeepDecodedRows(handle);
-  if (format_.code == kFormatErdas)
-    levels_ = OpenHfaLevels(name_, format_, *this, access == datasources::kUpdate);
+  hasMask_ = HasMaskInside(handle);
+  watch_ = WatchOf(handle, format_);
+  if (format_.code != kFormatErdas) return;
+  if (use == SourceUse::kUpdate) RequireAllValid();
+  levels_ = OpenHfaLevels(name_, format_, *this, use);
 }
 
 GdalSource::~GdalSource() = default;
+
+/// Levels inside could not say which of their pixels hold data.
+void GdalSource::RequireAllValid() const {
+  datasources::ISideCarFormat* beside = datasources::FormatRegistry::Instance().SideCarFormat();
+  if (alphaChannel_ != 0 || hasMask_ || (beside && beside->OpenMaskBeside(name_, width_, height_)))
+    Refuse(FormatString(_("%s: has a mask or opacity, which levels inside this format cannot "
+                          "have."),
+                        name_.c_str()));
+}
+
+std::unique_ptr<datasources::IValidityReader> GdalSource::OpenMask() {
+  return hasMask_ ? OpenMaskInside(name_, format_) : nullptr;
+}
 
 void GdalSource::ReadChannels(const GdalHandle& handle) {
   std::vector<std::string> declared;
@@ -71,10 +80,12 @@ void GdalSource::ReadChannels(const GdalHandle& handle) {
     types_.push_back(CommonTypeOf(handle, {channel}));
     channelItems_.push_back(ItemsOf(band));
     declared.push_back(NoDataTextOf(band));
+    storedBits_.push_back(StoredBitsOfBand(band, types_.back()));
+    holdsClasses_ = holdsClasses_ || HoldsClassNumbers(band);
     if (alphaChannel_ == 0 && GDALGetRasterColorInterpretation(band) == GCI_AlphaBand)
       alphaChannel_ = channel;
   }
-  AnswerNoData(declared);
+  DeclareNoData(declared);
 }
 
 /// Where reading one channel costs as much as reading all, and all fit into memory.
@@ -92,14 +103,14 @@ void GdalSource::KeepDecodedRows(const GdalHandle& handle) {
   decoded_ = std::make_shared<DecodedRows>(width_, height_, pixel, rows);
 }
 
-void GdalSource::AnswerNoData(const std::vector<std::string>& declared) {
+void GdalSource::DeclareNoData(const std::vector<std::string>& declared) {
   if (items_.contains(kNoDataKey)) return;
   const bool agree = std::all_of(declared.begin(), declared.end(),
                                  [&](const std::string& text) { return text == declared[0]; });
-  if (agree && IsFiniteDecimal(declared[0])) items_[kNoDataKey] = declared[0];
+  if (agree && !declared[0].empty()) items_[kNoDataKey] = declared[0];
   if (agree) return;
   for (size_t i = 0; i < declared.size(); ++i)
-    if (IsFiniteDecimal(declared[i])) channelItems_[i].emplace(kNoDataKey, declared[i]);
+    if (!declared[i].empty()) channelItems_[i].emplace(kNoDataKey, declared[i]);
 }
 
 AuxiliaryData GdalSource::MetadataOf(const std::vector<unsigned>& channels) const {

@@ -51,28 +51,30 @@ bool HasRoom(const std::string& path, const datasources::IRasterSource& image) {
 std::unique_ptr<datasources::ILevelStore> OpenHfaLevels(const std::string& name,
                                                         const GdalFormat& format,
                                                         datasources::IRasterSource& image,
-                                                        bool update) {
+                                                        SourceUse use) {
   std::error_code none;
   const std::filesystem::path real = std::filesystem::canonical(name, none);
   const std::string path = none ? name : real.string();
   const HfaPyramid pyramid = ReadHfaPyramid(path);
   const bool isForeign =
       pyramid.NamesAnotherFileThan(std::filesystem::path(path).filename().string());
-  if (update && isForeign)
+  if (use != SourceUse::kRead && isForeign)
     Refuse(_("%s: holds a list of levels under another file's name, for it was copied or renamed; "
-             "levels inside it would change that file. Build with --external."),
+             "levels inside it would change that file."),
            name);
-  if (update && (pyramid.isSpilled || !HasRoom(path, image)))
-    Refuse(_("%s: would grow beyond the 2 GB that the format keeps in one file. Build with "
-             "--external."),
-           name);
+  if (use == SourceUse::kUpdate && (pyramid.isSpilled || !HasRoom(path, image)))
+    Refuse(_("%s: would grow beyond the 2 GB that the format keeps in one file."), name);
   if (isForeign) return nullptr;
-  return std::make_unique<HfaLevelStore>(path, format, image, update);
+  return std::make_unique<HfaLevelStore>(path, format, image, use != SourceUse::kRead);
 }
 
 HfaLevelStore::HfaLevelStore(std::string path, const GdalFormat& format,
                              datasources::IRasterSource& image, bool mayChange)
-    : path_(std::move(path)), format_(format), image_(image), mayChange_(mayChange) {
+    : path_(std::move(path)),
+      format_(format),
+      image_(image),
+      mayChange_(mayChange),
+      watch_(image.Watch()) {
   Reload();
 }
 
@@ -112,12 +114,6 @@ void HfaLevelStore::LockFile() {
          path_);
 }
 
-void HfaLevelStore::Remove(const std::vector<unsigned>& levels) {
-  for (const unsigned level : levels)
-    if (!PositionsOf(level, {1}).empty())
-      Fail(_("%s: level %u stands inside, from where this format has no way to remove it."), level);
-}
-
 /// The format rounds up; what we make ends where it should.
 unsigned HfaLevelStore::WidthOf(unsigned level, bool isOurs) const {
   return image_.Width() / level + (!isOurs && image_.Width() % level != 0);
@@ -126,7 +122,8 @@ unsigned HfaLevelStore::HeightOf(unsigned level, bool isOurs) const {
   return image_.Height() / level + (!isOurs && image_.Height() % level != 0);
 }
 
-LevelDescription HfaLevelStore::Describe(unsigned level) const {
+/// \param fingerprint  of the image now; empty when it is unknown
+LevelDescription HfaLevelStore::Describe(unsigned level, const std::string& fingerprint) const {
   const auto record = records_.find(level);
   const auto pending = pending_.find(level);
   const bool isOurs = record != records_.end() || pending != pending_.end();
@@ -135,18 +132,21 @@ LevelDescription HfaLevelStore::Describe(unsigned level) const {
   entry.width = WidthOf(level, isOurs);
   entry.height = HeightOf(level, isOurs);
   entry.file = path_;
+  entry.status = StatusOf(level, fingerprint);
+  const bool isStale = entry.status == datasources::LevelStatus::kStale;
   for (unsigned channel = 1; channel <= image_.ChannelCount(); ++channel) {
     const bool isStored = pyramid_.Find(channel, level) >= 0;
     const bool isPending = pending != pending_.end() && pending->second.channels[channel - 1];
     const bool isValid =
         record != records_.end() ? record->second.validity[channel - 1] == kHfaValid : !isPending;
     entry.presentChannels.push_back(isStored || isPending);
-    entry.validChannels.push_back(isStored && isValid);
+    entry.validChannels.push_back(isStored && isValid && !isStale);
   }
   if (record != records_.end()) {
     entry.method = record->second.method;
     entry.sourceLevel = record->second.sourceLevel;
     entry.program = record->second.program;
+    entry.image = record->second.image;
   } else if (isOurs) {
     entry.method = pending->second.method;
     entry.program = HfaProgramName();
@@ -162,7 +162,8 @@ std::vector<LevelDescription> HfaLevelStore::List() const {
       if (name.factor >= 2) levels.insert(name.factor);
   for (const auto& [level, pending] : pending_) levels.insert(level);
   std::vector<LevelDescription> list;
-  for (const unsigned level : levels) list.push_back(Describe(level));
+  const std::string fingerprint = FingerprintNow();
+  for (const unsigned level : levels) list.push_back(Describe(level, fingerprint));
   return list;
 }
 
@@ -195,7 +196,9 @@ std::unique_ptr<datasources::IRasterWriter> HfaLevelStore::OpenWriter(
                              HeightOf(level, isOurs),
                              channels,
                              image_.TypeOf(channels.empty() ? 1 : channels.front()),
-                             image_.MetadataOf(channels)};
+                             image_.MetadataOf(channels),
+                             {}};
+  for (const unsigned channel : channels) what.storedBits.push_back(image_.StoredBitsOf(channel));
   return std::make_unique<HfaLevelWriter>(*this, std::move(what));
 }
 

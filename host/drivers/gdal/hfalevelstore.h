@@ -9,22 +9,23 @@
 #include <string>
 #include <vector>
 
+#include "host/datasources/imagewatch.h"
 #include "host/datasources/levelstore.h"
 #include "host/drivers/gdal/gdalformats.h"
 #include "host/drivers/gdal/hfarecord.h"
 #include "host/drivers/gdal/hfatree.h"
 #include "host/drivers/gdal/hfaupdate.h"
+#include "host/drivers/gdal/sourceuse.h"
 
 namespace orin::drivers {
 
 /// The levels inside `name`, or null when it holds none that are its own and cannot take any.
-/// \param image   its full resolution; outlives the store
-/// \param update  levels may be made and changed
-/// \throws orin::Exception  the file cannot be read, or for an update: it cannot hold levels
+/// \param image  its full resolution; outlives the store
+/// \throws orin::Exception  the file cannot be read, or it cannot be used so
 std::unique_ptr<datasources::ILevelStore> OpenHfaLevels(const std::string& name,
                                                         const GdalFormat& format,
                                                         datasources::IRasterSource& image,
-                                                        bool update);
+                                                        SourceUse use);
 
 /// The pixels of one level that are being written, and which of them are.
 struct HfaBuild {
@@ -34,6 +35,8 @@ struct HfaBuild {
   std::vector<GDALRasterBandH> bands;  ///< one for each of `channels`
   std::vector<bool> covered;           ///< one for each pixel of the level
   bool isClosed = false;               ///< stored or given up
+  /// Of the level that it is computed from; none: it is computed from the image.
+  std::optional<datasources::ImageRecord> source;
 };
 
 /// A level appears in the file when all of its pixels are on the disk, and is marked not valid at
@@ -53,6 +56,7 @@ class HfaLevelStore final : public datasources::ILevelStore {
   std::unique_ptr<datasources::IRasterWriter> OpenWriter(
       unsigned level, const std::vector<unsigned>& channels) override;
   void SetValid(unsigned level, const std::vector<unsigned>& channels, bool valid) override;
+  void KeepAnswers() override;
   void Remove(const std::vector<unsigned>& levels) override;
 
   // For the level writers.
@@ -74,11 +78,21 @@ class HfaLevelStore final : public datasources::ILevelStore {
   [[noreturn]] void Fail(const char* format, unsigned level) const;
   void Reload();
   void LockFile();
-  datasources::LevelDescription Describe(unsigned level) const;
+  datasources::LevelDescription Describe(unsigned level, const std::string& fingerprint) const;
   void RequireRoom(unsigned level, const std::vector<unsigned>& channels) const;
   HfaRecord RecordToWrite(unsigned level, const std::vector<unsigned>& channels);
   void Record(unsigned level, const HfaRecord& record);
   void StoreBuild();
+
+  std::optional<datasources::ImageStamp> Now() const;
+  void Trust(const datasources::ImageStamp& now) const;
+  std::string FingerprintNow() const;
+  datasources::LevelStatus StatusOf(unsigned level, const std::string& fingerprint) const;
+  void BeginChange();
+  void Settle();
+  void Restamp(const std::string& fingerprint, const datasources::ImageStamp& stamp) const;
+  void RememberImage(HfaRecord& record) const;
+
   unsigned WidthOf(unsigned level, bool isOurs) const;
   unsigned HeightOf(unsigned level, bool isOurs) const;
 
@@ -91,7 +105,10 @@ class HfaLevelStore final : public datasources::ILevelStore {
   std::map<unsigned, HfaRecord> records_;
   std::map<unsigned, Pending> pending_;
   std::shared_ptr<HfaBuild> build_;
-  unsigned lastRead_ = 0;  ///< level read since the last Create
+  std::shared_ptr<datasources::ImageWatch> watch_;  ///< of the image; null when nothing can be told
+  bool isChanging_ = false;  ///< from the first write into the file to the last
+  std::optional<datasources::ImageStamp> before_;  ///< of the image, when the changes began
+  unsigned lastRead_ = 0;                          ///< level read since the last Create
   mutable std::mutex mutex_;
 };
 

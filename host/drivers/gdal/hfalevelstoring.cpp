@@ -1,9 +1,11 @@
-/// How a level gets into an ERDAS Imagine file: not valid first, then its pixels, then valid.
+/// How a level gets into an ERDAS Imagine file: not valid first, then its pixels, then valid; and
+/// how levels leave it.
 // SPDX-License-Identifier: MIT
 #include <algorithm>
 #include <filesystem>
 
 #include "host/drivers/gdal/hfalevelstore.h"
+#include "host/drivers/gdal/patchedfile.h"
 #include "host/services/exception.h"
 #include "host/services/text.h"
 
@@ -42,13 +44,22 @@ HfaRecord HfaLevelStore::RecordToWrite(unsigned level, const std::vector<unsigne
   return record;
 }
 
+/// Over the old record where they have one length, so that the file does not grow.
 void HfaLevelStore::Record(unsigned level, const HfaRecord& record) {
   const auto before = records_.find(level);
   const std::string text = ComposeHfaRecord(record);
   if (before != records_.end() && ComposeHfaRecord(before->second) == text) return;
-  HfaUpdate update(path_, Overwrites::kWait);
-  update.SetItem(HfaRecordKey(level), text);
-  update.Commit();
+  BeginChange();
+  const auto item = FindHfaItem(path_, HfaRecordKey(level));
+  if (item && item->textBytes == text.size() + 1) {
+    PatchedFile file(path_, Overwrites::kWait);
+    file.Write(item->text, text.data(), text.size());
+    file.Commit();
+  } else {
+    HfaUpdate update(path_, Overwrites::kWait);
+    update.SetItem(HfaRecordKey(level), text);
+    update.Commit();
+  }
   Reload();
 }
 
@@ -64,8 +75,14 @@ std::shared_ptr<HfaBuild> HfaLevelStore::BeginWriting(unsigned level,
   for (const unsigned channel : channels)
     if (pyramid_.Find(channel, level) < 0) missing.push_back(channel);
   if (!missing.empty()) RequireRoom(level, missing);
-  Record(level, RecordToWrite(level, channels));
+  BeginChange();
   auto build = std::make_shared<HfaBuild>();
+  if (const auto source = records_.find(lastRead_); source != records_.end())
+    build->source = StatusOf(lastRead_, FingerprintNow()) == datasources::LevelStatus::kCurrent
+                        ? source->second.image
+                        : datasources::ImageRecord();
+  else if (lastRead_) build->source = datasources::ImageRecord();
+  Record(level, RecordToWrite(level, channels));
   build->update =
       std::make_unique<HfaUpdate>(path_, missing.empty() ? Overwrites::kDirect : Overwrites::kWait);
   if (!missing.empty()) build->update->AddLevel(level, missing);
@@ -88,6 +105,11 @@ void HfaLevelStore::EndWriting(HfaBuild& build) noexcept {
   build.isClosed = true;
   build.update.reset();
   pending_.erase(build.level);
+  try {
+    Settle();
+  } catch (const std::exception&) {
+    // deliberate: what is not settled costs the next answer a reading of the image
+  }
 }
 
 /// Puts the pixels that are being written into the file; they are valid when somebody says so.
@@ -116,9 +138,37 @@ void HfaLevelStore::SetValid(unsigned level, const std::vector<unsigned>& channe
     Fail(_("%s: level %u is another program's and cannot be marked."), level);
   }
   HfaRecord now = record->second;
-  for (const unsigned channel : channels)
-    now.validity.at(channel - 1) = valid ? kHfaValid : kHfaInvalid;
+  for (const unsigned channel : channels) now.validity.at(channel - 1) = kHfaInvalid;
+  if (valid && build_ && build_->level == level) RememberImage(now);
+  if (valid)
+    for (const unsigned channel : channels) now.validity.at(channel - 1) = kHfaValid;
   Record(level, now);
+  Settle();
+}
+
+/// The library knows no other way than to remove all of them; the space that they took stays.
+void HfaLevelStore::Remove(const std::vector<unsigned>& levels) {
+  const std::lock_guard lock(mutex_);
+  std::vector<std::string> keys;
+  std::optional<unsigned> going, staying;
+  for (const auto& names : pyramid_.channels)
+    for (const HfaLevelName& name : names) {
+      const bool goes = std::find(levels.begin(), levels.end(), name.factor) != levels.end();
+      if (name.factor >= 2) (goes ? going : staying) = name.factor;
+      keys.push_back(HfaRecordKey(name.factor));
+    }
+  if (!going) return;
+  if (staying)
+    Fail(
+        _("%s: levels inside this format are removed all together, and level %u is to stay. Remove "
+          "all of them, then build those again that are wanted."),
+        *staying);
+  if (!mayChange_) Fail(_("%s: is open for reading only; level %u cannot be removed."), *going);
+  LockFile();
+  HfaUpdate update(path_, Overwrites::kWait);
+  update.RemoveLevels(keys);
+  update.Commit();
+  Reload();
 }
 
 }  // namespace orin::drivers

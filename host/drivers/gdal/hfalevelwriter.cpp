@@ -56,8 +56,32 @@ void HfaLevelWriter::Read(gobs::Raster& block) {
   RepeatEdges(block, inside);
 }
 
+/// A copy without the values that methods compute beyond what 2 or 4 bits hold, which the library
+/// would cut to their last bits; null where all bits of a byte are stored.
+std::unique_ptr<gobs::Raster> HfaLevelWriter::Clamped(const gobs::Raster& block) const {
+  const bool areWhole = std::all_of(level_.storedBits.begin(), level_.storedBits.end(),
+                                    [&](unsigned bits) { return bits >= level_.type.bits; });
+  if (areWhole || level_.type.bits != 8) return nullptr;
+  auto copy =
+      std::make_unique<gobs::Raster>(block, parallelio::ProcessWindow{0, 0, block.x, block.y});
+  const size_t count = level_.storedBits.size();
+  uint8_t* to = copy->data;
+  for (uint32_t y = 0; y < block.height; ++y) {
+    const uint8_t* from = PixelAddress(block, 0, y);
+    for (size_t i = 0; i < block.width * count; ++i)
+      *to++ = static_cast<uint8_t>(
+          std::min<unsigned>(*from++, (1u << std::min(8u, level_.storedBits[i % count])) - 1));
+  }
+  return copy;
+}
+
 void HfaLevelWriter::Write(const gobs::Raster& block) {
   RequireFittingBlock(block, *this, level_.path);
+  const std::unique_ptr<gobs::Raster> clamped = Clamped(block);
+  Store(clamped ? *clamped : block);
+}
+
+void HfaLevelWriter::Store(const gobs::Raster& block) {
   if (!build_ || build_->isClosed) build_ = store_.BeginWriting(level_.factor, level_.channels);
   for (unsigned i = 0; i < level_.channels.size(); ++i)
     build_->update->WriteBlock(build_->bands[i], block, i, level_.width, level_.height);

@@ -23,6 +23,7 @@ class HfaLevelWriter final : public datasources::ReaderState<datasources::IRaste
     std::vector<unsigned> channels;
     gobs::DataType type;
     datasources::AuxiliaryData metadata;
+    std::vector<unsigned> storedBits;  ///< of a sample; one for each of `channels`
   };
   /// \param store  outlives the writer
   HfaLevelWriter(HfaLevelStore& store, Level level);
@@ -48,6 +49,8 @@ class HfaLevelWriter final : public datasources::ReaderState<datasources::IRaste
 
  private:
   void OpenPixels();
+  std::unique_ptr<gobs::Raster> Clamped(const gobs::Raster& block) const;
+  void Store(const gobs::Raster& block);
 
   HfaLevelStore& store_;
   Level level_;

@@ -11,15 +11,15 @@ std::string HfaRecordKey(unsigned level) { return "ORIN_LEVEL_" + std::to_string
 
 std::string ComposeHfaRecord(const HfaRecord& record) {
   return record.method + ";" + std::to_string(record.sourceLevel) + ";" + record.program + ";" +
-         record.validity;
+         record.validity + ";" + datasources::TextOf(record.image);
 }
 
 std::optional<HfaRecord> ParseHfaRecord(const std::string& text, size_t channels) {
   std::vector<std::string> fields;
   std::istringstream stream(text);
   for (std::string field; std::getline(stream, field, ';');) fields.push_back(field);
-  if (fields.size() != 4) return std::nullopt;
-  HfaRecord record{fields[0], 0, fields[2], fields[3]};
+  if (fields.size() != 5) return std::nullopt;
+  HfaRecord record{fields[0], 0, fields[2], fields[3], datasources::ParseImageRecord(fields[4])};
   std::from_chars(fields[1].data(), fields[1].data() + fields[1].size(), record.sourceLevel);
   const bool isWhole = record.validity.size() == channels &&
                        record.validity.find_first_not_of("-01") == std::string::npos;

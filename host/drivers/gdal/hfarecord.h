@@ -6,6 +6,8 @@
 #include <optional>
 #include <string>
 
+#include "host/datasources/imagerecord.h"
+
 namespace orin::drivers {
 
 inline constexpr char kHfaAbsent = '-';   ///< the channel's level is not ours
@@ -16,12 +18,14 @@ struct HfaRecord {
   std::string method;        ///< "NEAREST" ...
   unsigned sourceLevel = 0;  ///< 1 for full resolution; 0 unknown
   std::string program;
-  std::string validity;  ///< one character a channel
+  std::string validity;                 ///< one character a channel
+  datasources::ImageRecord image = {};  ///< that it was computed from; blank when unknown
 };
 
 /// Name of the metadata item of the file that holds the record of `level`.
 std::string HfaRecordKey(unsigned level);
-/// The item's text, which ParseHfaRecord reads back.
+/// The item's text, which ParseHfaRecord reads back. It ends with the stamp of `image`, and has the
+/// same length as long as nothing changes but validity and image.
 std::string ComposeHfaRecord(const HfaRecord& record);
 /// \param channels  of the image
 /// \returns nothing for a text that is no record of that many channels

@@ -26,8 +26,10 @@ constexpr uint32_t kTypeAt = 88, kTypeBytes = 32;
 constexpr unsigned kMostNodes = 100000;        // more is a loop, or no file to work with
 constexpr uint32_t kMostListBytes = 1u << 20;  // of a list of names
 
+constexpr uint32_t kNextAt = 0, kPreviousAt = 4, kChildAt = 12;
+
 struct Node {
-  uint32_t next, child, data, dataBytes;
+  uint32_t position, next, child, data, dataBytes;
   std::string name, type;
 };
 
@@ -79,8 +81,9 @@ class TreeReader {
 
   Node NodeAt(uint32_t position) {
     const std::string bytes = Bytes(position, kNodeBytes);
-    return {NumberAt(bytes, 0),
-            NumberAt(bytes, 12),
+    return {position,
+            NumberAt(bytes, kNextAt),
+            NumberAt(bytes, kChildAt),
             NumberAt(bytes, 16),
             NumberAt(bytes, 20),
             TextAt(bytes, kNameAt, kNameBytes),
@@ -144,6 +147,31 @@ int HfaPyramid::Find(unsigned channel, unsigned factor) const {
   const auto found = std::find_if(levels.begin(), levels.end(),
                                   [&](const HfaLevelName& l) { return l.factor == factor; });
   return found == levels.end() ? -1 : static_cast<int>(found - levels.begin());
+}
+
+std::vector<HfaPointer> PointersWithout(const HfaItemPlace& item) {
+  std::vector<HfaPointer> pointers;
+  pointers.push_back(item.previous ? HfaPointer{item.previous + kNextAt, item.next}
+                                   : HfaPointer{item.parent + kChildAt, item.next});
+  if (item.next) pointers.push_back({item.next + kPreviousAt, item.previous});
+  return pointers;
+}
+
+std::optional<HfaItemPlace> FindHfaItem(const std::string& path, const std::string& key) {
+  TreeReader tree(path);
+  for (const Node& table : tree.ChildrenOf(tree.Root())) {
+    if (table.name != "GDAL_MetaData" || table.type != "Edsc_Table") continue;
+    uint32_t previous = 0;
+    for (const Node& column : tree.ChildrenOf(table)) {
+      if (column.name == key && column.type == "Edsc_Column") {
+        const std::string data = tree.DataOf(column);  // rows, position, type of 2 bytes, length
+        return HfaItemPlace{NumberAt(data, 4), NumberAt(data, 10), column.position,
+                            previous,          column.next,        table.position};
+      }
+      previous = column.position;
+    }
+  }
+  return std::nullopt;
 }
 
 HfaPyramid ReadHfaPyramid(const std::string& path) {

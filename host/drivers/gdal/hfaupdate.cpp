@@ -4,6 +4,7 @@
 #include <cpl_conv.h>
 
 #include "host/drivers/gdal/gdalerrors.h"
+#include "host/drivers/gdal/hfatree.h"
 #include "host/services/exception.h"
 #include "host/services/text.h"
 
@@ -87,6 +88,28 @@ void HfaUpdate::AddLevel(unsigned level, const std::vector<unsigned>& channels) 
           "host/drivers/gdal/hfaupdate", "orin::drivers::HfaUpdate::AddLevel", 0);
 }
 
+void HfaUpdate::RemoveLevels(const std::vector<std::string>& keys) {
+  const GdalErrors errors;
+  const CPLErr answer =
+      GDALBuildOverviews(dataset_, "NONE", 0, nullptr, 0, nullptr, GDALDummyProgress, nullptr);
+  file_.RequireWritten();  // says why, which the library does not
+  errors.Require(answer == CE_None, CannotWrite(), path_);
+  removedItems_ = keys;
+}
+
+/// The library cannot: it would leave the item there with an empty text.
+void HfaUpdate::TakeOut(const std::string& key) {
+  const auto item = FindHfaItem(file_.LibraryName(), key);
+  if (!item) return;
+  for (const HfaPointer& pointer : PointersWithout(*item)) {
+    const uint32_t value = pointer.value;
+    const unsigned char bytes[] = {
+        static_cast<unsigned char>(value), static_cast<unsigned char>(value >> 8),
+        static_cast<unsigned char>(value >> 16), static_cast<unsigned char>(value >> 24)};
+    file_.Write(pointer.position, bytes, sizeof bytes);
+  }
+}
+
 GDALRasterBandH HfaUpdate::LevelBand(unsigned channel, int position) const {
   const GdalErrors errors;
   GDALRasterBandH band = GDALGetRasterBand(dataset_, static_cast<int>(channel));
@@ -132,6 +155,7 @@ void HfaUpdate::Commit() {
     file_.RequireWritten();
     errors.Require(true, CannotWrite(), path_);
   }
+  for (const std::string& key : removedItems_) TakeOut(key);
   file_.Commit();
 }
 

@@ -29,6 +29,9 @@ class HfaUpdate {
   /// Adds a level to `channels` (1-based), none of which has it.
   /// \throws orin::Exception  the file already holds a level of the same size, or it cannot be made
   void AddLevel(unsigned level, const std::vector<unsigned>& channels);
+  /// Takes all levels of all channels out of the file, and the items of those names.
+  /// \throws orin::Exception  they cannot be removed
+  void RemoveLevels(const std::vector<std::string>& keys);
   /// The level at `position` of the channel's list.
   GDALRasterBandH LevelBand(unsigned channel, int position) const;
   /// Stores one channel of a block, and where the block ends at the level's last column or row, the
@@ -43,10 +46,12 @@ class HfaUpdate {
 
  private:
   void Close();
+  void TakeOut(const std::string& key);
 
   std::string path_;
   PatchedFile file_;
   GDALDatasetH dataset_ = nullptr;
+  std::vector<std::string> removedItems_;
 };
 
 }  // namespace orin::drivers

@@ -3,6 +3,7 @@
 
 #include "host/datasources/overviewaccessors.h"
 #include "host/drivers/gdal/hfarecord.h"
+#include "host/drivers/gdal/hfatree.h"
 #include "host/drivers/gdal/patchedfile.h"
 #include "tests/host/drivers/gdal/gdalfiles.h"
 
@@ -235,6 +236,55 @@ TEST_F(HfaLevels, AreWholeOrAbsentAfterEveryWriteOfACommit) {
     patched.Commit();
     EXPECT_EQ(state, BytesOf(file_));
   }
+}
+
+/// The same of a removal. What is left of the levels is theirs, or is none.
+TEST_F(HfaLevels, AreTheirOwnOrAbsentAfterEveryWriteOfARemoval) {
+  for (const unsigned level : {2u, 3u, 5u}) Build(*Open(file_, kUpdate), level, {1, 2});
+  std::filesystem::create_directory(File("state"));
+  std::filesystem::copy(file_, File("state/image.img"));
+  PatchedFile patched(file_, PatchedFile::Overwrites::kWait);
+  {
+    const drivers::GdalErrors errors;
+    const std::unique_ptr<GDALDataset> dataset(
+        GDALDataset::Open(patched.LibraryName().c_str(), GDAL_OF_UPDATE));
+    ASSERT_EQ(CE_None, dataset->BuildOverviews("NONE", 0, nullptr, 0, nullptr, nullptr, nullptr));
+  }
+  for (const unsigned level : {2u, 3u, 5u}) {
+    const auto item = drivers::FindHfaItem(patched.LibraryName(), drivers::HfaRecordKey(level));
+    ASSERT_TRUE(item);
+    for (const auto& pointer : drivers::PointersWithout(*item))
+      patched.Write(pointer.position, &pointer.value, sizeof pointer.value);
+  }
+  const std::vector<FilePatch> patches = patched.Waiting();
+  EXPECT_FALSE(patches.empty());
+  std::string state = BytesOf(file_);
+  for (const FilePatch& patch : patches) {
+    state.replace(patch.position, patch.bytes.size(), patch.bytes);
+    WriteBytes(File("state/image.img"), state);
+    EXPECT_EQ("", WrongPixels(File("state/image.img")));
+    EXPECT_EQ("", RefusalOf([&] { Open(File("state/image.img"), kUpdate); }));
+    Build(*Open(File("state/image.img"), kUpdate), 2, {1, 2});
+    EXPECT_EQ("", WrongPixels(File("state/image.img")));
+  }
+  const auto dataset = Open(file_, kUpdate);
+  dataset->GetSource()->Levels()->Remove({2, 3, 5});
+  EXPECT_TRUE(dataset->GetSource()->Levels()->List().empty());
+  EXPECT_EQ(state.size(), BytesOf(file_).size());
+  EXPECT_EQ(0,
+            GDALGetOverviewCount(
+                std::unique_ptr<GDALDataset>(GDALDataset::Open(file_.c_str()))->GetRasterBand(1)));
+  EXPECT_EQ("", WrongPixels(file_));
+}
+
+TEST_F(HfaLevels, AreRemovedAllTogether) {
+  for (const unsigned level : {2u, 3u}) Build(*Open(file_, kUpdate), level, {1, 2});
+  const std::string before = BytesOf(file_);
+  const auto dataset = Open(file_, kUpdate);
+  EXPECT_THAT(RefusalOf([&] { dataset->GetSource()->Levels()->Remove({2}); }),
+              HasSubstr("removed all together, and level 3 is to stay"));
+  dataset->GetSource()->Levels()->Remove({7});
+  EXPECT_EQ(before, BytesOf(file_));
 }
 
 }  // namespace

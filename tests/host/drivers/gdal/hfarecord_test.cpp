@@ -3,24 +3,42 @@
 
 #include <gtest/gtest.h>
 
+#include <string>
+
 namespace orin::drivers {
 namespace {
 
+constexpr char kNoImage[] =
+    "----------------------------------------------------------------------------------------"
+    "---";
+
 TEST(HfaRecord, IsReadBackAsItWasWritten) {
-  const HfaRecord record{"NEAREST", 2, "Orin Overviews 1.2.3", "1-0"};
-  EXPECT_EQ("NEAREST;2;Orin Overviews 1.2.3;1-0", ComposeHfaRecord(record));
+  HfaRecord record{"NEAREST", 2, "Orin Overviews 1.2.3", "1-0"};
+  EXPECT_EQ(std::string("NEAREST;2;Orin Overviews 1.2.3;1-0;") + kNoImage,
+            ComposeHfaRecord(record));
+  const size_t length = ComposeHfaRecord(record).size();
+  record.image = {"0123456789abcdef0123456789abcdef", {5, -6, 7}};
+  EXPECT_EQ(length, ComposeHfaRecord(record).size());
   const auto read = ParseHfaRecord(ComposeHfaRecord(record), 3);
   ASSERT_TRUE(read);
   EXPECT_EQ(record.method, read->method);
   EXPECT_EQ(record.sourceLevel, read->sourceLevel);
   EXPECT_EQ(record.program, read->program);
   EXPECT_EQ(record.validity, read->validity);
+  EXPECT_EQ(record.image, read->image);
+}
+
+TEST(HfaRecord, WhoseImageIsDamagedRemembersNone) {
+  const auto read = ParseHfaRecord("NEAREST;1;program;11;0123 5 6 7", 2);
+  ASSERT_TRUE(read);
+  EXPECT_TRUE(read->image.IsBlank());
 }
 
 TEST(HfaRecord, IsNoneWhenItIsOfAnotherNumberOfChannelsOrDamaged) {
-  EXPECT_FALSE(ParseHfaRecord("NEAREST;1;program;11", 3));
-  EXPECT_FALSE(ParseHfaRecord("NEAREST;1;program;1x1", 3));
-  EXPECT_FALSE(ParseHfaRecord("NEAREST;1;111", 3));
+  const std::string image = kNoImage;
+  EXPECT_FALSE(ParseHfaRecord("NEAREST;1;program;11;" + image, 3));
+  EXPECT_FALSE(ParseHfaRecord("NEAREST;1;program;1x1;" + image, 3));
+  EXPECT_FALSE(ParseHfaRecord("NEAREST;1;program;111", 3));
   EXPECT_FALSE(ParseHfaRecord("", 3));
 }
 

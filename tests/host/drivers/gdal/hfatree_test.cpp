@@ -1,6 +1,8 @@
 // SPDX-License-Identifier: MIT
 #include "host/drivers/gdal/hfatree.h"
 
+#include <cstring>
+
 #include "tests/host/drivers/gdal/gdalfiles.h"
 
 namespace orin::tests {
@@ -47,6 +49,29 @@ TEST_F(HfaTree, TellsWhenTheFileWasRenamed) {
   EXPECT_FALSE(ReadHfaPyramid(File("image.img")).NamesAnotherFileThan("image.img"));
   std::filesystem::rename(File("image.img"), File("other.img"));
   EXPECT_TRUE(ReadHfaPyramid(File("other.img")).NamesAnotherFileThan("other.img"));
+}
+
+TEST_F(HfaTree, TellsWhereItemsStandAndHowTheyAreTakenOut) {
+  const std::vector<std::string> keys = {"FIRST", "SECOND", "THIRD"};
+  for (const std::string& removed : keys) {
+    WritePicture(File("image.img"), "HFA", {}, [&](GDALDataset& image) {
+      for (const std::string& key : keys) image.SetMetadataItem(key.c_str(), (key + "!").c_str());
+    });
+    std::string bytes = BytesOf(File("image.img"));
+    const auto item = drivers::FindHfaItem(File("image.img"), removed);
+    ASSERT_TRUE(item);
+    EXPECT_EQ(removed + "!", bytes.substr(item->text, item->textBytes - 1));
+    for (const drivers::HfaPointer& pointer : drivers::PointersWithout(*item))
+      std::memcpy(&bytes[pointer.position], &pointer.value, sizeof pointer.value);
+    WriteBytes(File("without.img"), bytes);
+    EXPECT_FALSE(drivers::FindHfaItem(File("without.img"), removed));
+    const std::unique_ptr<GDALDataset> left(GDALDataset::Open(File("without.img").c_str()));
+    for (const std::string& key : keys) {
+      const char* text = left->GetMetadataItem(key.c_str());
+      EXPECT_EQ(key == removed ? "" : key + "!", text ? text : "");
+    }
+  }
+  EXPECT_FALSE(drivers::FindHfaItem(File("image.img"), "FOURTH"));
 }
 
 TEST_F(HfaTree, OfAFileThatIsCutAnywhereIsReadOrRefusedButNeverFollowedForEver) {

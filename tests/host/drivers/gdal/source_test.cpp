@@ -95,13 +95,24 @@ TEST_F(GdalSource, KeepsAllDigitsOfSixtyFourBits) {
   EXPECT_EQ("18446744073709551615", FileNoData(*most));
 }
 
-TEST_F(GdalSource, AnswersNoTextThatIsNoFiniteNumber) {
-  const auto dataset = OpenVrt({.type = GDT_Float32}, [](GDALDataset& vrt) {
+TEST_F(GdalSource, AnswersNanAndInfinitiesAsDeclared) {
+  const std::pair<double, const char*> texts[] = {
+      {std::numeric_limits<double>::quiet_NaN(), "nan"},
+      {std::numeric_limits<double>::infinity(), "inf"},
+      {-std::numeric_limits<double>::infinity(), "-inf"}};
+  for (const auto& [value, text] : texts) {
+    const auto dataset = OpenVrt({.type = GDT_Float32}, [&](GDALDataset& vrt) {
+      vrt.GetRasterBand(1)->SetNoDataValue(value);
+    });
+    EXPECT_EQ(text, FileNoData(*dataset));
+  }
+  const auto two = OpenVrt({.channels = 2, .type = GDT_Float32}, [](GDALDataset& vrt) {
     vrt.GetRasterBand(1)->SetNoDataValue(std::numeric_limits<double>::quiet_NaN());
+    vrt.GetRasterBand(2)->SetNoDataValue(5);
   });
-  EXPECT_EQ("", FileNoData(*dataset));
-  const std::unique_ptr<GDALDataset> vrt(GDALDataset::Open(File("image.vrt").c_str()));
-  EXPECT_EQ("nan", drivers::NoDataTextOf(vrt->GetRasterBand(1)));
+  EXPECT_EQ("", FileNoData(*two));
+  EXPECT_EQ("nan", ChannelNoData(*two, 1));
+  EXPECT_EQ("5", ChannelNoData(*two, 2));
 }
 
 TEST_F(GdalSource, PassesOnMetadata) {
@@ -116,11 +127,43 @@ TEST_F(GdalSource, PassesOnMetadata) {
 
 TEST_F(GdalSource, TellsWhichChannelIsOpacity) {
   WritePicture(File("rgba.png"), "PNG", {.channels = 4});
-  const auto dataset = Open(File("rgba.png"));
-  EXPECT_EQ(4u, dynamic_cast<drivers::GdalSource&>(*dataset->GetSource()).AlphaChannel());
+  EXPECT_EQ(4u, Open(File("rgba.png"))->GetSource()->AlphaChannel());
   WritePicture(File("rgb.png"), "PNG", {.channels = 3});
-  const auto opaque = Open(File("rgb.png"));
-  EXPECT_EQ(0u, dynamic_cast<drivers::GdalSource&>(*opaque->GetSource()).AlphaChannel());
+  EXPECT_EQ(0u, Open(File("rgb.png"))->GetSource()->AlphaChannel());
+}
+
+TEST_F(GdalSource, TellsHowManyBitsOfASampleAreKept) {
+  WritePicture(File("deep.jp2"), "JP2OpenJPEG", {.type = GDT_UInt16, .options = {"NBITS=12"}});
+  EXPECT_EQ(12u, Open(File("deep.jp2"))->GetSource()->StoredBitsOf(1));
+  WritePicture(File("four.img"), "HFA", {.options = {"NBITS=4"}});
+  EXPECT_EQ(4u, Open(File("four.img"))->GetSource()->StoredBitsOf(1));
+  WritePicture(File("eight.img"), "HFA", {});
+  EXPECT_EQ(8u, Open(File("eight.img"))->GetSource()->StoredBitsOf(1));
+}
+
+TEST_F(GdalSource, TellsThatPixelsAreClasses) {
+  const auto isOfClasses = [this](const std::function<void(GDALRasterBand&)>& edit) {
+    return OpenVrt({}, [&](GDALDataset& vrt) { edit(*vrt.GetRasterBand(1)); })
+        ->GetSource()
+        ->HoldsClasses();
+  };
+  EXPECT_FALSE(isOfClasses([](GDALRasterBand&) {}));
+  EXPECT_TRUE(isOfClasses([](GDALRasterBand& band) {
+    GDALColorTable colours;
+    const GDALColorEntry red = {255, 0, 0, 255};
+    colours.SetColorEntry(0, &red);
+    band.SetColorTable(&colours);
+  }));
+  EXPECT_TRUE(isOfClasses([](GDALRasterBand& band) {
+    CPLStringList names;
+    names.AddString("water");
+    names.AddString("forest");
+    band.SetCategoryNames(names.List());
+  }));
+  EXPECT_TRUE(
+      isOfClasses([](GDALRasterBand& band) { band.SetMetadataItem("LAYER_TYPE", "thematic"); }));
+  WritePicture(File("classes.gif"), "GIF", {});
+  EXPECT_TRUE(Open(File("classes.gif"))->GetSource()->HoldsClasses());
 }
 
 TEST_F(GdalSource, HasNoLevelsOfItsOwnButInErdasImagine) {
