@@ -205,12 +205,14 @@ TEST_F(TiffStore, AlphaOfAnyFormatIsReadWithItsBlocksAndNamedInItsSideCar) {
   reader->Read(block);
   ASSERT_NE(nullptr, block.validity);
   EXPECT_EQ(false, block.validity->Uniform());
-  source->Levels()->Create(2, {1}, "NEAREST");
-  const auto writer = source->Levels()->OpenWriter(2, {1});
   gobs::Raster level({10, 5, 1, gobs::eDT_8U}, {});
   std::fill_n(level.data, level.byteSize, uint8_t{0});
-  writer->Write(level);
-  source->Levels()->SetValid(2, {1}, true);
+  for (const unsigned channel : {1u, 2u}) {
+    source->Levels()->Create(2, {channel}, "NEAREST");
+    const auto writer = source->Levels()->OpenWriter(2, {channel});
+    writer->Write(level);
+    source->Levels()->SetValid(2, {channel}, true);
+  }
   TIFF* tiff = TIFFOpen((file + ".ovr").c_str(), "r");
   ASSERT_NE(nullptr, tiff);
   uint16_t count = 0;

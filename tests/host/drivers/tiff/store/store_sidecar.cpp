@@ -90,22 +90,52 @@ TEST_F(SideCar, HoldsPlanesAndLeavesTheImageUntouched) {
   EXPECT_FALSE(Exists(partial_));
 }
 
-TEST_F(SideCar, GetsItsNameWithItsFirstChannelAndValidityChannelByChannel) {
+TEST_F(SideCar, GetsItsNameWhenALevelHasAllOfItsChannels) {
   const auto dataset = OpenGeneric(file_);
   const std::vector<std::string> validity = {"1--", "11-", "111"};
   for (unsigned channel = 1; channel <= 3; ++channel) {
     Build(*dataset, kImage, {.level = 2, .channels = {channel}, .goesOn = [&](unsigned) {
-                               EXPECT_EQ(channel > 1, Exists(sideCar_));
+                               EXPECT_FALSE(Exists(sideCar_));
                                return true;
                              }});
-    EXPECT_TRUE(Exists(sideCar_));
+    EXPECT_EQ(channel == 3, Exists(sideCar_));
     EXPECT_EQ(validity[channel - 1], ValidityOf(LevelsOf(*dataset).at(0)));
-    EXPECT_EQ(validity[channel - 1], ValidityOf(LevelsOf(*OpenGeneric(file_)).at(0)));
   }
+  EXPECT_EQ("111", ValidityOf(LevelsOf(*OpenGeneric(file_)).at(0)));
   const auto level = LevelsOf(*dataset).at(0);
   EXPECT_EQ(datasources::LevelPlace::kSideCar, level.place);
   EXPECT_EQ(sideCar_, level.file);
   EXPECT_EQ(1u, level.sourceLevel);
+}
+
+TEST_F(SideCar, KeepsTheFinishedChannelsOfARunThatEndsOrGoesOnWithoutTheOthers) {
+  {
+    const auto dataset = OpenGeneric(file_);
+    Build(*dataset, kImage, {.level = 2, .channels = {1}});
+    Build(*dataset, kImage, {.level = 2, .channels = {3}});
+    EXPECT_FALSE(Exists(sideCar_));
+    Build(*dataset, kImage, {.level = 4, .channels = {2}});
+    EXPECT_EQ("1-1", ValidityOf(LevelsOf(*OpenGeneric(file_)).at(0)));
+  }
+  const auto levels = LevelsOf(*OpenGeneric(file_));
+  ASSERT_EQ(2u, levels.size());
+  EXPECT_EQ("1-1", ValidityOf(levels[0]));
+  EXPECT_EQ("-1-", ValidityOf(levels[1]));
+  for (const auto& level : levels) EXPECT_EQ(datasources::LevelStatus::kUnfinished, level.status);
+  Build(*OpenGeneric(file_), kImage, {.level = 2, .channels = {2}});
+  EXPECT_EQ("", WrongTile(sideCar_, 0, LevelLayout(InPlanes(kImage), 2)));
+}
+
+TEST_F(SideCar, KeepsAFinishedChannelWhenTheNextOneFails) {
+  {
+    const auto dataset = OpenGeneric(file_);
+    Build(*dataset, kImage, {.level = 2, .channels = {1}});
+    const auto stopping = [](unsigned block) { return block < 2; };
+    Build(*dataset, kImage,
+          {.level = 2, .edge = 40, .channels = {2}, .goesOn = stopping, .marksValid = false});
+    EXPECT_EQ("10-", ValidityOf(LevelsOf(*OpenGeneric(file_)).at(0)));
+  }
+  EXPECT_EQ("10-", ValidityOf(LevelsOf(*OpenGeneric(file_)).at(0)));
 }
 
 /// A build of level 2 that ends without any clean-up before its block `stop`.
@@ -267,12 +297,13 @@ TEST_F(SideCar, OfABigEndianImageIsInTheMachinesOrder) {
 /// Makes one level of an image of no TIFF file and returns its directory.
 Seen PlainLevel(const std::string& name, PlainImage& image, unsigned level) {
   const auto store = drivers::TiffSideCar().Open(name, image);
-  store->Create(level, {1}, "NEAREST");
-  const auto writer = store->OpenWriter(level, {1});
   gobs::Raster block({image.Width() / level, image.Height() / level, 1, image.TypeOf(1)}, {});
   std::fill(block.data, block.data + block.byteSize, uint8_t{0});
-  writer->Write(block);
-  store->SetValid(level, {1}, true);
+  for (unsigned channel = 1; channel <= image.ChannelCount(); ++channel) {
+    store->Create(level, {channel}, "NEAREST");
+    store->OpenWriter(level, {channel})->Write(block);
+    store->SetValid(level, {channel}, true);
+  }
   return DirectoriesOf(name + ".ovr").at(0);
 }
 
