@@ -186,8 +186,17 @@ uint64_t Appender::AppendDirectory(std::vector<NewEntry> entries, uint64_t next)
   return WriteDirectory(std::move(entries), next, Reserve(kPointerBytes + size));
 }
 
+/// What is appended begins at even positions: so a stretch has room for the same in any order.
+void Appender::PadStretch() {
+  const bool isOpen = !space_.stretches.empty() && space_.stretches.back().end == 0;
+  if (!isOpen || end_ == EvenFrom(end_) || file_.Size() > end_) return;
+  const uint8_t padding = 0;
+  file_.Write(end_++, &padding, 1);
+}
+
 void Appender::Close() {
   const std::lock_guard lock(mutex_);
+  PadStretch();
   EndStretch();
   for (const Stretch& stretch : space_.unclosed)
     file_.Write(stretch.marker, ComposeMarker(stretch).data(), kMarkerBytes);

@@ -67,6 +67,7 @@ class Appender {
   std::optional<uint64_t> ReserveBelow(uint64_t bytes, uint64_t limit);
   void NoticeOthers();
   void EndStretch();
+  void PadStretch();
   void BeginStretch(uint64_t bytes);
   void RequireRoom(uint64_t position, uint64_t bytes) const;
   uint64_t MarkerFor(uint64_t position) const;

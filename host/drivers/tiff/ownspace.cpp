@@ -195,7 +195,9 @@ uint64_t OwnSpace::ShortestEnd(uint64_t fileSize, const ExtentSet& given) const 
   while (!spare.IsEmpty() && spare.End() <= end && end - spare.End() <= kPadding &&
          used.End() < end) {
     const Extent last = spare.Last();
-    end = std::max(last.start, used.End());
+    const uint64_t needed = used.End() + used.End() % 2;  // a stretch ends at an even position
+    end = used.End() <= last.start ? last.start : std::min(needed, end);
+    if (end > last.start) break;
     spare.Remove(last);
   }
   return end;

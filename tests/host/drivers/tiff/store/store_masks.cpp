@@ -75,6 +75,17 @@ std::string WrongMask(const std::string& file, size_t index, const IsValid& isVa
   return "";
 }
 
+/// Where the tiles of directory `index` stand.
+std::vector<uint64_t> TilesOf(const std::string& file, uint16_t index) {
+  TIFF* tiff = TIFFOpen(file.c_str(), "r");
+  const std::unique_ptr<TIFF, void (*)(TIFF*)> closer(tiff, &TIFFClose);
+  if (!tiff || !TIFFSetDirectory(tiff, index)) return {};
+  std::vector<uint64_t> tiles;
+  for (uint32_t i = 0; i < TIFFNumberOfTiles(tiff); ++i)
+    tiles.push_back(TIFFGetStrileOffset(tiff, i));
+  return tiles;
+}
+
 /// "0 4 1 5": the subfile types in the order of the chain.
 std::string TypesOf(const std::string& file) {
   std::string types;
@@ -142,13 +153,20 @@ TEST_P(StoredMasks, BesideTheImageJoinTheChannelsOfOneRun) {
 }
 
 TEST_P(StoredMasks, ThatStayTheSameKeepTheirTiles) {
+  const std::string sideCar = file_ + ".ovr";
   WriteLevel(*OpenGeneric(file_), Checks, 100, {1});
-  const auto first = std::filesystem::file_size(file_ + ".ovr");
+  const std::ifstream reader(sideCar);  // while it is there, nothing moves
+  const uint64_t first = DirectoriesOf(sideCar).at(1).offset;
+  const auto tiles = TilesOf(sideCar, 1);
+  ASSERT_FALSE(tiles.empty());
   WriteLevel(*OpenGeneric(file_), Checks, 100, {1});
-  const auto second = std::filesystem::file_size(file_ + ".ovr");
+  EXPECT_NE(first, DirectoriesOf(sideCar).at(1).offset);
+  EXPECT_EQ(tiles, TilesOf(sideCar, 1));
+  EXPECT_EQ("", WrongMask(sideCar, 1, Checks));
+  const auto end = std::filesystem::file_size(sideCar);
   WriteLevel(*OpenGeneric(file_), Columns, 100, {1});
-  const auto third = std::filesystem::file_size(file_ + ".ovr");
-  EXPECT_GT(third - second, second - first);
+  for (const uint64_t tile : TilesOf(sideCar, 1)) EXPECT_GE(tile, end);
+  EXPECT_EQ("", WrongMask(sideCar, 1, Columns));
 }
 
 TEST_F(TiffStore, AMaskOfEightBitsInTheImageCounts) {

@@ -228,18 +228,28 @@ TEST_F(Parts, DirectoryIsReadByLibtiffAsItWasComposed) {
 TEST_F(Parts, AppenderStopsAtFourGiBOfAClassicFileOnly) {
   const std::string name = folder_.File("long.tif");
   drivers::PositionedFile file(name, drivers::PositionedFile::Mode::kCreate);
-  file.Truncate((uint64_t{1} << 32) - 50);
+  const uint64_t limit = uint64_t{1} << 32;
+  const auto expectRefusal = [&](drivers::Appender& appender, size_t bytes) {
+    const uint64_t size = file.Size();
+    try {
+      appender.Append(std::vector<uint8_t>(bytes));
+      ADD_FAILURE() << "it went on with " << bytes;
+    } catch (const Exception& refused) {
+      EXPECT_EQ(0u, refused.GetMessage().find(name + ": would pass 4 GiB")) << refused.GetMessage();
+    }
+    EXPECT_EQ(size, file.Size());
+  };
+  file.Truncate(limit - 192);
   drivers::Appender classic(file, false, {});
-  EXPECT_EQ((uint64_t{1} << 32) - 50, classic.Append(std::vector<uint8_t>(20)));
-  try {
-    classic.Append(std::vector<uint8_t>(100));
-    ADD_FAILURE() << "it went on";
-  } catch (const Exception& refused) {
-    EXPECT_EQ(0u, refused.GetMessage().find(name + ": would pass 4 GiB")) << refused.GetMessage();
-  }
-  EXPECT_EQ((uint64_t{1} << 32) - 30, file.Size());
+  expectRefusal(classic, 128);  // behind the marker
+  EXPECT_EQ(limit - 192 + drivers::kMarkerBytes, classic.Append(std::vector<uint8_t>(20)));
+  expectRefusal(classic, 108);
+  EXPECT_EQ(limit - 108, classic.Append(std::vector<uint8_t>(107)));  // up to the last byte
+  EXPECT_EQ(limit - 1, file.Size());
+  drivers::Appender another(file, false, {});
+  expectRefusal(another, 1);
   drivers::Appender big(file, true, {});
-  EXPECT_EQ((uint64_t{1} << 32) - 30, big.Append(std::vector<uint8_t>(100)));
+  EXPECT_EQ(limit + drivers::kMarkerBytes, big.Append(std::vector<uint8_t>(100)));
 }
 
 TEST_F(Parts, EncoderNamesTheFileAndTheCodecsReason) {

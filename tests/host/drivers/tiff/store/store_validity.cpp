@@ -73,14 +73,15 @@ TEST_F(Validity, IsClearedByTheFirstBlockOfARebuildNotBefore) {
 
 TEST_F(Validity, OfARebuildIsThatOfAnotherDirectoryAndTheFileGrowsNoLonger) {
   Build(file_, kImage, {.level = 2});
-  const auto before = DirectoriesOf(file_);
-  const auto size = (BytesOf(file_).size() + 1) / 2 * 2;  // tiles start at even positions
-  Build(file_, kImage, {.level = 2, .edge = 31});
-  const auto after = DirectoriesOf(file_);
-  EXPECT_NE(before.at(1).offset, after.at(1).offset);
-  EXPECT_EQ(size, BytesOf(file_).size());
-  EXPECT_EQ("111", Valid());
-  EXPECT_EQ("", WrongTile(file_, 1, LevelLayout(kImage, 2)));
+  const auto first = DirectoriesOf(file_).at(1).offset;
+  const auto size = BytesOf(file_).size();
+  for (const unsigned edge : {31u, 100u, 32u}) {
+    Build(file_, kImage, {.level = 2, .edge = edge});
+    EXPECT_NE(first, DirectoriesOf(file_).at(1).offset) << edge;
+    EXPECT_EQ(size, BytesOf(file_).size()) << edge;
+    EXPECT_EQ("111", Valid()) << edge;
+    EXPECT_EQ("", WrongTile(file_, 1, LevelLayout(kImage, 2))) << edge;
+  }
 }
 
 TEST_F(Validity, OfChannelsThatShareTheRebuiltOnesTilesStandsOverAWholeTileTable) {
