@@ -200,10 +200,10 @@ LevelCoding CodingOfLevel(const LevelCoding& image, unsigned level, const std::s
 }
 
 LevelCoding InPlanes(LevelCoding coding) {
-  if (coding.format.samplesPerPixel < 2) return coding;
-  const bool needsChunks = coding.IsJpegYCbCr() || coding.format.compression == COMPRESSION_WEBP;
-  if (needsChunks) FallBackToDeflate(coding);
-  coding.format.planar = true;
+  // Both need several channels in a tile, or lose more than they have to.
+  const uint16_t codec = coding.format.compression;
+  if (codec == COMPRESSION_JPEG || codec == COMPRESSION_WEBP) FallBackToDeflate(coding);
+  coding.format.planar = coding.format.samplesPerPixel > 1;
   return coding;
 }
 
