@@ -11,8 +11,8 @@ import numpy
 from osgeo import gdal
 import rasterio
 
-from orin_e2e import (Case, TOOL, info, nearest, overview_sizes, random_pixels, read_pixels, run,
-                      write_tiff)
+from orin_e2e import (Case, TOOL, info, nearest, overview_sizes, random_opaque_pixels,
+                      random_pixels, read_pixels, run, write_tiff)
 
 ROWS, COLUMNS = 777, 1003
 GEO_TAGS = ("ModelPixelScale", "ModelTiepoint", "GeoKeyDirectory", "33550", "33922", "34735")
@@ -136,7 +136,7 @@ class TheSideCar(Case):
         self.assertSamePixels(nearest(pixels, 1, 2, (COLUMNS, ROWS)), read_pixels(self.file, 0))
 
     def test_alpha_is_alpha_in_the_levels_too(self):
-        self.check(random_pixels((4, ROWS, COLUMNS), numpy.uint8, 5), "Byte",
+        self.check(random_opaque_pixels((4, ROWS, COLUMNS), numpy.uint8, 5), "Byte",
                    ["PHOTOMETRIC=RGB", "ALPHA=YES"])
         side_car = gdal.Open(self.file + ".ovr")
         self.assertEqual(gdal.GCI_AlphaBand, side_car.GetRasterBand(4).GetColorInterpretation())
