@@ -49,6 +49,13 @@ def random_pixels(shape, dtype, seed):
     return generator.integers(limits.min, limits.max, shape, dtype, endpoint=True)
 
 
+def random_opaque_pixels(shape, dtype, seed):
+    """The same with an alpha channel, the last one, of which no pixel is transparent."""
+    pixels = random_pixels(shape, dtype, seed)
+    pixels[-1] = numpy.maximum(pixels[-1], 1)
+    return pixels
+
+
 def write_tiff(path, pixels, type_name, options=(), no_data=None):
     """Writes pixels of shape (channels, rows, columns) with GDAL."""
     channels, rows, columns = pixels.shape

@@ -9,8 +9,8 @@ import unittest
 import numpy
 from osgeo import gdal
 
-from orin_e2e import (Case, NUMPY_TYPES, nearest, overview_sizes, random_pixels, read_pixels, run,
-                      write_tiff)
+from orin_e2e import (Case, NUMPY_TYPES, nearest, overview_sizes, random_opaque_pixels,
+                      random_pixels, read_pixels, run, write_tiff)
 
 ROWS, COLUMNS = 75, 99
 LOSSLESS = ("NONE", "DEFLATE", "LZW", "ZSTD", "PACKBITS", "LZMA", "LERC")
@@ -29,7 +29,9 @@ def tiff_tags(path, index):
 
 def picture(channels, type_name, seed, holes=True):
     """Random values; floating point ones with NaN, infinities and a negative zero among them."""
-    pixels = random_pixels((channels, ROWS, COLUMNS), NUMPY_TYPES[type_name], seed)
+    has_alpha = channels == 4 and type_name in ("Byte", "UInt16")  # as GDAL writes them
+    make = random_opaque_pixels if has_alpha else random_pixels
+    pixels = make((channels, ROWS, COLUMNS), NUMPY_TYPES[type_name], seed)
     if holes and type_name.startswith("Float"):
         for start, value in enumerate((numpy.nan, numpy.inf, -numpy.inf, -0.0)):
             pixels.reshape(-1)[start * 2::37] = value
@@ -91,16 +93,19 @@ class WhateverTheImage(InMemory):
         self.assertRan(run("build", path, "--levels", "2"))
         self.assertEqual("DEFLATE", tiff_tags(path, 2)["COMPRESSION"])
 
-    def test_colours_under_transparent_pixels_are_kept(self):
+    def test_colours_under_translucent_pixels_are_kept_and_none_under_transparent_ones(self):
         pixels = random_pixels((4, ROWS, COLUMNS), numpy.uint8, 6)
-        pixels[3] = numpy.where(pixels[3] < 128, 0, 255)
+        pixels[3] = numpy.choose(pixels[3] % 4, (0, 1, 128, 255)).astype(numpy.uint8)
         images = [(self.path(f"{codec}.tif"), codec) for codec in ("WEBP", "LERC", "DEFLATE")]
         for path, codec in images:
             write_tiff(path, pixels, "Byte", [f"COMPRESS={codec}", "PHOTOMETRIC=RGB", "ALPHA=YES",
                                               "WEBP_LOSSLESS=YES", "TILED=YES"])
-            stored = read_pixels(path)  # the image may have lost them already
+            expected = half(read_pixels(path))  # the image may have lost them already
+            is_transparent = expected[3] == 0
+            self.assertEqual({0, 1, 128, 255}, set(expected[3].flat))
+            expected[:, is_transparent] = 0  # as no-data is
             self.assertRan(run("build", path, "--levels", "2"))
-            self.assertSamePixels(half(stored), read_pixels(path, 0))
+            self.assertSamePixels(expected, read_pixels(path, 0))
 
     def test_webp_levels_of_a_webp_image_are_without_loss(self):
         pixels = random_pixels((3, ROWS, COLUMNS), numpy.uint8, 7)

@@ -11,8 +11,8 @@ import numpy
 from osgeo import gdal
 import rasterio
 
-from orin_e2e import (Case, TOOL, info, nearest, overview_sizes, random_pixels, read_pixels, run,
-                      write_tiff)
+from orin_e2e import (Case, TOOL, info, nearest, overview_sizes, random_opaque_pixels,
+                      random_pixels, read_pixels, run, write_tiff)
 
 ROWS, COLUMNS = 777, 1003
 GEO_TAGS = ("ModelPixelScale", "ModelTiepoint", "GeoKeyDirectory", "33550", "33922", "34735")
@@ -21,6 +21,12 @@ GEO_TAGS = ("ModelPixelScale", "ModelTiepoint", "GeoKeyDirectory", "33550", "339
 def bytes_of(path):
     with open(path, "rb") as file:
         return file.read()
+
+
+def stamps_apart(content):
+    """A file without what its levels know of its size and time, and what that is."""
+    stamp = re.compile(rb'(?<=ORIN_IMAGE">)([0-9a-f]{32} )(\d{20} [+-]\d{19} [0-9a-f]{16})(?=<)')
+    return stamp.sub(rb"\1", content), [found[2] for found in stamp.finditer(content)]
 
 
 class TheImage(Case):
@@ -58,10 +64,29 @@ class TheImage(Case):
 
     def test_asking_for_what_is_there_does_not_touch_a_file_with_levels_inside(self):
         self.assertRan(run("build", self.file))
-        os.utime(self.file, ns=(1_000_000_007, 2_000_000_011))
-        before = bytes_of(self.file)
+        before, time = bytes_of(self.file), os.stat(self.file).st_mtime_ns
+        answer = run("build", self.file)
+        self.assertRan(answer)
+        self.assertIn("nothing to do", answer.stdout)
+        self.assertEqual(before, bytes_of(self.file))
+        self.assertEqual(time, os.stat(self.file).st_mtime_ns)
+
+    def test_a_foreign_time_is_noted_by_the_levels_inside_and_kept(self):
         self.assertRan(run("build", self.file))
-        self.assertUntouched(before)
+        levels = len(info(self.file)["levels"])
+        before = stamps_apart(bytes_of(self.file))
+        os.utime(self.file, ns=(1_000_000_007, 2_000_000_011))
+        answer = run("build", self.file)
+        self.assertRan(answer)
+        self.assertIn("nothing to do", answer.stdout)
+        noted = bytes_of(self.file)
+        after = stamps_apart(noted)
+        self.assertEqual(before[0], after[0])
+        stamp = b"%020d +%019d %016x" % (len(noted), 2_000_000_011, 0)
+        self.assertEqual([stamp] * levels, after[1])
+        self.assertNotIn(stamp, before[1])
+        self.assertRan(run("build", self.file))
+        self.assertUntouched(noted)
 
     def test_levels_beside_levels_inside_are_told_once(self):
         self.assertRan(run("build", self.file, "--levels", "2"))
@@ -136,7 +161,7 @@ class TheSideCar(Case):
         self.assertSamePixels(nearest(pixels, 1, 2, (COLUMNS, ROWS)), read_pixels(self.file, 0))
 
     def test_alpha_is_alpha_in_the_levels_too(self):
-        self.check(random_pixels((4, ROWS, COLUMNS), numpy.uint8, 5), "Byte",
+        self.check(random_opaque_pixels((4, ROWS, COLUMNS), numpy.uint8, 5), "Byte",
                    ["PHOTOMETRIC=RGB", "ALPHA=YES"])
         side_car = gdal.Open(self.file + ".ovr")
         self.assertEqual(gdal.GCI_AlphaBand, side_car.GetRasterBand(4).GetColorInterpretation())

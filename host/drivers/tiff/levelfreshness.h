@@ -38,6 +38,8 @@ class LevelFreshness {
   /// The first change to the file that holds `levels` comes next.
   void BeginChange(const std::vector<StoredLevel>& levels);
   bool IsChanging() const { return isChanging_; }
+  /// Somebody else may have changed the image since the changes began: what it was tells nothing.
+  void Doubt() { before_.reset(); }
   /// All is written. \param now  what the image shows after that, when it is known
   void EndChange(const std::optional<datasources::ImageStamp>& now);
 

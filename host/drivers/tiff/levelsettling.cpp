@@ -20,7 +20,8 @@ ImageRecord TiffLevelStore::RecordOrGiveUp(unsigned level, const Pending& pendin
   } catch (const Exception&) {
     const std::shared_ptr<LevelBuild> build = pending.build;
     GiveUp(level, *build);
-    freshness_.EndChange(std::nullopt);
+    freshness_.Doubt();
+    Settle();
     throw;
   }
 }
@@ -44,14 +45,13 @@ void TiffLevelStore::SetSource(const datasources::LevelDescription& source) {
 /// The last step of every change. Levels that were computed from the data that the image holds
 /// learn its size and time. Where that is the file that was just written, its time is set to the
 /// one written, so that it agrees from then on; a step left out, by a kill or a loss of power,
-/// costs the next answer a reading of the image.
+/// costs the next answer a reading of the image. So does a file that somebody else wrote to.
 void TiffLevelStore::Settle() {
   if (!file_->Exists()) return freshness_.EndChange(std::nullopt);
+  if (freshness_.IsInImage() && file_->TakeWasTouched()) freshness_.Doubt();
   const std::string fingerprint = freshness_.KnownFingerprint();
   std::optional<ImageStamp> stamp = freshness_.Now();
-  // Who changed the file meanwhile may have changed the image: then the next answer reads it.
-  const bool wasTouched = freshness_.IsInImage() && file_->TakeWasTouched();
-  if (fingerprint.empty() || !stamp || wasTouched) return freshness_.EndChange(std::nullopt);
+  if (fingerprint.empty() || !stamp) return freshness_.EndChange(std::nullopt);
   if (freshness_.IsInImage()) {
     const auto now = std::chrono::system_clock::now().time_since_epoch();
     stamp->bytes = file_->File().Size();

@@ -212,6 +212,17 @@ TEST_F(Fresh, EditDuringABuildIntoTheFileItselfGivesNoValidLevel) {
   EXPECT_EQ(LevelStatus::kStale, Level().status);
 }
 
+TEST_F(Fresh, EditDuringABuildThatIsGivenUpMakesTheOtherLevelsStale) {
+  Build(file_, kImage, {.level = 2});
+  const auto editing = [&](unsigned block) {
+    if (block == 3) Flip(file_, TileAt(file_, 3).first), SetTime(7000);
+    return block < 5;
+  };
+  Build(file_, kImage, {.level = 4, .edge = 10, .goesOn = editing, .marksValid = false});
+  ASSERT_EQ(1u, LevelsOf(file_).size());
+  EXPECT_EQ(LevelStatus::kStale, Level().status);
+}
+
 TEST_F(Fresh, TouchDuringABuildDoesNoHarmToAnImageThatWasKnownBefore) {
   Build(file_, kImage, {.level = 2});
   const auto touching = [&](unsigned block) {
