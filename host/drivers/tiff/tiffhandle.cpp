@@ -21,7 +21,6 @@ namespace {
 
 // m: no memory map, a file that shrinks must not end the process; c: strips as they are stored.
 constexpr char kOpenMode[] = "rmc";
-constexpr tmsize_t kLargestAllocation = tmsize_t{1} << 30;
 
 /// Keeps the first error: the later ones are its consequences.
 int KeepFirst(TIFF*, void* errors, const char*, const char* format, va_list arguments) {
@@ -59,7 +58,7 @@ TIFF* Open(const std::string& path, std::string& errors) {
   const std::unique_ptr<TIFFOpenOptions, OptionsDeleter> options(TIFFOpenOptionsAlloc());
   TIFFOpenOptionsSetErrorHandlerExtR(options.get(), KeepFirst, &errors);
   TIFFOpenOptionsSetWarningHandlerExtR(options.get(), KeepIfPixelsAreMissing, &errors);
-  TIFFOpenOptionsSetMaxSingleMemAlloc(options.get(), kLargestAllocation);
+  TIFFOpenOptionsSetMaxSingleMemAlloc(options.get(), TiffHandle::kLargestAllocation);
   TIFF* tiff = TIFFFdOpenExt(descriptor, path.c_str(), kOpenMode, options.get());
   if (!tiff) close(descriptor);
   return tiff;

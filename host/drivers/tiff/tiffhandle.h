@@ -24,6 +24,9 @@ class OpenFailure : public Exception {
 /// Nothing is printed: what libtiff reports stays with the handle. Not for two threads at once.
 class TiffHandle {
  public:
+  /// Bytes; what a file wants more for is not read.
+  static constexpr tmsize_t kLargestAllocation = tmsize_t{1} << 30;
+
   /// Opens `path` at one of its directories.
   /// \param directoryOffset  in bytes from the file's start; 0 is the first directory
   /// \throws orin::Exception  not a TIFF file, or the directory cannot be read; an OpenFailure when

@@ -7,6 +7,7 @@
 #include <filesystem>
 #include <fstream>
 #include <map>
+#include <new>
 #include <utility>
 
 #include <fcntl.h>
@@ -80,6 +81,25 @@ unsigned AlphaChannelOf(const TiffHandle& tiff, const PixelFormat& format) {
   return 0;
 }
 
+/// \throws std::bad_alloc  it is there, but libtiff had no memory for it: it says nothing then, or
+///                         something that it also says of damage, and goes on without the text,
+///                         which may declare no-data
+std::string MetadataTextOf(const TiffHandle& tiff, const std::string& path) {
+  std::string text = tiff.TextOf(TIFFTAG_GDAL_METADATA);
+  if (!text.empty()) return text;
+  const PositionedFile file(path, PositionedFile::Mode::kRead);
+  const TiffStructure structure = ParseStructure(file);
+  const TiffEntry* entry = structure.directories.at(0).Find(TIFFTAG_GDAL_METADATA);
+  if (!entry || entry->type != TIFF_ASCII || entry->bytes == 0) return text;
+  const bool isInFile =
+      entry->position <= file.Size() && entry->bytes <= file.Size() - entry->position;
+  if (!isInFile || entry->bytes >= uint64_t{TiffHandle::kLargestAllocation}) return text;
+  char first = 0;
+  file.Read(entry->position, &first, 1);
+  if (first != '\0') throw std::bad_alloc();
+  return text;
+}
+
 /// Whether the file in which raster programs keep what a TIFF has no tag for names classes.
 bool NamesCategories(const std::string& auxiliaryFile) {
   constexpr size_t kMostBytes = 4 << 20;  // names stand before long tables
@@ -96,7 +116,7 @@ TiffSource::TiffSource(std::string file, datasources::AccessMode access) : file_
   {
     const TiffHandle tiff = TiffHandle::OpenAt(file_, 0);
     format_ = FormatOf(tiff);
-    metadata_ = ParseMetadata(tiff.TextOf(TIFFTAG_GDAL_METADATA));
+    metadata_ = ParseMetadata(MetadataTextOf(tiff, file_));
     alphaChannel_ = AlphaChannelOf(tiff, format_);
   }  // closed: who gives space back asks whether somebody has the file open
   const bool declared = std::any_of(
