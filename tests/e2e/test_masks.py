@@ -161,6 +161,25 @@ class NoDataToo(MaskCase):
                         self.assertEqual({7}, set(level[~expected].tolist()))
                         self.assertNotIn(7, level[expected])
 
+    def test_a_declared_nan_leaves_levels_their_masks(self):
+        for place, method in itertools.product(("--internal", "--external"), METHODS):
+            with self.subTest(place=place, method=method):
+                valid = disc(WIDTH, HEIGHT)
+                file = self.path(method + place + ".tif")
+                pixels = picture(valid, 1, numpy.float32)
+                pixels[0, 40:60, 100:120] = numpy.nan
+                write_tiff(file, pixels, "Float32", TILED, no_data=float("nan"))
+                write_mask(file, valid, True)
+                self.build(file, "--method", method, "--levels", "2,4", place)
+                two = level_validity(valid & ~numpy.isnan(pixels[0]), 1, 2, SIZE, method, 1)
+                four = level_validity(two, 2, 4, SIZE, method, 1)
+                levels = file + ".ovr" if place == "--external" else file
+                self.assertEqual([1, 5], directories_of(levels)[-2:])
+                for index, expected in enumerate((two, four)):
+                    self.assertTrue((expected == masks_of_levels(file)[index]).all())
+                    level = read_pixels(file, index)[0]
+                    self.assertTrue((numpy.isnan(level) == ~expected).all())
+
     def test_a_side_cars_mask_calls_valid_what_any_channel_holds(self):
         valid = numpy.ones((HEIGHT, WIDTH), bool)
         pixels = picture(valid, 2)
