@@ -180,14 +180,23 @@ void RequireRoomInside(datasources::IDataset& dataset, const std::string& file) 
   }
 }
 
-/// The same with every failure reported.
+/// Opens the file to see that it can be built, and closes it: space is given back only where nobody
+/// has the file open, this program included.
+/// \param code  receives what a failure means
+/// \throws orin::Exception  it cannot be opened, or takes no levels inside although they must go there
+void RequireFile(const BuildOptions& options, const std::string& file, ExitCode& code) {
+  code = kCannotOpen;
+  const auto dataset = OpenForBuild(file, options.placement);
+  code = kCannotBuild;
+  if (options.placement == Placement::kInternal) RequireRoomInside(*dataset, file);
+}
+
+/// The same as BuildFile with every failure reported.
 ExitCode TryFile(const BuildOptions& options, const std::string& file,
                  const Interruption& interruption, Console& console) {
-  ExitCode code = kCannotOpen;
+  ExitCode code = kCannotBuild;
   try {
-    const auto dataset = OpenForBuild(file, options.placement);
-    code = kCannotBuild;
-    if (options.placement == Placement::kInternal) RequireRoomInside(*dataset, file);
+    RequireFile(options, file, code);
     return BuildFile(options, file, interruption, console);
   } catch (const datasources::OptionException& error) {
     console.Error(AfterFileName(file, error.GetMessage()));

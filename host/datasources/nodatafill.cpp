@@ -7,6 +7,7 @@
 #include <utility>
 
 #include "basic/core/typedispatch/pixeltypes.h"
+#include "basic/gobs/mask/mask.h"
 #include "host/datasources/nodatavalue.h"
 
 namespace orin::datasources {
@@ -40,6 +41,7 @@ class NoDataFill final : public INoDataFill {
     const uint64_t line = PixelBytes(block) * block.width;
     for (uint32_t y = 0; y < block.height; ++y)
       std::memcpy(PixelAddress(*copy, 0, y), PixelAddress(block, 0, y), line);
+    if (block.validity) copy->validity = WithoutMargins(*block.validity);
     T* pixel = reinterpret_cast<T*>(copy->data);
     for (uint64_t i = uint64_t{copy->width} * copy->height; i > 0; --i, pixel += stored_.size())
       if (*pixel == arriving_) std::copy(stored_.begin(), stored_.end(), pixel);
@@ -54,6 +56,15 @@ class NoDataFill final : public INoDataFill {
   }
 
  private:
+  static std::unique_ptr<gobs::Mask> WithoutMargins(const gobs::Mask& mask) {
+    auto copy = std::make_unique<gobs::Mask>(mask.width, mask.height,
+                                             parallelio::ProcessWindow{0, 0, mask.x, mask.y});
+    for (uint32_t y = 0; y < mask.height; ++y)
+      for (uint32_t x = 0; x < mask.width; ++x)
+        if (!mask.IsValid(x, y)) copy->ClearRun(x, y, 1);
+    return copy;
+  }
+
   void Append(T real, std::vector<T>& pixel) const {
     pixel.push_back(real);
     if (components_ == 2) pixel.push_back(T{0});

@@ -2,6 +2,7 @@
 """Masks, mask files and alpha as validity: what levels are filled with, and the masks they get."""
 
 import itertools
+import os
 import shutil
 import subprocess
 import unittest
@@ -13,7 +14,7 @@ import rasterio
 from mask_case import (HEIGHT, MaskCase, SIZE, TILED, WIDTH, directories_of, picture, write_mask,
                        write_mask_beside)
 from mask_twin import METHODS, disc, level_validity, masks_of_levels
-from orin_e2e import read_pixels, run, write_tiff
+from orin_e2e import overview_sizes, read_pixels, run, write_tiff
 
 class EveryMethod(MaskCase):
     def test_the_mask_of_a_level_is_where_the_method_filled(self):
@@ -114,6 +115,19 @@ class Layouts(MaskCase):
         self.assertEqual([1, 4] + [1, 5] * 3, directories_of(file + ".ovr"))
         self.assertFalse(any(mask is None for mask in masks_of_levels(file)))
 
+    def test_a_removed_level_takes_its_mask_with_it(self):
+        file, valid = self.make("beside.tif")
+        two = level_validity(valid, 1, 2, SIZE, "nearest", 1)
+        for gone, left in (("2", [1, 4, 1, 5]), ("8", [1, 4, 1, 5]), ("2,4", [1, 4])):
+            with self.subTest(gone=gone):
+                self.build(file, "--levels", "2,4,8", "--method", "nearest", "--external")
+                self.assertTrue((two == masks_of_levels(file)[0]).all())
+                self.assertRan(run("clean", file, "--levels", gone))
+                self.assertEqual(left, directories_of(file + ".ovr"))
+                self.assertEqual(len(left) // 2, len(overview_sizes(file)))
+        self.assertRan(run("clean", file))
+        self.assertFalse(os.path.exists(file + ".ovr"))
+
     def test_a_mask_file_beside_an_image_of_another_format(self):
         valid = disc(WIDTH, HEIGHT)
         write_tiff(self.path("scene.tif"), picture(valid), "Byte")
@@ -160,6 +174,25 @@ class NoDataToo(MaskCase):
                         level = read_pixels(file, index)[0]
                         self.assertEqual({7}, set(level[~expected].tolist()))
                         self.assertNotIn(7, level[expected])
+
+    def test_a_declared_nan_leaves_levels_their_masks(self):
+        for place, method in itertools.product(("--internal", "--external"), METHODS):
+            with self.subTest(place=place, method=method):
+                valid = disc(WIDTH, HEIGHT)
+                file = self.path(method + place + ".tif")
+                pixels = picture(valid, 1, numpy.float32)
+                pixels[0, 40:60, 100:120] = numpy.nan
+                write_tiff(file, pixels, "Float32", TILED, no_data=float("nan"))
+                write_mask(file, valid, True)
+                self.build(file, "--method", method, "--levels", "2,4", place)
+                two = level_validity(valid & ~numpy.isnan(pixels[0]), 1, 2, SIZE, method, 1)
+                four = level_validity(two, 2, 4, SIZE, method, 1)
+                levels = file + ".ovr" if place == "--external" else file
+                self.assertEqual([1, 5], directories_of(levels)[-2:])
+                for index, expected in enumerate((two, four)):
+                    self.assertTrue((expected == masks_of_levels(file)[index]).all())
+                    level = read_pixels(file, index)[0]
+                    self.assertTrue((numpy.isnan(level) == ~expected).all())
 
     def test_a_side_cars_mask_calls_valid_what_any_channel_holds(self):
         valid = numpy.ones((HEIGHT, WIDTH), bool)

@@ -9,14 +9,15 @@
 namespace orin::drivers {
 namespace {
 
-/// True for the mask of a level: reduced as well, and of its size.
-bool IsMaskOf(const LevelFile& file, size_t index, const PixelFormat& level) {
+/// True for the mask of a level: of its size, and inside an image's file reduced as well. The first
+/// mask of a side-car is not.
+bool IsMaskOf(const LevelFile& file, size_t index, const PixelFormat& level, bool isInImage) {
   const TiffDirectory& directory = file.Structure().directories[index];
   const auto number = [&](uint16_t tag) {
     return NumberOf(file.File(), file.Structure(), directory, tag, 0);
   };
   const uint64_t kind = number(TIFFTAG_SUBFILETYPE);
-  return (kind & FILETYPE_MASK) != 0 && (kind & FILETYPE_REDUCEDIMAGE) != 0 &&
+  return (kind & FILETYPE_MASK) != 0 && (!isInImage || (kind & FILETYPE_REDUCEDIMAGE) != 0) &&
          number(TIFFTAG_IMAGEWIDTH) == level.width && number(TIFFTAG_IMAGELENGTH) == level.height;
 }
 
@@ -34,7 +35,7 @@ std::vector<size_t> TiffLevelStore::DirectoriesOf(const std::vector<unsigned>& l
              std::find(levels.begin(), levels.end(), other.level) == levels.end();
     });
     for (size_t i = 0; i < file_->Structure().directories.size() && isLastOfSize; ++i)
-      if (IsMaskOf(*file_, i, stored.format)) indices.push_back(i);
+      if (IsMaskOf(*file_, i, stored.format, settings_.image.isInFile)) indices.push_back(i);
   }
   std::sort(indices.begin(), indices.end());
   indices.erase(std::unique(indices.begin(), indices.end()), indices.end());
