@@ -1,6 +1,7 @@
 // SPDX-License-Identifier: MIT
 #include "host/datasources/nodatamask.h"
 
+#include <algorithm>
 #include <cmath>
 #include <memory>
 #include <optional>
@@ -55,6 +56,8 @@ class EqualsNoData final : public IMaskDecision {
     if (!possible_) return;  // a new mask is all valid
     const T* sample = reinterpret_cast<const T*>(block.data);
     const uint64_t pixels = uint64_t{block.stride} * block.bufferLines;
+    if (channels_.size() == 1 && components_ == 1 && channels_.front().counts)
+      return DecideSingle(sample, pixels, mask);
     const uint64_t size = channels_.size() * components_;
     for (uint64_t pixel = 0; pixel < pixels; ++pixel, sample += size)
       if (IsNoData(sample)) mask.begin[pixel / 8] &= static_cast<uint8_t>(~(0x80u >> (pixel % 8)));
@@ -68,6 +71,18 @@ class EqualsNoData final : public IMaskDecision {
       sample += components_;
     }
     return true;
+  }
+
+  /// One channel, eight pixels of a byte at once: without a branch for each.
+  void DecideSingle(const T* sample, uint64_t pixels, Mask& mask) const {
+    const NoDataValue<T> value = channels_.front().value;
+    for (uint64_t first = 0; first < pixels; first += 8) {
+      const uint64_t count = std::min<uint64_t>(8, pixels - first);
+      unsigned invalid = 0;
+      for (uint64_t i = 0; i < count; ++i)
+        invalid |= static_cast<unsigned>(value.Matches(sample[first + i])) << (7 - i);
+      mask.begin[first / 8] &= static_cast<uint8_t>(~invalid);
+    }
   }
 
   /// A complex sample: (value, 0), and with NaN in either part it is no number.
