@@ -183,7 +183,7 @@ void RequireRoomInside(datasources::IDataset& dataset, const std::string& file) 
 /// Opens the file to see that it can be built, and closes it: space is given back only where nobody
 /// has the file open, this program included.
 /// \param code  receives what a failure means
-/// \throws orin::Exception  it cannot be opened, or takes no levels inside although they must go there
+/// \throws orin::Exception  it cannot be opened, or takes no levels inside when they must go there
 void RequireFile(const BuildOptions& options, const std::string& file, ExitCode& code) {
   code = kCannotOpen;
   const auto dataset = OpenForBuild(file, options.placement);
