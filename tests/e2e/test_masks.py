@@ -128,6 +128,16 @@ class Layouts(MaskCase):
         self.assertRan(run("clean", file))
         self.assertFalse(os.path.exists(file + ".ovr"))
 
+    def test_a_mask_gets_the_tiles_of_its_level_when_that_gets_others(self):
+        for place in ("--internal", "--external"):
+            file, valid = self.make(place + ".tif")
+            two = level_validity(valid, 1, 2, SIZE, "nearest", 1)
+            for tile in ("256", "128", "256x112", "112x256"):  # as many tiles, of another size
+                with self.subTest(place=place, tile=tile):
+                    self.build(file, "--levels", "2", "--method", "nearest", place, "--force",
+                               "--co", "TILE=" + tile)
+                    self.assertTrue((two == masks_of_levels(file)[0]).all())
+
     def test_a_mask_file_beside_an_image_of_another_format(self):
         valid = disc(WIDTH, HEIGHT)
         write_tiff(self.path("scene.tif"), picture(valid), "Byte")

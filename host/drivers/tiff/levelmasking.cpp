@@ -8,6 +8,17 @@
 #include "host/drivers/tiff/tiffmask.h"
 
 namespace orin::drivers {
+namespace {
+
+/// False when tiles of the mask that is there cannot take the place of new ones.
+bool HasTilesOf(const StoredMask& before, const LevelBuild& mask) {
+  if (!before.pixels || before.places.size() != mask.TilesPerPlane()) return false;
+  const PixelFormat& there = before.pixels->Format();
+  const PixelFormat& wanted = mask.Coding().format;
+  return there.tileWidth == wanted.tileWidth && there.tileHeight == wanted.tileHeight;
+}
+
+}  // namespace
 
 /// A side-car is written channel by channel: a pixel of its mask is valid when it is in any of the
 /// channels of one run.
@@ -20,7 +31,7 @@ std::unique_ptr<LevelMaskWriter> TiffLevelStore::BeginMask(unsigned level,
   StoredMask before;
   if (ours && ours->mask) before = OpenStoredMask(file_->File(), file_->Structure(), *ours->mask);
   build.mask = std::make_unique<LevelBuild>(MaskCodingOf(build.Coding()), build.FirstEnd());
-  if (before.places.size() != build.mask->TilesPerPlane()) before = {};
+  if (!HasTilesOf(before, *build.mask)) before = {};
   std::vector<unsigned>& done = maskedChannels_[level];
   const bool joins =
       !done.empty() && std::none_of(channels.begin(), channels.end(), [&](unsigned c) {
