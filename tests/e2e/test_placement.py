@@ -59,9 +59,26 @@ class TheImage(Case):
     def test_asking_for_what_is_there_does_not_touch_a_file_with_levels_inside(self):
         self.assertRan(run("build", self.file))
         os.utime(self.file, ns=(1_000_000_007, 2_000_000_011))
+        self.assertRan(run("build", self.file))  # writes the new time down, once
         before = bytes_of(self.file)
         self.assertRan(run("build", self.file))
         self.assertUntouched(before)
+
+    def test_levels_in_both_places_are_told_each_for_itself(self):
+        self.assertRan(run("build", self.file, "--levels", "2,4", "--internal"))
+        self.assertRan(run("build", self.file, "--levels", "2", "--external", "--force"))
+        changed = gdal.Open(self.file, gdal.GA_Update)
+        pixel = changed.GetRasterBand(1).ReadAsArray(5, 5, 1, 1)
+        changed.GetRasterBand(1).WriteArray(pixel ^ 1, 5, 5)
+        del changed
+        answer = run("build", self.file, "--levels", "2", "--external")
+        self.assertRan(answer)
+        self.assertIn("see only the levels inside the file", answer.stderr)
+        self.assertRan(run("info", self.file), 3)  # other programs read what is stale
+        self.assertEqual([(2, "internal", "stale"), (2, "side-car", "current"),
+                          (4, "internal", "stale")],
+                         [(level["level"], level["place"], level["state"])
+                          for level in info(self.file)["levels"]])
 
     def test_levels_beside_levels_inside_are_told_once(self):
         self.assertRan(run("build", self.file, "--levels", "2"))
@@ -136,8 +153,9 @@ class TheSideCar(Case):
         self.assertSamePixels(nearest(pixels, 1, 2, (COLUMNS, ROWS)), read_pixels(self.file, 0))
 
     def test_alpha_is_alpha_in_the_levels_too(self):
-        self.check(random_pixels((4, ROWS, COLUMNS), numpy.uint8, 5), "Byte",
-                   ["PHOTOMETRIC=RGB", "ALPHA=YES"])
+        pixels = random_pixels((4, ROWS, COLUMNS), numpy.uint8, 5)
+        pixels[3] |= 1  # colours under transparent pixels would not be kept
+        self.check(pixels, "Byte", ["PHOTOMETRIC=RGB", "ALPHA=YES"])
         side_car = gdal.Open(self.file + ".ovr")
         self.assertEqual(gdal.GCI_AlphaBand, side_car.GetRasterBand(4).GetColorInterpretation())
         self.assertEqual(["side-car"] * 2, [level["place"] for level in info(self.file)["levels"]])
