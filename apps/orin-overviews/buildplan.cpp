@@ -133,12 +133,15 @@ BuildPlan PlanBuild(const BuildOptions& options, const std::string& file) {
 LevelState LookAtLevels(const BuildPlan& plan, const BuildOptions& options,
                         const std::string& file) {
   LevelState state;
-  state.descriptions = DescribeLevels(*OpenForBuild(file, options.placement));
+  const auto dataset = OpenForBuild(file, options.placement);
+  state.descriptions = DescribeLevels(*dataset);
   for (const unsigned level : plan.requested) {
     if (level < 2 || plan.IsEmpty(level)) continue;
     const bool valid = IsValid(state.descriptions, level, plan.channels);
     (valid ? state.valid : state.unfinished).push_back(level);
   }
+  if (const auto* store = RasterOf(*dataset, file).GetSource()->Levels())
+    for (auto& hidden : store->ListHidden()) state.descriptions.push_back(std::move(hidden));
   return state;
 }
 

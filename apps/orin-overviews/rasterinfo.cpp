@@ -1,7 +1,10 @@
 // SPDX-License-Identifier: MIT
 #include "apps/orin-overviews/rasterinfo.h"
 
+#include <algorithm>
+#include <iterator>
 #include <memory>
+#include <vector>
 
 #include "host/datasources/datasetmanager.h"
 #include "host/datasources/formats.h"
@@ -10,6 +13,19 @@
 #include "host/services/text.h"
 
 namespace orin::app {
+namespace {
+
+/// Adds the levels that stand in both places a second time, each in front of the one that counts.
+void AddHidden(const datasources::ILevelStore& store,
+               std::vector<datasources::LevelDescription>& levels) {
+  std::vector<datasources::LevelDescription> hidden = store.ListHidden();
+  levels.insert(levels.begin(), std::make_move_iterator(hidden.begin()),
+                std::make_move_iterator(hidden.end()));
+  std::stable_sort(levels.begin(), levels.end(),
+                   [](const auto& a, const auto& b) { return a.level < b.level; });
+}
+
+}  // namespace
 
 RasterInfo CollectInfo(const std::string& file) {
   // The generic layer lists the levels inside the file and those beside it together.
@@ -33,8 +49,10 @@ RasterInfo CollectInfo(const std::string& file) {
     info.channels.push_back(
         std::unique_ptr<datasources::IChannelInfo>(raster->GetChannelInfo(channel))->GetDataType());
   const std::unique_ptr<datasources::IOverviewInfo> levels(raster->GetOverviewInfo());
-  if (auto* store = raster->GetSource()->Levels()) store->KeepAnswers();
+  auto* store = raster->GetSource()->Levels();
+  if (store) store->KeepAnswers();
   if (levels) info.levels = levels->Describe();
+  if (store) AddHidden(*store, info.levels);
   return info;
 }
 

@@ -17,7 +17,7 @@ struct RasterInfo {
   unsigned width = 0;             ///< pixels
   unsigned height = 0;            ///< pixels
   std::vector<gobs::DataType> channels;
-  std::vector<datasources::LevelDescription> levels;  ///< ascending
+  std::vector<datasources::LevelDescription> levels;  ///< ascending, those in both places twice
 };
 
 /// \throws orin::Exception  the file cannot be opened or is no raster

@@ -33,6 +33,14 @@ class BothPlaces final : public ILevelStore {
         [](const LevelDescription& a, const LevelDescription& b) { return a.level < b.level; });
     return levels;
   }
+  std::vector<LevelDescription> ListHidden() const override {
+    std::vector<LevelDescription> hidden;
+    const std::vector<LevelDescription> levels = sideCar_->List();
+    if (internal_)
+      for (LevelDescription& entry : internal_->List())
+        if (Holds(levels, entry.level)) hidden.push_back(std::move(entry));
+    return hidden;
+  }
   void Create(unsigned level, const std::vector<unsigned>& channels,
               const std::string& method) override {
     sideCar_->Create(level, channels, method);

@@ -46,6 +46,10 @@ class ILevelStore {
   /// this call it is the level of this store whose pixels are read, or else the image.
   virtual void SetSource(const LevelDescription& /*source*/) {}
 
+  /// Levels inside the file that `List` leaves out because they stand beside it, too. Other
+  /// programs read these.
+  virtual std::vector<LevelDescription> ListHidden() const { return {}; }
+
   /// Where `List` had to read the whole image to tell what is up to date, keeps the answer with the
   /// levels, if their file may be written, so that the next one comes at once. Never fails.
   virtual void KeepAnswers() {}

@@ -88,6 +88,22 @@ class TheImage(Case):
         self.assertRan(run("build", self.file))
         self.assertUntouched(noted)
 
+    def test_levels_in_both_places_are_told_each_for_itself(self):
+        self.assertRan(run("build", self.file, "--levels", "2,4", "--internal"))
+        self.assertRan(run("build", self.file, "--levels", "2", "--external", "--force"))
+        changed = gdal.Open(self.file, gdal.GA_Update)
+        pixel = changed.GetRasterBand(1).ReadAsArray(5, 5, 1, 1)
+        changed.GetRasterBand(1).WriteArray(pixel ^ 1, 5, 5)
+        del changed
+        answer = run("build", self.file, "--levels", "2", "--external")
+        self.assertRan(answer)
+        self.assertIn("see only the levels inside the file", answer.stderr)
+        self.assertRan(run("info", self.file), 3)  # other programs read what is stale
+        self.assertEqual([(2, "internal", "stale"), (2, "side-car", "current"),
+                          (4, "internal", "stale")],
+                         [(level["level"], level["place"], level["state"])
+                          for level in info(self.file)["levels"]])
+
     def test_levels_beside_levels_inside_are_told_once(self):
         self.assertRan(run("build", self.file, "--levels", "2"))
         answer = run("build", self.file, "--levels", "4,8", "--external")
