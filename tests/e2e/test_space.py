@@ -73,6 +73,20 @@ class Rebuilt(Case):
                     self.assertEqual(4, len(overview_sizes(file)))
                     os.remove(grown)
 
+    def test_however_long_what_its_directories_hold_is(self):
+        for name, no_data in (("a", 7), ("b", 32767), ("c", -12345), ("d", -123456)):
+            with self.subTest(no_data=no_data):
+                file = self.path(name + ".tif")
+                pixels = random_pixels((1, 300, 500), numpy.int32, 5)
+                write_tiff(file, pixels, "Int32", ["TILED=YES", "BLOCKXSIZE=64", "BLOCKYSIZE=64"],
+                           no_data)
+                build = ("build", file, "--levels", "2,4", "--external", "--force")
+                self.assertRan(run(*build))
+                first = os.path.getsize(file + ".ovr")
+                for number in range(3):
+                    self.assertRan(run(*build))
+                    self.assertLessEqual(os.path.getsize(file + ".ovr"), 1.1 * first, number)
+
     def test_readers_see_the_old_levels_or_the_new_ones(self):
         file, pixels = self.picture(TILED="YES", BLOCKXSIZE=64, BLOCKYSIZE=64)
         self.assertRan(run("build", file, *self.LEVELS, "--method", "nearest"))

@@ -26,10 +26,11 @@ class Layout {
   Layout(bool isBig, ByteOrder byteOrder)
       : width_(isBig ? 8 : 4), countBytes_(isBig ? 8 : 2), byteOrder_(byteOrder) {}
 
+  /// The same whatever the order of the entries.
   uint64_t SizeOf(const std::vector<NewEntry>& entries) const {
     uint64_t size = HeadBytes(entries.size());
     for (const NewEntry& entry : entries)
-      if (entry.bytes.size() > width_) size = EvenFrom(size) + entry.bytes.size();
+      if (entry.bytes.size() > width_) size += EvenFrom(entry.bytes.size());
     return size;
   }
   /// \param position  where the directory will stand

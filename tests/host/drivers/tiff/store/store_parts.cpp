@@ -225,6 +225,22 @@ TEST_F(Parts, DirectoryIsReadByLibtiffAsItWasComposed) {
     }
 }
 
+TEST_F(Parts, DirectoryTakesTheRoomReservedForItWhateverTheOrderOfItsEntries) {
+  const auto software = drivers::TextEntry(TIFFTAG_SOFTWARE, "odd text, with its end");  // 23 bytes
+  const auto bits = drivers::NumbersEntry(TIFFTAG_BITSPERSAMPLE, TIFF_SHORT, {8, 8, 8, 8, 8});
+  const auto gap = drivers::TextEntry(TIFFTAG_ARTIST, "even, with its end...");  // 22 bytes
+  for (const bool isBig : {false, true})
+    for (const auto& entries :
+         {std::vector{bits, gap, software}, std::vector{software, gap, bits}}) {
+      PositionedFile file(folder_.File("room"), PositionedFile::Mode::kCreate);
+      Appender appender(file, isBig, {});
+      appender.AppendDirectory(entries, 0);
+      EXPECT_EQ(appender.End(), file.Size());
+      EXPECT_EQ(0u, file.Size() % 2);
+      file.Remove();
+    }
+}
+
 TEST_F(Parts, AppenderStopsAtFourGiBOfAClassicFileOnly) {
   const std::string name = folder_.File("long.tif");
   drivers::PositionedFile file(name, drivers::PositionedFile::Mode::kCreate);
