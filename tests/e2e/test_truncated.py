@@ -15,7 +15,7 @@ from tiffbytes import boundaries
 
 # Every length up to this one; behind it, wherever something starts or ends, and some more. A
 # sanitizer makes each start of the tool slow, and so gets fewer of them.
-EVERY_BYTE = 64 if limits.IS_SANITIZED else 1024
+EVERY_BYTE = 64 if limits.IS_SANITIZED else 384   # two processes for each
 SAMPLES = 60
 TILES = ["TILED=YES", "BLOCKXSIZE=16", "BLOCKYSIZE=16"]
 LAYOUTS = {   # options, channels, levels inside
