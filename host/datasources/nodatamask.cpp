@@ -2,7 +2,6 @@
 #include "host/datasources/nodatamask.h"
 
 #include <algorithm>
-#include <cmath>
 #include <memory>
 #include <optional>
 #include <string>
@@ -11,17 +10,24 @@
 
 #include "basic/core/typedispatch/pixeltypes.h"
 #include "host/datasources/nodataanswers.h"
+#include "host/datasources/nodatacompare.h"
 #include "host/datasources/nodatavalue.h"
 
 namespace {
 
 using orin::datasources::AuxiliaryData;
+using orin::datasources::ChannelValue;
+using orin::datasources::CompareChunk;
+using orin::datasources::HasHits;
+using orin::datasources::Hits;
 using orin::datasources::IRasterReader;
 using orin::datasources::kAlphaKey;
+using orin::datasources::kChunk;
 using orin::datasources::kDeclaredNoDataKey;
 using orin::datasources::kFillOnlyKey;
 using orin::datasources::kNoDataKey;
 using orin::datasources::NoDataValue;
+using orin::datasources::PackHits;
 using orin::gobs::IMaskDecision;
 using orin::gobs::Mask;
 using orin::gobs::Raster;
@@ -30,13 +36,6 @@ using orin::gobs::Raster;
 struct ChannelText {
   std::string text;      ///< empty without a value
   bool isAlpha = false;  ///< may hold anything in a pixel without data
-};
-
-/// A channel's value in its type.
-template <class T>
-struct ChannelValue {
-  NoDataValue<T> value;
-  bool counts = true;  ///< false for alpha
 };
 
 /// A pixel is no data when every channel that counts equals its value.
@@ -54,44 +53,19 @@ class EqualsNoData final : public IMaskDecision {
 
   void Decide(const Raster& block, Mask& mask) const override {
     if (!possible_) return;  // a new mask is all valid
-    const T* sample = reinterpret_cast<const T*>(block.data);
+    const T* samples = reinterpret_cast<const T*>(block.data);
     const uint64_t pixels = uint64_t{block.stride} * block.bufferLines;
-    if (channels_.size() == 1 && components_ == 1 && channels_.front().counts)
-      return DecideSingle(sample, pixels, mask);
-    const uint64_t size = channels_.size() * components_;
-    for (uint64_t pixel = 0; pixel < pixels; ++pixel, sample += size)
-      if (IsNoData(sample)) mask.begin[pixel / 8] &= static_cast<uint8_t>(~(0x80u >> (pixel % 8)));
+    for (uint64_t first = 0; first < pixels; first += kChunk) {
+      const uint64_t count = std::min(kChunk, pixels - first);
+      const Hits hits = CompareChunk(channels_, components_, samples, count);
+      samples += count * channels_.size() * components_;
+      if (!HasHits(hits)) continue;
+      for (uint64_t i = 0; i < count; i += 8)
+        mask.begin[(first + i) / 8] &= static_cast<uint8_t>(~PackHits(&hits[i]));
+    }
   }
 
  private:
-  bool IsNoData(const T* sample) const {
-    for (const auto& [value, counts] : channels_) {
-      if (counts && !(components_ == 1 ? value.Matches(*sample) : MatchesPair(value, sample)))
-        return false;
-      sample += components_;
-    }
-    return true;
-  }
-
-  /// One channel, eight pixels of a byte at once: without a branch for each.
-  void DecideSingle(const T* sample, uint64_t pixels, Mask& mask) const {
-    const NoDataValue<T> value = channels_.front().value;
-    for (uint64_t first = 0; first < pixels; first += 8) {
-      const uint64_t count = std::min<uint64_t>(8, pixels - first);
-      unsigned invalid = 0;
-      for (uint64_t i = 0; i < count; ++i)
-        invalid |= static_cast<unsigned>(value.Matches(sample[first + i])) << (7 - i);
-      mask.begin[first / 8] &= static_cast<uint8_t>(~invalid);
-    }
-  }
-
-  /// A complex sample: (value, 0), and with NaN in either part it is no number.
-  static bool MatchesPair(const NoDataValue<T>& value, const T* sample) {
-    if constexpr (std::is_floating_point_v<T>)
-      if (std::isnan(value.stored)) return std::isnan(sample[0]) || std::isnan(sample[1]);
-    return value.Matches(sample[0]) && sample[1] == T{0};
-  }
-
   uint32_t components_;
   std::vector<ChannelValue<T>> channels_;
   bool possible_ = true;  ///< false: the type cannot hold one of the values

@@ -52,8 +52,9 @@ void Mask::ClearRun(int64_t pixelX, int64_t pixelY, uint64_t count) {
 std::optional<bool> Mask::Uniform() const {
   const uint64_t pixels = BufferPixels(*this);
   const uint8_t whole = pixels == 0 || (begin[0] & 0x80u) != 0 ? 0xFF : 0;
-  for (uint64_t byte = 0; byte < pixels / 8; ++byte)
-    if (begin[byte] != whole) return std::nullopt;
+  const uint64_t bytes = pixels / 8;
+  if (bytes > 0 && (begin[0] != whole || std::memcmp(begin, begin + 1, bytes - 1) != 0))
+    return std::nullopt;
   for (uint64_t n = pixels / 8 * 8; n < pixels; ++n)
     if (((begin[n / 8] << n % 8) & 0x80) != (whole & 0x80)) return std::nullopt;
   return whole != 0;

@@ -15,10 +15,12 @@ struct AllValid {
   constexpr bool operator()(int64_t, int64_t) const { return true; }
 };
 
-/// Calls `body` with the validity test that `mask` (null: none) asks for.
+/// Calls `body` with the validity test that `mask` (null: none) asks for. Most masks of an image
+/// with a border of no data have every bit set.
 template <class Body>
 void WithValidity(const Mask* mask, Body&& body) {
-  if (mask) std::forward<Body>(body)(MaskBits{mask->begin, LayoutOf(*mask)});
+  if (mask && mask->Uniform() != true)
+    std::forward<Body>(body)(MaskBits{mask->begin, LayoutOf(*mask)});
   else std::forward<Body>(body)(AllValid{});
 }
 

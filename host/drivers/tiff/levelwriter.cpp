@@ -55,8 +55,8 @@ void LevelWriter::Begin() {
   const LevelCoding& coding = build_->Coding();
   encoder_ = std::make_unique<TileEncoder>(coding, file_);
   copy_ = CopierOf(format_.SampleBytes());
-  const bool isPartOfPixels = !format_.planar && channels_.size() < format_.samplesPerPixel;
-  storedTiles_ = isPartOfPixels ? store_.OpenStoredTiles(level_) : nullptr;
+  isPartOfPixels_ = !format_.planar && channels_.size() < format_.samplesPerPixel;
+  storedTiles_ = isPartOfPixels_ ? store_.OpenStoredTiles(level_) : nullptr;
   if (coding.mayBeSparse) sparseSample_ = SparseSample(format_.noData, format_.type);
 }
 
@@ -134,15 +134,18 @@ void LevelWriter::WriteInto(const Raster& block, const Piece& piece, uint32_t pl
   Cover(piece, format_.tileWidth, open->second);
   if (open->second.missing > 0) return;
   Finish(tile, plane, piece, open->second.samples);
+  spare_.swap(open->second.samples);
   tiles_.erase(open);
 }
 
 LevelWriter::OpenTile LevelWriter::MakeTile(uint64_t tile, const Piece& piece) {
   OpenTile open;
-  open.samples.resize(build_->Coding().TileBytes());
+  open.samples.swap(spare_);
+  open.samples.resize(build_->Coding().TileBytes());  // pieces and padding cover all of it
   open.missing = uint64_t{piece.insideWidth} * piece.insideHeight;
   if (open.missing > uint64_t{piece.width} * piece.height)
     open.isCovered.resize(uint64_t{format_.tileWidth} * format_.tileHeight);
+  if (isPartOfPixels_) std::fill(open.samples.begin(), open.samples.end(), uint8_t{0});
   if (storedTiles_) storedTiles_->ReadTile(static_cast<uint32_t>(tile), open.samples.data());
   return open;
 }

@@ -95,7 +95,9 @@ class LevelWriter final : public datasources::ReaderState<datasources::IRasterWr
       storedTiles_;  ///< where other channels come from; null when not needed
   CopySamples copy_ = nullptr;
   std::vector<uint8_t> sparseSample_;  ///< empty when every tile is stored
+  bool isPartOfPixels_ = false;        ///< other channels share the tiles
   std::map<uint64_t, OpenTile> tiles_;
+  std::vector<uint8_t> spare_;  ///< memory of a finished tile, for the next one
 };
 
 }  // namespace orin::drivers

@@ -204,14 +204,17 @@ void PixelReader::FillSparse(const Plane& plane, const Piece& piece, gobs::Raste
   const std::vector<uint8_t>& sample = decoder_.SparseSample();
   const bool oneByte =
       std::count(sample.begin(), sample.end(), sample[0]) == int64_t(sample.size());
+  const bool wholePixels = plane.channels.size() == block.channelCount;
+  const auto count = uint64_t(piece.width);
+  const uint8_t* first = nullptr;  // a row to copy
   for (int64_t y = piece.y; y < piece.y + piece.height; ++y) {
     uint8_t* to = PixelAddress(block, piece.x - block.x, y - block.y);
-    const auto count = uint64_t(piece.width);
-    if (oneByte && plane.channels.size() == block.channelCount)
-      std::memset(to, sample[0], count * PixelBytes(block));
+    if (oneByte && wholePixels) std::memset(to, sample[0], count * PixelBytes(block));
+    else if (wholePixels && first) std::memcpy(to, first, count * PixelBytes(block));
     else
       for (const uint32_t channel : plane.channels)
         copy_(sample.data(), 0, to + channel * sample.size(), block.channelCount, count);
+    if (!first) first = to;
   }
 }
 

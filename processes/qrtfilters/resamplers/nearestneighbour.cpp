@@ -37,7 +37,7 @@ void NearestNeighbour<T>::Resample(gobs::Raster* src, gobs::Mask* srcMask, gobs:
   detail::RequireSameChannels(*src, *dst);
   const uint64_t components = uint64_t{src->channelCount} * (state_.isComplex ? 2 : 1);
   const std::vector<T> noData(components, detail::Saturate<T>(state_.noDataValue));
-  if (!detail::HasSamples(*src))
+  if (!detail::HasData(*src, srcMask))
     return detail::FillBlock(*dst, gobs::ViewOf<T>(*dst, state_.isComplex ? 2 : 1), noData);
   const detail::SourceMapping mapping = detail::MappingOf(state_, *src, *dst);
   const uint64_t pixelBytes = components * sizeof(T);

@@ -3,6 +3,7 @@
 
 #include <gmock/gmock.h>
 
+#include <algorithm>
 #include <cmath>
 #include <cstring>
 #include <limits>
@@ -11,6 +12,7 @@
 
 #include "host/datasources/nodataanswers.h"
 #include "tests/testing/fakeraster.h"
+#include "tests/testing/randomvalues.h"
 
 namespace {
 
@@ -249,6 +251,37 @@ TEST(NoDataMask, OfAComplexSampleTheRealPartCountsAndTheImaginaryPartMustBeZero)
   const auto decision = DecisionOf(DataTypeOf<short>(true), "-1", {""});
   EXPECT_THAT(ValidityOf<short>(*decision, {-1, 0, -1, 5, 0, -1, 0, 0}, 1, true),
               ElementsAre(false, true, true, true));
+}
+
+/// Runs of pixels without data and of others, in samples of 7 and 8, one channel after another.
+template <class T>
+std::vector<T> RunsOfPixels(orin::testing::Random& random, unsigned pixels, unsigned perPixel) {
+  std::vector<T> values;
+  while (values.size() < size_t{pixels} * perPixel) {
+    const bool isRun = random.OneIn(2);
+    const auto length = static_cast<unsigned>(random.Between(1, 80));
+    for (unsigned i = 0; i < length * perPixel && values.size() < size_t{pixels} * perPixel; ++i)
+      values.push_back(isRun || random.OneIn(2) ? T(7) : T(8));
+  }
+  return values;
+}
+
+TYPED_TEST(NoDataMaskOfType, EveryPixelOfARowIsDecidedByItselfHoweverLongTheRow) {
+  using T = TypeParam;
+  orin::testing::Random random(7);
+  for (unsigned pixels = 1; pixels <= 200; ++pixels)
+    for (unsigned channels = 1; channels <= 4; ++channels) {
+      const auto values = RunsOfPixels<T>(random, pixels, channels);
+      std::vector<bool> expected;
+      for (unsigned x = 0; x < pixels; ++x) {
+        const auto first = values.begin() + x * channels;
+        expected.push_back(std::count(first, first + channels, T(7)) < int(channels));
+      }
+      const auto decision =
+          DecisionOf(DataTypeOf<T>(), "7", std::vector<std::string>(channels, ""));
+      ASSERT_EQ(expected, ValidityOf<T>(*decision, values, channels))
+          << pixels << " pixels of " << channels << " channels";
+    }
 }
 
 TEST(NoDataMask, MarginsAreDecidedToo) {

@@ -75,7 +75,7 @@ class AverageExactPass {
 template <template <class> class Mean, int kFactor, class T>
 void AverageExact(const gobs::Raster& src, const gobs::Mask* srcMask, const gobs::Raster& dst,
                   double noData) {
-  if (!HasSamples(src)) {
+  if (!HasData(src, srcMask)) {
     std::vector<T> pixel(Mean<T>::kComponents);
     pixel[0] = Saturate<T>(noData);
     return FillBlock(dst, gobs::ViewOf<T>(dst, Mean<T>::kComponents), pixel);

@@ -110,7 +110,7 @@ template <template <class> class Mean, class T>
 void AverageFootprints(const SourceMapping& mapping, const gobs::Raster& src,
                        const gobs::Mask* srcMask, const gobs::Raster& dst, double noData) {
   constexpr uint32_t kComponents = Mean<T>::kComponents;
-  if (!HasSamples(src))
+  if (!HasData(src, srcMask))
     return FillBlock(dst, gobs::ViewOf<T>(dst, kComponents),
                      NoDataPixel<T>(dst.channelCount, kComponents, noData));
   const AverageFootprintsPass<Mean, T> pass(mapping, src, dst, noData);

@@ -137,7 +137,7 @@ class NeighbourhoodPass {
 template <class Method, class T>
 void ResampleNeighbourhoods(const ResamplerState& state, const gobs::Raster& src,
                             const gobs::Mask* srcMask, const gobs::Raster& dst) {
-  if (!HasSamples(src))
+  if (!HasData(src, srcMask))
     return FillBlock(dst, gobs::ViewOf<T>(dst, 1),
                      std::vector<T>(dst.channelCount, Saturate<T>(state.noDataValue)));
   const NeighbourhoodPass<Method, T> pass(state, src, dst);
