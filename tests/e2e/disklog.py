@@ -4,13 +4,11 @@ single system calls fail."""
 
 import os
 import re
-import tempfile
 
 import orin_e2e
 
 SHIM = os.environ["ORIN_DISK_SHIM"]
-if os.access("/dev/shm", os.W_OK):
-    tempfile.tempdir = "/dev/shm"  # hundreds of runs sync what they write: not to a disk
+orin_e2e.keep_files_in_memory()
 
 
 class Change:

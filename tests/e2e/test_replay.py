@@ -76,7 +76,8 @@ class Replayed(Case):
             self.assertEqual(sorted(os.listdir(self.recorded)), sorted(os.listdir(self.replayed)))
 
     def check_all(self, arguments):
-        """Every prefix of the run, and every loss of one write that no sync followed."""
+        """Every prefix of the run, and every loss of one write that no sync followed. \\returns the
+        changes that the run made"""
         changes = self.record(*arguments)
         recorded = os.path.join(self.recorded, "image.tif")
         expected = self.levels(recorded)
@@ -86,6 +87,7 @@ class Replayed(Case):
         for lost, stop in self.losses(changes):
             self.check(changes[:lost] + changes[lost + 1:stop], arguments, expected,
                        f"call {lost} lost, stopped before {stop}")
+        return changes
 
     @staticmethod
     def losses(changes):
@@ -152,6 +154,25 @@ class Rebuild(Replayed):
     def test_in_a_side_car(self):
         self.check_image(KINDS["classic"], 0, "--external")
 
+    def check_growth(self, *more):
+        """The new level fits nowhere: it goes to the file's end and comes down again."""
+        self.pixels[:, ::2, ::2] = 7  # all that nearest neighbour takes
+        image = os.path.join(self.original, "image.tif")
+        write_tiff(image, self.pixels, "Byte", ["COMPRESS=DEFLATE"])
+        self.assertRan(run("build", image, "--levels", "2", "--method", "nearest", *more))
+        arguments = ("build", "--levels", "2", "--method", "average", "--force", *more)
+        changes = self.check_all(arguments)
+        shortened = [change for change in changes if change.name == "ftruncate"]
+        self.assertTrue(shortened)
+        top = max(change.numbers[0] for change in changes if change.name == "pwrite")
+        self.assertGreater(top, shortened[-1].numbers[0], "nothing was moved")
+
+    def test_by_a_longer_level_inside_the_file(self):
+        self.check_growth()
+
+    def test_by_a_longer_level_in_a_side_car(self):
+        self.check_growth("--external")
+
 
 class Clean(Replayed):
     def check_image(self, *place):
@@ -176,6 +197,35 @@ class Clean(Replayed):
 
     def test_of_a_side_car(self):
         self.check_image("--external")
+
+    def check_some(self, *place):
+        """Level 4 stays and moves to where level 2 was."""
+        image = os.path.join(self.original, "image.tif")
+        write_tiff(image, self.pixels, "Byte", KINDS["classic"])
+        self.assertRan(run("build", image, "--levels", LEVELS, *place))
+        made = self.levels(image)
+        changes = self.record("clean", "--levels", "2")
+        stopped = [(changes[:count], count) for count in range(len(changes) + 1)]
+        stopped += [(changes[:lost] + changes[lost + 1:stop], (lost, stop))
+                    for lost, stop in self.losses(changes)]
+        for done, what in stopped:
+            with self.subTest(what):
+                image = self.replay(done)
+                self.assertSamePixels(self.pixels, read_pixels(image))
+                there = self.levels(image)
+                self.assertIn(4, there)
+                for level, pixels in there.items():
+                    self.assertSamePixels(made[level], pixels)
+                self.assertRan(run("clean", image, "--levels", "2"))
+                self.assertEqual([4], list(self.levels(image)))
+                self.assertSamePixels(made[4], self.levels(image)[4])
+                self.assertEqual([4], self.valid(image))
+
+    def test_of_some_levels_inside_the_file(self):
+        self.check_some()
+
+    def test_of_some_levels_of_a_side_car(self):
+        self.check_some("--external")
 
 
 if __name__ == "__main__":
