@@ -3,7 +3,6 @@
 single system calls fail."""
 
 import os
-import re
 
 import orin_e2e
 
@@ -43,12 +42,12 @@ class Change:
             raise ValueError(self.name)
 
 
-def run(folder, *arguments, log=None, fault=None, count=None):
+def run(folder, *arguments, log=None, fault=None, calls=None):
     """Runs the tool with the files of `folder` watched. Paths are prefixes as they are given to it.
 
     fault: "CALL NUMBER REASON", see the shim."""
     extra = {"LD_PRELOAD": SHIM, "DISK_FOLDER": folder + os.sep, "OMP_NUM_THREADS": "1"}
-    for name, value in (("DISK_LOG", log), ("DISK_FAULT", fault), ("DISK_COUNT", count)):
+    for name, value in (("DISK_LOG", log), ("DISK_FAULT", fault), ("DISK_CALLS", calls)):
         if value:
             extra[name] = str(value)
     return orin_e2e.run(*arguments, environment=extra)
@@ -63,7 +62,8 @@ def changes_in(log):
     return changes
 
 
-def counts_in(path):
-    """{"pwrite": 17, ...}: how often each call was made."""
+def calls_in(path):
+    """[("pwrite", 17, "7f3a"), ...]: every call, its number from 1 among those of its name, and
+    what tells from where in the program it was made."""
     with open(path, encoding="utf-8") as file:
-        return {name: int(number) for name, number in re.findall(r"(\w+) (\d+)", file.read())}
+        return [(name, int(number), place) for name, number, place in map(str.split, file)]
