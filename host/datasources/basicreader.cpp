@@ -29,8 +29,8 @@ std::unique_ptr<IRasterReader> Open(IRasterDataset& raster, const std::vector<un
     if (channel < 1 || channel > raster.GetChannelCount())
       Refuse(FormatString(_("%s: there is no channel %u; the file has %u."),
                           raster.GetFileName().c_str(), channel, raster.GetChannelCount()));
-  return WithMemory(raster.GetFileName(), kFunction,
-                    [&] { return raster.GetSource()->OpenReader(channels); });
+  return ReadWithMemory(raster.GetFileName(), kFunction,
+                        [&] { return raster.GetSource()->OpenReader(channels); });
 }
 
 }  // namespace

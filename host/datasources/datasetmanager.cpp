@@ -79,8 +79,8 @@ IDataset* DatasetManager::Open(const std::string& file, AccessMode mode) {
     Refuse(FormatString(_("%s: is not opened for writing: levels are to stand beside it."),
                         file.c_str()),
            kFunction);
-  return WithMemory(file, kFunction,
-                    [&] { return OpenThrough(kFormatUnknown, file, mode, kFunction); });
+  return ReadWithMemory(file, kFunction,
+                        [&] { return OpenThrough(kFormatUnknown, file, mode, kFunction); });
 }
 
 IDataset* DatasetManager::OpenFormat(const std::string& format, const std::string& file,
@@ -89,8 +89,8 @@ IDataset* DatasetManager::OpenFormat(const std::string& format, const std::strin
   constexpr char kFunction[] =
       "orin::datasources::DatasetManager::OpenFormat(const std::string&, "
       "const std::string&, orin::datasources::AccessMode)";
-  return WithMemory(file, kFunction,
-                    [&] { return OpenThrough(CodeOfName(format), file, mode, kFunction); });
+  return ReadWithMemory(file, kFunction,
+                        [&] { return OpenThrough(CodeOfName(format), file, mode, kFunction); });
 }
 
 }  // namespace orin::datasources

@@ -1,35 +1,44 @@
-/// Reading that runs out of memory refuses the file by its name.
+/// Work that runs out of memory refuses its file by name.
 // SPDX-License-Identifier: MIT
 #pragma once
 
 #include <new>
 #include <stdexcept>
 #include <string>
+#include <utility>
 
 #include "host/services/exception.h"
 #include "host/services/text.h"
 
 namespace orin::datasources {
 
-/// Calls `read` and returns what it returns.
+/// Calls `work` and returns what it returns.
+/// \param format    of the text, which takes the file's name
 /// \param function  signature of the caller, for the exception
-/// \throws orin::Exception  "FILE: cannot be read: ..." when there is not enough memory; what else
-///                          `read` throws passes through
-template <class Read>
-auto WithMemory(const std::string& file, const char* function, Read&& read) {
+/// \throws orin::Exception  the text, when there is not enough memory; what else `work` throws
+///                          passes through
+template <class Work>
+auto WithMemory(const std::string& file, const char* format, const char* function, Work&& work) {
   const auto refuse = [&] {
-    return Exception(FormatString(_("%s: cannot be read: there is not enough memory. Free memory, "
-                                    "then run again."),
-                                  file.c_str()),
-                     "host/datasources/withmemory", function, 0);
+    return Exception(FormatString(format, file.c_str()), "host/datasources/withmemory", function,
+                     0);
   };
   try {
-    return read();
+    return work();
   } catch (const std::bad_alloc&) {
     throw refuse();
   } catch (const std::length_error&) {  // a size that no memory has
     throw refuse();
   }
+}
+
+/// The same for what reads the file, with the text "FILE: cannot be read: ...".
+template <class Read>
+auto ReadWithMemory(const std::string& file, const char* function, Read&& read) {
+  return WithMemory(file,
+                    _("%s: cannot be read: there is not enough memory. Free memory, "
+                      "then run again."),
+                    function, std::forward<Read>(read));
 }
 
 }  // namespace orin::datasources

@@ -5,12 +5,14 @@
  *              the bytes of a write follow their line, and a newline
  * DISK_FAULT   "CALL NUMBER REASON": the call of that number, from 1, fails; REASON is a number of
  *              errno, or "short", which writes half of the bytes asked for
- * DISK_COUNT   a file to which the number of calls of each kind is written at the end
+ * DISK_CALLS   a file to which every call is appended: lines "CALL NUMBER PLACE"; calls that the same
+ *              functions of the program led to have the same place
  */
 /* SPDX-License-Identifier: MIT */
 #define _GNU_SOURCE
 #include <dlfcn.h>
 #include <errno.h>
+#include <execinfo.h>
 #include <fcntl.h>
 #include <pthread.h>
 #include <stdarg.h>
@@ -23,6 +25,7 @@
 
 #define NEXT(name) ((__typeof__(&name))dlsym(RTLD_NEXT, #name))
 #define MOST_FILES 1024
+#define MOST_FRAMES 7
 
 enum Call { kOpen, kPwrite, kFsync, kFtruncate, kRename, kUnlink, kFlock, kFutimens, kClose, kPread, kCalls };
 static const char *const kNames[kCalls] = {"open",   "pwrite", "fsync",    "ftruncate", "rename",
@@ -42,12 +45,26 @@ static const char *PathOf(int descriptor) {
   return descriptor >= 0 && descriptor < MOST_FILES ? paths[descriptor] : NULL;
 }
 
+static void NoteCall(enum Call call) {
+  static FILE *file;
+  const char *name = getenv("DISK_CALLS");
+  void *frames[MOST_FRAMES];
+  unsigned long place = 5381;
+  if (!name) return;
+  if (!file) file = fopen(name, "a");
+  if (!file) abort();
+  for (int i = backtrace(frames, MOST_FRAMES); i > 0; --i)
+    place = place * 33 + (unsigned long)frames[i - 1];
+  fprintf(file, "%s %lu %lx\n", kNames[call], counts[call], place);
+}
+
 /* -1: goes on; otherwise the reason, 0 for a short write. */
 static int FaultOf(enum Call call) {
   const char *fault = getenv("DISK_FAULT");
   char name[16], reason[16];
   unsigned long number;
   ++counts[call];
+  NoteCall(call);
   if (!fault || sscanf(fault, "%15s %lu %15s", name, &number, reason) != 3) return -1;
   if (strcmp(name, kNames[call]) != 0 || counts[call] != number) return -1;
   return strcmp(reason, "short") == 0 ? 0 : atoi(reason);
@@ -77,14 +94,6 @@ static void Log(const void *bytes, size_t count, const char *format, ...) {
   if (!bytes) return;
   WriteAll(bytes, count);
   WriteAll("\n", 1);
-}
-
-__attribute__((destructor)) static void Report(void) {
-  const char *name = getenv("DISK_COUNT");
-  FILE *file = name ? fopen(name, "w") : NULL;
-  if (!file) return;
-  for (int call = 0; call < kCalls; ++call) fprintf(file, "%s %lu\n", kNames[call], counts[call]);
-  fclose(file);
 }
 
 /* The guarded part of a call on a file of ours: `act` is what the call does. */

@@ -2,8 +2,11 @@
 """What is on disk between any two system calls of the tool, and after a power loss that swallowed
 a write which was not synced: the image is what it was, no level lies, the same command finishes."""
 
+import contextlib
+import functools
 import os
 import shutil
+import tempfile
 import unittest
 
 import numpy
@@ -26,7 +29,6 @@ class Replayed(Case):
         self.pixels = random_pixels((2, SIZE[1], SIZE[0]), numpy.uint8, 8)
         self.original = os.path.join(self.folder, "original")
         self.recorded = os.path.join(self.folder, "recorded")
-        self.replayed = os.path.join(self.folder, "replayed")
         os.mkdir(self.original)
 
     def record(self, *arguments):
@@ -38,16 +40,18 @@ class Replayed(Case):
                                    log=log))
         return disklog.changes_in(log)
 
+    @contextlib.contextmanager
     def replay(self, changes):
         """A fresh copy of the original folder with these changes made; the image in it."""
-        shutil.rmtree(self.replayed, ignore_errors=True)
-        shutil.copytree(self.original, self.replayed)
+        folder = tempfile.mkdtemp(dir=self.folder)
+        shutil.copytree(self.original, folder, dirs_exist_ok=True)
         names = {}  # a file goes on under the name that it was given
         for change in changes:
-            change.apply(lambda path: names.get(path, path).replace(self.recorded, self.replayed))
+            change.apply(lambda path: names.get(path, path).replace(self.recorded, folder))
             if change.name == "rename":
                 names[change.paths[0]] = change.paths[1]
-        return os.path.join(self.replayed, "image.tif")
+        yield os.path.join(folder, "image.tif")
+        shutil.rmtree(folder)
 
     def levels(self, image):
         """{factor: pixels} as GDAL reads them."""
@@ -58,10 +62,9 @@ class Replayed(Case):
         return [entry["level"] for entry in info(image)["levels"]
                 if all(channel["valid"] for channel in entry["channels"])]
 
-    def check(self, changes, arguments, expected, what):
-        """expected: {factor: pixels} of an undisturbed run; `what` says where it was stopped."""
-        with self.subTest(what):
-            image = self.replay(changes)
+    def check(self, changes, arguments, expected):
+        """expected: {factor: pixels} of an undisturbed run"""
+        with self.replay(changes) as image:
             self.assertSamePixels(self.pixels, read_pixels(image))
             there = self.levels(image)
             for level in self.valid(image):
@@ -73,19 +76,31 @@ class Replayed(Case):
             for level, pixels in expected.items():
                 self.assertSamePixels(pixels, finished[level])
             self.assertEqual(sorted(expected), self.valid(image))
-            self.assertEqual(sorted(os.listdir(self.recorded)), sorted(os.listdir(self.replayed)))
+            self.assertEqual(sorted(os.listdir(self.recorded)),
+                             sorted(os.listdir(os.path.dirname(image))))
 
     def check_all(self, arguments):
-        """Every prefix of the run, and every loss of one write that no sync followed."""
+        """Every prefix of the run, and every loss of one write that no sync followed.
+
+        \\returns the changes that the run made"""
         changes = self.record(*arguments)
-        recorded = os.path.join(self.recorded, "image.tif")
-        expected = self.levels(recorded)
+        expected = self.levels(os.path.join(self.recorded, "image.tif"))
         self.assertGreater(len(changes), 3)
-        for count in range(len(changes) + 1):
-            self.check(changes[:count], arguments, expected, f"after {count} calls")
-        for lost, stop in self.losses(changes):
-            self.check(changes[:lost] + changes[lost + 1:stop], arguments, expected,
-                       f"call {lost} lost, stopped before {stop}")
+        self.check_each(self.states(changes), arguments, expected)
+        return changes
+
+    def check_each(self, states, *arguments):
+        disklog.check_at_once(self, {
+            what: functools.partial(self.check, done, *arguments) for what, done in states.items()})
+
+    @classmethod
+    def states(cls, changes):
+        """What is on disk where the run was stopped: the changes, by where."""
+        states = {f"after {count} calls": changes[:count] for count in range(len(changes) + 1)}
+        for lost, stop in cls.losses(changes):
+            states[f"call {lost} lost, stopped before {stop}"] = (
+                changes[:lost] + changes[lost + 1:stop])
+        return states
 
     @staticmethod
     def losses(changes):
@@ -152,30 +167,63 @@ class Rebuild(Replayed):
     def test_in_a_side_car(self):
         self.check_image(KINDS["classic"], 0, "--external")
 
+    def check_growth(self, *more):
+        """The new level fits nowhere: it goes to the file's end and comes down again."""
+        self.pixels[:, ::2, ::2] = 7  # all that nearest neighbour takes
+        image = os.path.join(self.original, "image.tif")
+        write_tiff(image, self.pixels, "Byte", ["COMPRESS=DEFLATE"])
+        self.assertRan(run("build", image, "--levels", "2", "--method", "nearest", *more))
+        arguments = ("build", "--levels", "2", "--method", "average", "--force", *more)
+        changes = self.check_all(arguments)
+        shortened = [change for change in changes if change.name == "ftruncate"]
+        self.assertTrue(shortened)
+        top = max(change.numbers[0] for change in changes if change.name == "pwrite")
+        self.assertGreater(top, shortened[-1].numbers[0], "nothing was moved")
+
+    def test_by_a_longer_level_inside_the_file(self):
+        self.check_growth()
+
+    def test_by_a_longer_level_in_a_side_car(self):
+        self.check_growth("--external")
+
 
 class Clean(Replayed):
-    def check_image(self, *place):
+    def check_removal(self, levels, *place):
+        """Of the levels these are left."""
         image = os.path.join(self.original, "image.tif")
         write_tiff(image, self.pixels, "Byte", KINDS["classic"])
         self.assertRan(run("build", image, "--levels", LEVELS, *place))
         made = self.levels(image)
-        changes = self.record("clean")
-        for count in range(len(changes) + 1):
-            with self.subTest(count=count):
-                image = self.replay(changes[:count])
-                self.assertSamePixels(self.pixels, read_pixels(image))
-                for level in self.valid(image):
-                    self.assertSamePixels(made[level], self.levels(image)[level])
-                self.assertRan(run("clean", image))
-                self.assertEqual({}, self.levels(image))
-                self.assertEqual(["image.tif"], os.listdir(self.replayed))
-                self.assertSamePixels(self.pixels, read_pixels(image))
+        arguments = ("clean", "--levels", ",".join(str(l) for l in made if l not in levels))
+        self.check_each(self.states(self.record(*arguments)), arguments, made, levels)
+
+    def check(self, changes, arguments, made, left):
+        with self.replay(changes) as image:
+            self.assertSamePixels(self.pixels, read_pixels(image))
+            there = self.levels(image)
+            for level in {*left, *self.valid(image)}:
+                self.assertSamePixels(made[level], there[level])
+            self.assertRan(run(arguments[0], image, *arguments[1:]))
+            self.assertEqual(left, self.valid(image))
+            finished = self.levels(image)
+            self.assertEqual(left, list(finished))
+            for level, pixels in finished.items():
+                self.assertSamePixels(made[level], pixels)
+            self.assertEqual(sorted(os.listdir(self.recorded)),
+                             sorted(os.listdir(os.path.dirname(image))))
+            self.assertSamePixels(self.pixels, read_pixels(image))
 
     def test_inside_the_file(self):
-        self.check_image()
+        self.check_removal([])
 
     def test_of_a_side_car(self):
-        self.check_image("--external")
+        self.check_removal([], "--external")
+
+    def test_of_some_levels_inside_the_file(self):
+        self.check_removal([4])
+
+    def test_of_some_levels_of_a_side_car(self):
+        self.check_removal([4], "--external")
 
 
 if __name__ == "__main__":

@@ -4,14 +4,20 @@
 import ast
 import fcntl
 import os
+import shutil
 import subprocess
 import sys
 import unittest
+import zlib
 
 import numpy
+from osgeo import gdal
 
-from orin_e2e import (Case, info, nearest, overview_sizes, random_pixels, read_pixels, run,
-                      write_tiff)
+from mask_case import write_mask
+from orin_e2e import (Case, info, keep_files_in_memory, nearest, overview_sizes, random_pixels,
+                      read_pixels, run, write_tiff)
+
+keep_files_in_memory()
 
 # A program that keeps a file open and opens it anew as well, and reads all levels again and again
 # until a line comes in; then tells the checksums that it met, and how often.
@@ -42,6 +48,36 @@ while not select.select([sys.stdin], [], [], 0)[0]:
     del fresh
 print(repr(seen), flush=True)
 """
+
+
+def smooth_pixels(shape):
+    """Waves with noise in one half: how well they compress depends on the method."""
+    channels, rows, columns = numpy.indices(shape)
+    waves = 100 + 60 * numpy.sin(columns / 9 + channels) + 60 * numpy.cos(rows / 7)
+    noise = numpy.random.default_rng(4).integers(-30, 31, shape) * (columns > shape[2] // 2)
+    return numpy.clip(waves + noise, 1, 255).astype(numpy.uint8)
+
+
+def write_masked(file, pixels):
+    """A file with a mask inside, which hides a quarter."""
+    write_tiff(file, pixels, "Byte", ["COMPRESS=DEFLATE"])
+    valid = numpy.ones(pixels.shape[1:], bool)
+    valid[:valid.shape[0] // 2, :valid.shape[1] // 2] = False
+    write_mask(file, valid, inside=True)
+
+
+def content_of(file):
+    """{width: checksums of pixels and masks} of the levels that GDAL lists; 0 is the image."""
+    dataset = gdal.Open(file)
+    content = {}
+    for index in range(dataset.GetRasterBand(1).GetOverviewCount() + 1):
+        bands = [dataset.GetRasterBand(number + 1) for number in range(dataset.RasterCount)]
+        if index > 0:
+            bands = [band.GetOverview(index - 1) for band in bands]
+        masks = [band.GetMaskBand() for band in bands]
+        content[bands[0].XSize if index > 0 else 0] = [
+            zlib.crc32(band.ReadRaster()) for band in bands + masks]
+    return content
 
 
 class Rebuilt(Case):
@@ -87,6 +123,90 @@ class Rebuilt(Case):
                     self.assertRan(run(*build))
                     self.assertLessEqual(os.path.getsize(file + ".ovr"), 1.1 * first, number)
 
+    def rebuild_in_turn(self, file, place, ways, times=10):
+        """Rebuilds by the ways in turn. Each time the file is as long as a fresh one that is built
+        that way, and reads the same."""
+        fresh = {}
+        for way in ways:
+            copy = self.path("fresh.tif")
+            shutil.copy(file, copy)
+            self.assertRan(run("build", copy, place, *way))
+            made = copy + (".ovr" if place == "--external" else "")
+            fresh[way] = os.path.getsize(made), content_of(copy)
+            os.remove(copy)
+            if made != copy:
+                os.remove(made)
+        grown = file + (".ovr" if place == "--external" else "")
+        for number in range(times + 1):
+            way = ways[number % len(ways)]
+            self.assertRan(run("build", file, place, "--force", *way))
+            size, content = fresh[way]
+            self.assertLessEqual(os.path.getsize(grown), 1.1 * size, (number, way))
+            self.assertEqual(content, content_of(file), (number, way))
+        if grown != file:
+            os.remove(grown)
+
+    METHODS = tuple(("--levels", "2,4,8,16", "--method", method)
+                    for method in ("average", "nearest", "mode", "bicubic"))
+
+    def test_by_other_methods_in_turn_takes_the_room_of_a_fresh_build(self):
+        for number, options in enumerate((
+                {"COMPRESS": "DEFLATE", "TILED": "YES", "BLOCKXSIZE": 64, "BLOCKYSIZE": 64},
+                {"COMPRESS": "LZW", "BIGTIFF": "YES", "ENDIANNESS": "BIG", "INTERLEAVE": "BAND"},
+                {"COMPRESS": "JPEG", "PHOTOMETRIC": "YCBCR", "TILED": "YES"})):
+            for place in ("--internal", "--external"):
+                with self.subTest(options=options, place=place):
+                    file = self.path(f"{number}{place}.tif")
+                    write_tiff(file, smooth_pixels((3, 210, 260)), "Byte",
+                               [f"{key}={value}" for key, value in options.items()])
+                    self.rebuild_in_turn(file, place, self.METHODS)
+
+    def test_of_a_level_that_is_one_tile_takes_the_room_of_a_fresh_build(self):
+        for place in ("--internal", "--external"):
+            for levels in ("2", "2,4,8,16,32"):
+                with self.subTest(place=place, levels=levels):
+                    file = self.path("small.tif")
+                    write_tiff(file, smooth_pixels((1, 90, 110)), "Byte", ["COMPRESS=DEFLATE"])
+                    self.rebuild_in_turn(file, place, tuple(
+                        ("--levels", levels, "--method", method)
+                        for method in ("bicubic", "nearest", "average", "mode")))
+
+    def test_in_another_form_takes_the_room_of_a_fresh_build(self):
+        for place in ("--internal", "--external"):
+            with self.subTest(place=place):
+                file = self.path("forms.tif")
+                write_tiff(file, smooth_pixels((2, 180, 300)), "Byte",
+                           ["TILED=YES", "BLOCKXSIZE=64", "BLOCKYSIZE=64"])
+                self.rebuild_in_turn(file, place, tuple(
+                    ("--levels", "2,4,8", "--co", f"COMPRESS={codec}")
+                    for codec in ("DEFLATE", "NONE", "LZW")), times=6)
+
+    def test_with_masks_takes_the_room_of_a_fresh_build(self):
+        for place in ("--internal", "--external"):
+            with self.subTest(place=place):
+                file = self.path("masked.tif")
+                write_masked(file, smooth_pixels((1, 300, 320)))
+                self.rebuild_in_turn(file, place, self.METHODS, times=6)
+
+    def test_of_some_levels_leaves_the_others_and_no_gap(self):
+        file = self.path("some.tif")
+        write_tiff(file, smooth_pixels((2, 210, 260)), "Byte", ["COMPRESS=DEFLATE"])
+        self.assertRan(run("build", file, *self.LEVELS))
+        for number, levels in enumerate(("4", "2", "8,16", "2,16", "4", "2")):
+            others = [level for level in (2, 4, 8, 16) if str(level) not in levels.split(",")]
+            before = content_of(file)
+            self.assertRan(run("build", file, "--levels", levels, "--force", "--method",
+                               ("mode", "bicubic", "nearest")[number % 3]))
+            after = content_of(file)
+            for level in others:
+                self.assertEqual(before[260 // level], after[260 // level])
+            copy = self.path("fresh.tif")
+            self.assertRan(run("clean", shutil.copy(file, copy)))
+            for entry in info(file)["levels"]:
+                self.assertRan(run("build", copy, "--levels", entry["level"], "--method",
+                                   entry["method"].lower()))
+            self.assertLessEqual(os.path.getsize(file), 1.1 * os.path.getsize(copy), levels)
+
     def test_readers_see_the_old_levels_or_the_new_ones(self):
         file, pixels = self.picture(TILED="YES", BLOCKXSIZE=64, BLOCKYSIZE=64)
         self.assertRan(run("build", file, *self.LEVELS, "--method", "nearest"))
@@ -108,12 +228,51 @@ class Rebuilt(Case):
 
     @staticmethod
     def checksums(file):
-        import zlib
-        from osgeo import gdal
         dataset = gdal.Open(file)
         band = dataset.GetRasterBand(1)
         return [zlib.crc32(band.GetOverview(i).ReadRaster())
                 for i in range(band.GetOverviewCount())]
+
+
+class Removed(Case):
+    def check(self, file, place, kept):
+        """Of levels 2 to 16 only these are left, as if the others had never been."""
+        self.assertRan(run("build", file, "--levels", "2,4,8,16", place, "--method", "nearest"))
+        removed = ",".join(str(level) for level in (2, 4, 8, 16) if level not in kept)
+        before = content_of(file)
+        self.assertRan(run("clean", file, "--levels", removed))
+        after = content_of(file)
+        width = info(file)["width"]
+        self.assertEqual({0, *(width // level for level in kept)}, set(after))
+        for key, content in after.items():
+            self.assertEqual(before[key], content)
+        extension = ".ovr" if place == "--external" else ""
+        size = os.path.getsize(file + extension)
+        self.assertRan(run("clean", file))
+        self.assertRan(run("build", file, "--levels", ",".join(map(str, kept)), place,
+                           "--method", "nearest"))
+        self.assertLessEqual(size, 1.1 * os.path.getsize(file + extension))
+        self.assertRan(run("clean", file))
+
+    def test_levels_leave_no_gap_before_the_others(self):
+        file = self.path("image.tif")
+        for options in (["COMPRESS=DEFLATE"], ["BIGTIFF=YES", "TILED=YES", "BLOCKXSIZE=64",
+                                               "BLOCKYSIZE=64"]):
+            write_tiff(file, smooth_pixels((1, 210, 260)), "Byte", options)
+            size = os.path.getsize(file)
+            for place in ("--internal", "--external"):
+                for kept in ((4, 8, 16), (2, 8), (16,), (2,)):
+                    with self.subTest(options=options, place=place, kept=kept):
+                        self.check(file, place, kept)
+                        self.assertEqual(size, os.path.getsize(file))
+
+    def test_levels_leave_the_masks_of_the_others(self):
+        file = self.path("masked.tif")
+        write_masked(file, smooth_pixels((1, 300, 320)))
+        for place in ("--internal", "--external"):
+            for kept in ((4, 8, 16), (2, 8), (16,)):
+                with self.subTest(place=place, kept=kept):
+                    self.check(file, place, kept)
 
 
 class AtOnce(Case):

@@ -2,11 +2,11 @@
 #include "host/drivers/gdal/gdalreader.h"
 
 #include <algorithm>
-#include <cstring>
 #include <numeric>
 #include <optional>
 #include <utility>
 
+#include "host/datasources/samplecopy.h"
 #include "host/drivers/gdal/gdalbands.h"
 #include "host/drivers/gdal/gdalerrors.h"
 #include "host/drivers/gdal/wholefile.h"
@@ -14,34 +14,6 @@
 #include "host/services/text.h"
 
 namespace orin::drivers {
-namespace {
-
-/// Copies `count` samples; steps are in samples.
-using CopySamples = void (*)(const uint8_t* from, uint64_t fromStep, uint8_t* to, uint64_t toStep,
-                             uint64_t count);
-
-template <size_t kBytes>
-void Copy(const uint8_t* from, uint64_t fromStep, uint8_t* to, uint64_t toStep, uint64_t count) {
-  for (uint64_t i = 0; i < count; ++i)
-    std::memcpy(to + i * toStep * kBytes, from + i * fromStep * kBytes, kBytes);
-}
-
-CopySamples CopierOf(uint64_t sampleBytes) {
-  switch (sampleBytes) {
-    case 1:
-      return Copy<1>;
-    case 2:
-      return Copy<2>;
-    case 4:
-      return Copy<4>;
-    case 8:
-      return Copy<8>;
-    default:
-      return Copy<16>;
-  }
-}
-
-}  // namespace
 
 gobs::DataType CommonTypeOf(const GdalHandle& handle, const std::vector<unsigned>& channels) {
   const auto refuse = [&](const char* format) {
@@ -101,7 +73,7 @@ void GdalReader::CopyDecoded(const datasources::InsideWindow& window, const Targ
   std::vector<int> all(static_cast<size_t>(GDALGetRasterCount(handle_.Get())));
   std::iota(all.begin(), all.end(), 1);
   const uint64_t sample = uint64_t{BytesPerComponent(type_)} * ComponentsPerSample(type_);
-  const CopySamples copy = CopierOf(sample);
+  const datasources::CopySamples copy = datasources::CopierOf(sample);
   const auto decode = [&](unsigned firstRow, unsigned rows, uint8_t* to) {
     Fetch({0, firstRow, width_, rows}, all, {to, decoded_->RowBytes()});
   };

@@ -125,10 +125,10 @@ void Appender::BeginStretch(uint64_t bytes) {
   file_.Write(stretch.marker, ComposeMarker(stretch).data(), kMarkerBytes);
 }
 
-uint64_t Appender::Reserve(uint64_t bytes) {
+uint64_t Appender::Reserve(uint64_t bytes, Taking take) {
   const std::lock_guard lock(mutex_);
   NoticeOthers();
-  if (const auto position = space_.free.Take(bytes)) {
+  if (const auto position = (space_.free.*take)(bytes)) {
     taken_.Add({*position, *position + bytes});
     return *position;
   }
@@ -140,7 +140,7 @@ uint64_t Appender::Reserve(uint64_t bytes) {
 }
 
 uint64_t Appender::Append(const std::vector<uint8_t>& bytes) {
-  const uint64_t position = Reserve(bytes.size());
+  const uint64_t position = Reserve(bytes.size(), &ExtentSet::Take);
   file_.Write(position, bytes.data(), bytes.size());
   return position;
 }
@@ -153,22 +153,13 @@ uint64_t Appender::MarkerFor(uint64_t position) const {
   return 0;
 }
 
-std::optional<uint64_t> Appender::ReserveBelow(uint64_t bytes, uint64_t limit) {
-  const std::lock_guard lock(mutex_);
-  const auto position = space_.free.Take(bytes, limit);
-  if (position) taken_.Add({*position, *position + bytes});
-  return position;
+uint64_t Appender::SizeOfDirectory(const std::vector<NewEntry>& entries) const {
+  return kPointerBytes + Layout(isBig_, byteOrder_).SizeOf(entries);
 }
 
-std::optional<uint64_t> Appender::AppendBelow(const std::vector<uint8_t>& bytes, uint64_t limit) {
-  const auto position = ReserveBelow(bytes.size(), limit);
-  if (position) file_.Write(*position, bytes.data(), bytes.size());
-  return position;
-}
-
-std::optional<uint64_t> Appender::ReserveDirectoryBelow(const std::vector<NewEntry>& entries,
-                                                        uint64_t limit) {
-  return ReserveBelow(kPointerBytes + Layout(isBig_, byteOrder_).SizeOf(entries), limit);
+/// In the shortest gap: a longer one may hold a tile.
+uint64_t Appender::ReserveDirectory(const std::vector<NewEntry>& entries) {
+  return Reserve(SizeOfDirectory(entries), &ExtentSet::TakeFromShortest);
 }
 
 uint64_t Appender::WriteDirectory(std::vector<NewEntry> entries, uint64_t next, uint64_t reserved) {
@@ -183,8 +174,8 @@ uint64_t Appender::WriteDirectory(std::vector<NewEntry> entries, uint64_t next, 
 }
 
 uint64_t Appender::AppendDirectory(std::vector<NewEntry> entries, uint64_t next) {
-  const uint64_t size = Layout(isBig_, byteOrder_).SizeOf(entries);
-  return WriteDirectory(std::move(entries), next, Reserve(kPointerBytes + size));
+  const uint64_t reserved = ReserveDirectory(entries);
+  return WriteDirectory(std::move(entries), next, reserved);
 }
 
 /// What is appended begins at even positions: so a stretch has room for the same in any order.

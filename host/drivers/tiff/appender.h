@@ -36,17 +36,14 @@ class Appender {
   /// \param space  as it is now
   Appender(PositionedFile& file, bool isBig, ByteOrder byteOrder, OwnSpace space = {});
 
-  /// Adds `bytes`. \returns their position, which is even
+  /// Adds `bytes`, near those added before. \returns their position, which is even
   /// \throws orin::Exception  a classic file would pass 4 GiB, or the bytes cannot be written
   uint64_t Append(const std::vector<uint8_t>& bytes);
-  /// The same in free space before `limit` only. \returns none: there is no room
-  std::optional<uint64_t> AppendBelow(const std::vector<uint8_t>& bytes, uint64_t limit);
   /// Adds a directory, its entries sorted by tag; nothing points at it yet.
   /// \param next  the directory that follows it in the chain, or 0. \returns its position
   uint64_t AppendDirectory(std::vector<NewEntry> entries, uint64_t next);
-  /// Keeps free space before `limit` for a directory. \returns its place; none: there is no room
-  std::optional<uint64_t> ReserveDirectoryBelow(const std::vector<NewEntry>& entries,
-                                                uint64_t limit);
+  /// Keeps room for a directory. \returns its place
+  uint64_t ReserveDirectory(const std::vector<NewEntry>& entries);
   /// Writes the directory into the place kept for it. \returns its position
   uint64_t WriteDirectory(std::vector<NewEntry> entries, uint64_t next, uint64_t reserved);
   /// Records whose space it is that was added so far. Before the sync that precedes a `Link`.
@@ -54,6 +51,8 @@ class Appender {
   /// Makes the link at `linkPosition` point at `target`, in one write.
   void Link(uint64_t linkPosition, uint64_t target);
 
+  /// Bytes that a directory takes with its values and all that goes in front of it.
+  uint64_t SizeOfDirectory(const std::vector<NewEntry>& entries) const;
   /// Where the file ends.
   uint64_t End() const;
   /// Something in the file refers to what was added so far: it is never given up.
@@ -63,8 +62,9 @@ class Appender {
   void CutBackTo(uint64_t end);
 
  private:
-  uint64_t Reserve(uint64_t bytes);
-  std::optional<uint64_t> ReserveBelow(uint64_t bytes, uint64_t limit);
+  using Taking = std::optional<uint64_t> (ExtentSet::*)(uint64_t bytes);
+
+  uint64_t Reserve(uint64_t bytes, Taking take);
   void NoticeOthers();
   void EndStretch();
   void PadStretch();

@@ -46,24 +46,33 @@ uint64_t ExtentSet::Size() const {
   return bytes;
 }
 
-std::optional<uint64_t> ExtentSet::TakeFrom(Iterator at, uint64_t bytes, uint64_t limit) {
+std::optional<uint64_t> ExtentSet::TakeFrom(Iterator at, uint64_t bytes) {
   const uint64_t position = at->first + at->first % 2;
-  const uint64_t end = std::min(at->second, limit);
-  if (position >= end || bytes > end - position) return std::nullopt;
+  if (position >= at->second || bytes > at->second - position) return std::nullopt;
   Remove({position, position + bytes});
-  next_ = position + bytes;
   return position;
 }
 
-std::optional<uint64_t> ExtentSet::Take(uint64_t bytes, uint64_t limit) {
+std::optional<uint64_t> ExtentSet::Take(uint64_t bytes) {
   if (bytes == 0 || bytes >= tooLarge_) return std::nullopt;
   const auto first = extents_.lower_bound(next_);
-  for (auto at = first; at != extents_.end() && at->first < limit; ++at)
-    if (const auto position = TakeFrom(at, bytes, limit)) return position;
-  for (auto at = extents_.begin(); at != first && at->first < limit; ++at)
-    if (const auto position = TakeFrom(at, bytes, limit)) return position;
-  if (limit == UINT64_MAX) tooLarge_ = bytes;
-  return std::nullopt;
+  std::optional<uint64_t> position;
+  for (auto at = first; at != extents_.end() && !position;) position = TakeFrom(at++, bytes);
+  for (auto at = extents_.begin(); at != first && !position;) position = TakeFrom(at++, bytes);
+  if (position) next_ = *position + bytes;
+  else tooLarge_ = bytes;
+  return position;
+}
+
+std::optional<uint64_t> ExtentSet::TakeFromShortest(uint64_t bytes) {
+  if (bytes == 0 || bytes >= tooLarge_) return std::nullopt;
+  Iterator shortest = extents_.end();
+  const auto room = [](Iterator at) { return at->second - at->first - at->first % 2; };
+  for (auto at = extents_.begin(); at != extents_.end(); ++at)
+    if (room(at) >= bytes && (shortest == extents_.end() || room(at) < room(shortest)))
+      shortest = at;
+  if (shortest == extents_.end()) return std::nullopt;
+  return TakeFrom(shortest, bytes);
 }
 
 }  // namespace orin::drivers

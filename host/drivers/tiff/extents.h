@@ -28,15 +28,17 @@ class ExtentSet {
   /// The position behind the last byte; 0 for an empty set.
   uint64_t End() const { return extents_.empty() ? 0 : extents_.rbegin()->second; }
   /// \pre not IsEmpty()
+  Extent First() const { return {extents_.begin()->first, extents_.begin()->second}; }
+  /// \pre not IsEmpty()
   Extent Last() const { return {extents_.rbegin()->first, extents_.rbegin()->second}; }
   /// Bytes.
   uint64_t Size() const;
 
   /// Removes `bytes` bytes from the set, which lie together and start at an even position: as near
-  /// behind those taken before as there is room.
-  /// \param limit  they end there or before
-  /// \returns their position; none: there is no room
-  std::optional<uint64_t> Take(uint64_t bytes, uint64_t limit = UINT64_MAX);
+  /// behind those taken before as there is room. \returns their position; none: there is no room
+  std::optional<uint64_t> Take(uint64_t bytes);
+  /// The same from the shortest extent that has room, the first one of these.
+  std::optional<uint64_t> TakeFromShortest(uint64_t bytes);
 
   /// Ascending, from start to end.
   std::map<uint64_t, uint64_t>::const_iterator begin() const { return extents_.begin(); }
@@ -45,7 +47,7 @@ class ExtentSet {
  private:
   using Iterator = std::map<uint64_t, uint64_t>::iterator;
 
-  std::optional<uint64_t> TakeFrom(Iterator at, uint64_t bytes, uint64_t limit);
+  std::optional<uint64_t> TakeFrom(Iterator at, uint64_t bytes);
 
   std::map<uint64_t, uint64_t> extents_;  // start to end
   uint64_t next_ = 0;                     // where the search for room begins

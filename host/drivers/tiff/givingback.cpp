@@ -2,77 +2,74 @@
 /// gets shorter.
 // SPDX-License-Identifier: MIT
 #include <algorithm>
+#include <exception>
 #include <utility>
 
 #include "host/drivers/tiff/levelfile.h"
+#include "host/drivers/tiff/packing.h"
 
 namespace orin::drivers {
 namespace {
 
-/// True when nothing of the directory is lost by writing its entries anew.
-bool IsWhole(const TiffDirectory& directory, const TiffStructure& structure) {
-  const unsigned countBytes = structure.isBig ? 8 : 2;
-  const unsigned entryBytes = structure.isBig ? 20 : 12;
-  return directory.linkPosition ==
-         directory.offset + countBytes + directory.entries.size() * entryBytes;
-}
-
-std::vector<uint8_t> Bytes(const PositionedFile& file, uint64_t position, uint64_t count) {
-  std::vector<uint8_t> bytes(count);
-  file.Read(position, bytes.data(), bytes.size());
+/// Of the items with these indices; of all of them for none.
+uint64_t BytesOf(const std::vector<size_t>& indices, const std::vector<Movable>& items) {
+  uint64_t bytes = 0;
+  for (const Movable& item : items)
+    if (indices.empty() || std::binary_search(indices.begin(), indices.end(), item.index))
+      bytes += item.bytes;
   return bytes;
 }
 
 }  // namespace
 
-/// Copies directory `index` to a place before `end`, and its tiles, as many as fit, to places
-/// before those that they have. \returns false: no room, or it cannot be moved
-bool LevelFile::MoveDown(size_t index, uint64_t end) {
-  const TiffDirectory& directory = structure_.directories[index];
-  const TiffEntry* offsets = directory.Find(TIFFTAG_TILEOFFSETS);
-  const TiffEntry* counts = directory.Find(TIFFTAG_TILEBYTECOUNTS);
-  if (!offsets || !counts || !IsWhole(directory, structure_)) return false;
-  std::vector<uint64_t> places = ReadNumbers(*file_, structure_, *offsets);
-  const std::vector<uint64_t> sizes = ReadNumbers(*file_, structure_, *counts);
-  if (places.size() != sizes.size()) return false;
-  std::vector<NewEntry> entries;
-  for (const TiffEntry& entry : directory.entries)
-    entries.push_back({entry.tag, entry.type, entry.count, ReadBytes(*file_, structure_, entry)});
-  const auto reserved = appender_->ReserveDirectoryBelow(entries, end);
-  if (!reserved) return false;
-  bool isLower = *reserved < directory.offset;
-  for (size_t i = 0; i < places.size(); ++i) {
-    if (sizes[i] == 0) continue;
-    const auto lower = appender_->AppendBelow(Bytes(*file_, places[i], sizes[i]), places[i]);
-    isLower = isLower || lower;
-    places[i] = lower.value_or(places[i]);
+/// Who opens the file later knows its state of now.
+bool LevelFile::IsAlone() {
+  return file_->DoAlone([] {}) == PositionedFile::Alone::kDone;
+}
+
+void LevelFile::Join(const Joining& joining) {
+  for (const auto& stretches : {joining.relinked, joining.grown}) {
+    for (const Stretch& stretch : stretches)
+      file_->Write(stretch.marker, ComposeMarker(stretch).data(), kMarkerBytes);
+    if (!stretches.empty()) file_->Sync();
   }
-  if (!isLower) return false;
-  for (NewEntry& entry : entries)
-    if (entry.tag == TIFFTAG_TILEOFFSETS) entry = NumbersEntry(entry.tag, entry.type, places);
-  const Place place = PlaceOf(structure_, index);
-  Link(place, appender_->WriteDirectory(std::move(entries), place.next, *reserved));
+}
+
+/// One step towards a file without gaps.
+/// \param evacuated  bytes that were moved to the file's end so far
+/// \returns false: no more is worth while, or others have the file open
+bool LevelFile::PackOnce(uint64_t& evacuated) {
+  constexpr uint64_t kWorthMoving = 25;  // gaps of that part of the file
+  structure_ = ParseStructure(*file_);
+  const OwnSpace space = FindOwnSpace(*file_, structure_);
+  const uint64_t end = space.ShortestEnd(file_->Size(), {});
+  if (RoomBefore(space.free, end) <= end / kWorthMoving || !IsAlone()) return false;
+  if (const Joining joining = JoinStretches(space); !joining.IsEmpty()) {
+    Join(joining);
+    return true;
+  }
+  const std::vector<Movable> items = Movables(space);
+  const auto move = NextMove(space, items);
+  if (!move) return false;
+  if (!move->room) {
+    if (end < file_->Size())  // first: the file grows no more than it must
+      return file_->DoAlone([&] { Shorten(space, end); }) == PositionedFile::Alone::kDone;
+    evacuated += BytesOf(move->indices, items);
+    if (evacuated > kMostRounds * BytesOf({}, items)) return false;
+  }
+  Carry(*move, space);
   return true;
 }
 
-/// Moves the directories of this program, the first ones in the file first.
-/// \pre nobody reads what is free. \returns false: nothing could be moved
-bool LevelFile::MoveDown() {
-  mayReuse_ = true;
-  StartAppending();
-  const OwnSpace space = FindOwnSpace(*file_, structure_);
-  std::vector<uint64_t> own = space.directories;
-  std::sort(own.begin(), own.end());  // as they were built: so they fit where others of them were
-  bool isMoved = false;
-  for (const uint64_t offset : own) {
-    const auto& all = structure_.directories;
-    const auto found = std::find_if(all.begin(), all.end(),
-                                    [&](const auto& entry) { return entry.offset == offset; });
-    if (found == all.end()) continue;
-    const bool isLower = MoveDown(static_cast<size_t>(found - all.begin()), space.used.End());
-    isMoved = isMoved || isLower;
+/// Closes the gaps between levels. What cannot be moved, for want of room on the disk, stays.
+void LevelFile::Pack() {
+  uint64_t evacuated = 0;
+  try {
+    while (PackOnce(evacuated)) {
+    }
+  } catch (const std::exception&) {
+    // deliberate: no level is harmed, and the next change tries again
   }
-  return isMoved;
 }
 
 void LevelFile::Shorten(const OwnSpace& space, uint64_t end) {
@@ -88,15 +85,9 @@ void LevelFile::Shorten(const OwnSpace& space, uint64_t end) {
 
 void LevelFile::GiveBackSpace() {
   if (!appender_ || !isMade_) return;
-  constexpr uint64_t kWorthMoving = 50;  // a fiftieth of the file
-  constexpr int kMostPasses = 4;         // what one pass leaves room for, the next one moves
-  const auto isAlone = [this] { return file_->DoAlone([] {}) == PositionedFile::Alone::kDone; };
+  Pack();
   structure_ = ParseStructure(*file_);
-  OwnSpace space = FindOwnSpace(*file_, structure_);
-  for (int pass = 0; pass < kMostPasses; ++pass) {
-    if (space.free.Size() < file_->Size() / kWorthMoving || !isAlone() || !MoveDown()) break;
-    space = FindOwnSpace(*file_, structure_);
-  }
+  const OwnSpace space = FindOwnSpace(*file_, structure_);
   const uint64_t end = space.ShortestEnd(file_->Size(), {});
   if (end < file_->Size()) file_->DoAlone([&] { Shorten(space, end); });
   mayReuse_ = false;  // somebody may have opened the file meanwhile

@@ -157,19 +157,23 @@ void LevelFile::DeclareEdited() {
   if (at != text.npos) file_->Write(start + at, after.data(), after.size());
 }
 
-void LevelFile::Link(const Place& place, uint64_t directory) {
+void LevelFile::LinkAll(const std::vector<DirectoryLink>& links) {
   OpenForChange();
   appender_->Close();
   file_->Sync();
   if (isMade_) DeclareEdited();
   Keep();  // first: a link that fails half-way may point there already
-  appender_->Link(place.linkPosition, directory);
+  for (const DirectoryLink& link : links) appender_->Link(link.position, link.target);
   file_->Sync();
   if (!isMade_) {
     file_->Rename(path_);
     isMade_ = true;
   }
   structure_ = ParseStructure(*file_);
+}
+
+void LevelFile::Link(const Place& place, uint64_t directory) {
+  LinkAll({{place.linkPosition, directory}});
 }
 
 void LevelFile::Keep() {

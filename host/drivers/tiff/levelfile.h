@@ -5,9 +5,11 @@
 #include <cstdint>
 #include <memory>
 #include <string>
+#include <vector>
 
 #include "host/drivers/tiff/appender.h"
 #include "host/drivers/tiff/leveldirectories.h"
+#include "host/drivers/tiff/packing.h"
 #include "host/drivers/tiff/positionedfile.h"
 #include "host/drivers/tiff/structure.h"
 
@@ -78,8 +80,19 @@ class LevelFile {
   void Make();
   void StartAppending();
   void DeclareEdited();
-  bool MoveDown();
-  bool MoveDown(size_t index, uint64_t end);
+  struct DirectoryLink {
+    uint64_t position;  ///< of the field
+    uint64_t target;
+  };
+  void LinkAll(const std::vector<DirectoryLink>& links);
+  bool IsAlone();
+  std::vector<Movable> Movables(const OwnSpace& space) const;
+  struct Carried;
+  Carried CopyTiles(size_t index);
+  void Carry(const Move& move, const OwnSpace& space);
+  void Join(const Joining& joining);
+  bool PackOnce(uint64_t& evacuated);
+  void Pack();
   void Shorten(const OwnSpace& space, uint64_t end);
   void RequireOursOrNew(const PositionedFile& partial) const;
 

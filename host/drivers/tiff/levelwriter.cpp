@@ -8,6 +8,7 @@
 #include <utility>
 
 #include "basic/gobs/mask/mask.h"
+#include "host/datasources/withmemory.h"
 #include "host/drivers/tiff/sparsesample.h"
 #include "host/drivers/tiff/tiffhandle.h"
 #include "host/drivers/tiff/tifflevelstore.h"
@@ -54,7 +55,7 @@ void LevelWriter::Begin() {
   build_ = store_.BeginWriting(level_, channels_);
   const LevelCoding& coding = build_->Coding();
   encoder_ = std::make_unique<TileEncoder>(coding, file_);
-  copy_ = CopierOf(format_.SampleBytes());
+  copy_ = datasources::CopierOf(format_.SampleBytes());
   isPartOfPixels_ = !format_.planar && channels_.size() < format_.samplesPerPixel;
   storedTiles_ = isPartOfPixels_ ? store_.OpenStoredTiles(level_) : nullptr;
   if (coding.mayBeSparse) sparseSample_ = SparseSample(format_.noData, format_.type);
@@ -62,7 +63,8 @@ void LevelWriter::Begin() {
 
 void LevelWriter::Write(const Raster& block) {
   RequireFittingBlock(block, *this, file_);
-  WithMemory(file_, _("%s: not enough memory to write its levels."), [&] { WriteBlock(block); });
+  datasources::WithMemory(file_, _("%s: not enough memory to write its levels."),
+                          "LevelWriter::Write(const Raster&)", [&] { WriteBlock(block); });
 }
 
 void LevelWriter::WriteBlock(const Raster& block) {

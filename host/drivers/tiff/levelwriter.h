@@ -8,10 +8,10 @@
 #include <vector>
 
 #include "host/datasources/rasterwriter.h"
+#include "host/datasources/samplecopy.h"
 #include "host/drivers/tiff/levelbuild.h"
 #include "host/drivers/tiff/levelmask.h"
 #include "host/drivers/tiff/pixelreader.h"
-#include "host/drivers/tiff/samplecopy.h"
 #include "host/drivers/tiff/tileencoder.h"
 
 namespace orin::drivers {
@@ -93,7 +93,7 @@ class LevelWriter final : public datasources::ReaderState<datasources::IRasterWr
   bool hasAskedForMask_ = false;
   std::unique_ptr<PixelReader>
       storedTiles_;  ///< where other channels come from; null when not needed
-  CopySamples copy_ = nullptr;
+  datasources::CopySamples copy_ = nullptr;
   std::vector<uint8_t> sparseSample_;  ///< empty when every tile is stored
   bool isPartOfPixels_ = false;        ///< other channels share the tiles
   std::map<uint64_t, OpenTile> tiles_;

@@ -6,6 +6,7 @@
 #include <cstring>
 #include <iterator>
 #include <map>
+#include <set>
 
 namespace orin::drivers {
 namespace {
@@ -185,6 +186,34 @@ std::vector<uint8_t> ComposePointer(uint64_t marker, uint64_t directory) {
   kOrder.Put(marker, 8, bytes.data());
   kOrder.Put(PointerCheck(marker, directory), 8, &bytes[8]);
   return bytes;
+}
+
+Joining JoinStretches(const OwnSpace& space) {
+  const std::set<uint64_t> directories(space.directories.begin(), space.directories.end());
+  const auto holdsDirectory = [&](const Stretch& stretch) {
+    const auto first = directories.lower_bound(stretch.Body());
+    return first != directories.end() && *first < stretch.end;
+  };
+  Joining joining;
+  std::map<uint64_t, uint64_t> joined;  // from the marker that is given up to the one that stays
+  std::set<uint64_t> growing;           // markers
+  std::vector<Stretch> staying;
+  for (Stretch stretch : space.stretches) {
+    if (!staying.empty() && staying.back().end == stretch.start && !holdsDirectory(stretch)) {
+      staying.back().end = stretch.end;
+      joined.emplace(stretch.marker, staying.back().marker);
+      growing.insert(staying.back().marker);
+      continue;
+    }
+    if (const auto other = joined.find(stretch.previous); other != joined.end()) {
+      stretch.previous = other->second;
+      joining.relinked.push_back(stretch);
+    }
+    staying.push_back(stretch);
+  }
+  for (const Stretch& stretch : staying)
+    if (growing.contains(stretch.marker)) joining.grown.push_back(stretch);
+  return joining;
 }
 
 uint64_t OwnSpace::ShortestEnd(uint64_t fileSize, const ExtentSet& given) const {

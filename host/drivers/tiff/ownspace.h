@@ -51,6 +51,16 @@ struct OwnSpace {
   uint64_t ShortestEnd(uint64_t fileSize, const ExtentSet& given) const;
 };
 
+/// Markers that are to be written so that two stretches become one. A stretch that holds no
+/// directory, and begins where another one ends, becomes part of that one.
+struct Joining {
+  std::vector<Stretch> relinked;  ///< first: they follow another stretch now
+  std::vector<Stretch> grown;     ///< once the former are durable
+
+  bool IsEmpty() const { return grown.empty(); }
+};
+Joining JoinStretches(const OwnSpace& space);
+
 /// Without any stretch where not all that is in use is known.
 /// \throws orin::Exception  the file cannot be read
 OwnSpace FindOwnSpace(const PositionedFile& file, const TiffStructure& structure);

@@ -6,6 +6,7 @@
 #include <numeric>
 #include <utility>
 
+#include "host/datasources/withmemory.h"
 #include "host/services/exception.h"
 #include "host/services/text.h"
 
@@ -53,7 +54,7 @@ PixelReader::PixelReader(const std::string& path, uint64_t directoryOffset,
                          std::vector<unsigned> channels)
     : decoder_(path, directoryOffset),
       bandRows_(BandRows(decoder_)),
-      copy_(CopierOf(Format().SampleBytes())),
+      copy_(datasources::CopierOf(Format().SampleBytes())),
       cache_(UnitBytes(Format(), bandRows_)) {
   for (const unsigned channel : channels)
     if (channel < 1 || channel > Format().samplesPerPixel)
@@ -81,8 +82,8 @@ TileDecoder& PixelReader::DecoderOf(size_t plane) {
 }
 
 void PixelReader::Read(gobs::Raster& block) {
-  WithMemory(decoder_.Path(), _("%s: not enough memory to read its pixels."),
-             [&] { ReadBlock(block); });
+  datasources::WithMemory(decoder_.Path(), _("%s: not enough memory to read its pixels."),
+                          "PixelReader::Read(gobs::Raster&)", [&] { ReadBlock(block); });
 }
 
 void PixelReader::ReadBlock(gobs::Raster& block) {

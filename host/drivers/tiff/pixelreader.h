@@ -9,8 +9,8 @@
 
 #include "basic/gobs/raster.h"
 #include "host/datasources/rasterreader.h"
+#include "host/datasources/samplecopy.h"
 #include "host/drivers/tiff/pixelformat.h"
-#include "host/drivers/tiff/samplecopy.h"
 #include "host/drivers/tiff/tilecache.h"
 #include "host/drivers/tiff/tiledecoder.h"
 
@@ -81,7 +81,7 @@ class PixelReader {
   uint32_t bandRows_;  ///< rows decoded together; the tile's height but for long compressed strips
   std::vector<std::unique_ptr<TileDecoder>>
       planeDecoders_;  ///< where each plane keeps its position
-  CopySamples copy_;
+  datasources::CopySamples copy_;
   TileCache cache_;
   TileCache::Buffer scratch_;
 };

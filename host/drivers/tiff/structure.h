@@ -51,7 +51,9 @@ struct TiffStructure {
   bool isBig = false;
   ByteOrder byteOrder;
   std::vector<TiffDirectory> directories;  ///< in the order of the chain
-  bool isBroken = false;  ///< the chain ended at a link that leads nowhere, or back
+  /// The chain did not end where it was left: at a link that leads nowhere, or back, or behind the
+  /// last directory that is read. The file may refer to more than is known.
+  bool isBroken = false;
 
   unsigned LinkBytes() const { return isBig ? 8 : 4; }
   unsigned HeaderBytes() const { return isBig ? 16 : 8; }
@@ -64,7 +66,8 @@ unsigned ElementBytes(uint16_t type);
 /// Bytes of the units that a byte order turns round: half an element for rationals.
 unsigned SwapBytes(uint16_t type);
 
-/// Follows the chain of directories. A link that points at nothing valid, or back, ends it, and so
+/// Follows the chain of directories, of which 65535 are read, as many as other programs can number.
+/// A link that points at nothing valid, or back, ends it, and so
 /// do directories that together are larger than the file: they overlap. Nothing is read outside the
 /// file, and no more is allocated than a few times what the file holds.
 /// \throws orin::Exception  the header or the first directory is not one of a TIFF file

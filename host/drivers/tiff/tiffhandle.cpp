@@ -77,11 +77,6 @@ const TIFFField* FindTextField(TIFF* tiff, uint32_t tag) {
 OpenFailure::OpenFailure(const std::string& message)
     : Exception(message, "host/drivers/tiff/tiffhandle", "TiffHandle(const std::string&)", 0) {}
 
-void FailForMemory(const std::string& path, const char* format) {
-  throw Exception(FormatString(format, path.c_str()), "host/drivers/tiff/tiffhandle",
-                  "FailForMemory(const std::string&, const char*)", 0);
-}
-
 void FailToRead(const std::string& path, std::string reason) {
   if (reason.starts_with(path + ": ")) reason.erase(0, path.size() + 2);  // libtiff names it too
   while (!reason.empty() && (reason.back() == '.' || reason.back() == '\n')) reason.pop_back();

@@ -4,7 +4,6 @@
 
 #include <cstdint>
 #include <memory>
-#include <new>
 #include <string>
 
 #include <tiffio.h>
@@ -18,8 +17,6 @@ class OpenFailure : public Exception {
  public:
   explicit OpenFailure(const std::string& message);
 };
-
-[[noreturn]] void FailForMemory(const std::string& path, const char* format);
 
 /// Nothing is printed: what libtiff reports stays with the handle. Not for two threads at once.
 class TiffHandle {
@@ -65,16 +62,6 @@ class TiffHandle {
   std::unique_ptr<TIFF, Closer> tiff_;
   uint64_t fileSize_ = 0;
 };
-
-/// Calls `action`; memory that it does not get is an exception like any other.
-/// \param format  of the text, which takes the file's name
-void WithMemory(const std::string& path, const char* format, const auto& action) {
-  try {
-    action();
-  } catch (const std::bad_alloc&) {
-    FailForMemory(path, format);
-  }
-}
 
 /// Throws "FILE: cannot be read: REASON."
 [[noreturn]] void FailToRead(const std::string& path, std::string reason);

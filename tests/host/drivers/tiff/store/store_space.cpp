@@ -7,6 +7,7 @@
 
 #include "host/drivers/tiff/ownspace.h"
 #include "host/services/exception.h"
+#include "tests/host/drivers/tiff/store/extentstext.h"
 #include "tests/host/drivers/tiff/store/storesupport.h"
 
 namespace orin::tests {
@@ -17,53 +18,6 @@ using drivers::PositionedFile;
 
 const Layout kImage{
     .width = 200, .height = 160, .samples = 3, .tile = 32, .photometric = PHOTOMETRIC_RGB};
-
-/// "2-5 9-10"
-std::string TextOf(const ExtentSet& extents) {
-  std::string text;
-  for (const auto& [start, end] : extents)
-    text += (text.empty() ? "" : " ") + std::to_string(start) + "-" + std::to_string(end);
-  return text;
-}
-
-TEST(Extents, ThatTouchOrOverlapAreOne) {
-  ExtentSet extents;
-  extents.Add({10, 20});
-  extents.Add({30, 40});
-  extents.Add({20, 22});
-  extents.Add({5, 5});
-  EXPECT_EQ("10-22 30-40", TextOf(extents));
-  extents.Add({8, 35});
-  EXPECT_EQ("8-40", TextOf(extents));
-  EXPECT_EQ(32u, extents.Size());
-  EXPECT_EQ(40u, extents.End());
-}
-
-TEST(Extents, AreCutWhereSomethingIsRemoved) {
-  ExtentSet extents;
-  extents.Add({10, 20});
-  extents.Add({30, 40});
-  extents.Remove({15, 17});
-  extents.Remove({35, 50});
-  EXPECT_EQ("10-15 17-20 30-35", TextOf(extents));
-  extents.Remove({0, 32});
-  EXPECT_EQ("32-35", TextOf(extents));
-  EXPECT_TRUE(extents.Holds({32, 35}));
-  EXPECT_FALSE(extents.Holds({32, 36}));
-}
-
-TEST(Extents, AreTakenInOrderAtEvenPositionsAndBeforeTheLimit) {
-  ExtentSet extents;
-  extents.Add({11, 20});
-  extents.Add({30, 40});
-  EXPECT_EQ(12u, extents.Take(5));
-  EXPECT_EQ(30u, extents.Take(4));
-  EXPECT_EQ(34u, extents.Take(2));
-  EXPECT_EQ(18u, extents.Take(2, 30)) << "begins again before the limit";
-  EXPECT_EQ(std::nullopt, extents.Take(5));
-  EXPECT_EQ(36u, extents.Take(4));
-  EXPECT_EQ("11-12 17-18", TextOf(extents));
-}
 
 class Space : public TiffStore {
  protected:
@@ -190,6 +144,36 @@ TEST_F(Space, IsNotTakenWhereTheChainIsBrokenAndSomethingMayBeHidden) {
   stream.close();
   EXPECT_TRUE(Own().stretches.empty());
   EXPECT_TRUE(Own().free.IsEmpty());
+}
+
+TEST_F(Space, IsNotTakenWhereTheChainIsLongerThanWhatIsRead) {
+  BuildAll();
+  BuildAll("AVERAGE");
+  const auto last = DirectoriesOf(file_).back().offset;
+  const size_t link = last + 2 + 12 * size_t(uint8_t(BytesOf(file_)[last]));
+  if (Size() % 2 != 0) Append("x");
+  const auto number = [](uint32_t value, unsigned width) {
+    return std::string(reinterpret_cast<const char*>(&value), width);
+  };
+  const std::string side = number(3, 2) + number(1, 4) + number(1, 4);  // one SHORT: 1
+  const auto start = uint32_t(Size());
+  const auto chain = [&](uint32_t count) {
+    std::string bytes;
+    for (uint32_t i = 1; i <= count; ++i)
+      bytes += number(2, 2) + number(256, 2) + side + number(257, 2) + side +
+               number(i == count ? 0 : start + i * 30, 4);
+    return bytes;
+  };
+  const uint64_t size = Size();
+  for (const uint32_t count : {65535u - 4, 65536u - 4}) {  // behind the image and three levels
+    std::filesystem::resize_file(file_, size);
+    Append(chain(count));
+    std::fstream stream(file_, std::ios::in | std::ios::out | std::ios::binary);
+    stream.seekp(std::streamoff(link));
+    stream.write(number(start, 4).data(), 4);
+    stream.close();
+    EXPECT_EQ(count == 65535u - 4, !Own().stretches.empty()) << count;
+  }
 }
 
 TEST_F(Space, OfADamagedMarkerIsLostAndNothingElse) {

@@ -4,7 +4,7 @@
 
 #include <cstdint>
 
-namespace orin::drivers {
+namespace orin::datasources {
 
 /// Copies `count` samples; the strides are counted in samples, a source stride of 0 repeats one
 /// sample.
@@ -12,6 +12,6 @@ using CopySamples = void (*)(const uint8_t* from, uint64_t fromStride, uint8_t* 
                              uint64_t toStride, uint64_t count);
 
 /// \param sampleBytes  1, 2, 4, 8 or 16
-CopySamples CopierOf(uint32_t sampleBytes);
+CopySamples CopierOf(uint64_t sampleBytes);
 
-}  // namespace orin::drivers
+}  // namespace orin::datasources

@@ -1,9 +1,9 @@
 // SPDX-License-Identifier: MIT
-#include "host/drivers/tiff/samplecopy.h"
+#include "host/datasources/samplecopy.h"
 
 #include <cstring>
 
-namespace orin::drivers {
+namespace orin::datasources {
 namespace {
 
 template <uint32_t Bytes>
@@ -19,7 +19,7 @@ void Copy(const uint8_t* from, uint64_t fromStride, uint8_t* to, uint64_t toStri
 
 }  // namespace
 
-CopySamples CopierOf(uint32_t sampleBytes) {
+CopySamples CopierOf(uint64_t sampleBytes) {
   switch (sampleBytes) {
     case 1:
       return Copy<1>;
@@ -34,4 +34,4 @@ CopySamples CopierOf(uint32_t sampleBytes) {
   }
 }
 
-}  // namespace orin::drivers
+}  // namespace orin::datasources

@@ -1,0 +1,19 @@
+/// Byte ranges as text.
+// SPDX-License-Identifier: MIT
+#pragma once
+
+#include <string>
+
+#include "host/drivers/tiff/extents.h"
+
+namespace orin::tests {
+
+/// "2-5 9-10"
+inline std::string TextOf(const drivers::ExtentSet& extents) {
+  std::string text;
+  for (const auto& [start, end] : extents)
+    text += (text.empty() ? "" : " ") + std::to_string(start) + "-" + std::to_string(end);
+  return text;
+}
+
+}  // namespace orin::tests
