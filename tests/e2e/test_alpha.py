@@ -9,9 +9,9 @@ import unittest
 import numpy
 from osgeo import gdal
 
-from mask_case import HEIGHT, MaskCase, SIZE, TILED, WIDTH
+from mask_case import HEIGHT, MaskCase, SIZE, TILED, WIDTH, write_mask_beside
 from mask_twin import METHODS, disc, level_validity, masks_of_levels
-from orin_e2e import nearest, read_pixels, run, write_tiff
+from orin_e2e import info, nearest, read_pixels, run, write_tiff
 
 JPEG = ("COMPRESS=JPEG", "JPEG_QUALITY=75")
 
@@ -116,6 +116,30 @@ class AsTheUserSays(AlphaCase):
                 holder, first = (file, 2) if place == "--internal" else (file + ".ovr", 1)
                 self.assertEqual("JPEG", codec_of(holder, first))
                 self.assert_masks(file, method, place)
+
+    def test_info_tells_of_masks_and_alpha(self):
+        file = self.image("scene.tif", JPEG)
+        self.build(file, "--levels", "2", "--co", "COMPRESS=JPEG")
+        self.build(file, "--levels", "4")
+        told = info(file)
+        self.assertEqual((False, 4), (told["mask"], told["alphaChannel"]))
+        self.assertEqual([True, False], [level["mask"] for level in told["levels"]])
+        write_mask_beside(file, disc(WIDTH, HEIGHT))
+        self.assertTrue(info(file)["mask"])
+        self.assertIn("no data by: a mask, alpha (channel 4)\n", run("info", file).stdout)
+
+    def test_a_jpeg_level_of_another_program_goes_by_the_alpha_of_the_image(self):
+        file = self.image("scene.tif", JPEG)
+        dataset = gdal.Open(file, gdal.GA_Update)
+        dataset.BuildOverviews("NEAREST", [2])
+        del dataset
+        self.assertEqual("JPEG", codec_of(file, 2))
+        self.build(file, "--levels", "4", "--method", "nearest")
+        two = (read_pixels(file)[3] > 0)[1::2, 1::2]  # at the centres of its pixels
+        blurred = read_pixels(file, 0)[3, :HEIGHT // 2, :WIDTH // 2] > 0
+        self.assertFalse((blurred == two).all(), "its own alpha is as good")
+        four = level_validity(two, 2, 4, SIZE, "nearest", 4)
+        self.assertTrue(((read_pixels(file, 1)[3] > 0) == four).all())
 
     def test_jpeg_levels_built_again_keep_their_form_and_their_masks(self):
         for place in ("--internal", "--external"):
