@@ -87,6 +87,29 @@ class OfJpegImages(AlphaCase):
         self.assertIn("add COMPRESS=JPEG or WEBP", answer.stderr)
 
 
+class Overshooting(AlphaCase):
+    def test_bicubic_leaves_no_pixel_with_data_transparent(self):
+        columns = numpy.arange(WIDTH)
+        for (dtype, type_name), place in itertools.product(
+                ((numpy.uint8, "Byte"), (numpy.int16, "Int16"), (numpy.uint32, "UInt32")),
+                ("--internal", "--external")):
+            with self.subTest(type=type_name, place=place):
+                opaque = numpy.where(columns // 7 % 2, 120, 1)  # the step is overshot on both sides
+                alpha = numpy.tile(opaque, (HEIGHT, 1))
+                alpha[:, :20] = 0
+                pixels = numpy.stack([alpha, alpha, alpha, alpha]).astype(dtype)
+                file = self.path(type_name + place + ".tif")
+                write_tiff(file, pixels, type_name, ("ALPHA=YES", "PHOTOMETRIC=RGB", *TILED))
+                self.build(file, "--levels", "2,4", "--method", "bicubic", place)
+                known = alpha > 0
+                for index, (source, level) in enumerate(((1, 2), (2, 4))):
+                    known = level_validity(known, source, level, SIZE, "bicubic", 4)
+                    pixels = read_pixels(file, index)
+                    self.assertTrue(((pixels[3] != 0) == known).all())
+                    if index == 0 and dtype == numpy.uint8:  # the same numbers, as a colour
+                        self.assertTrue((pixels[0][known] == 0).any(), "nothing overshoots")
+
+
 class AsTheUserSays(AlphaCase):
     def image(self, name, codec):
         file = self.path(name)
