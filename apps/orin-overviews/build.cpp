@@ -153,6 +153,7 @@ ExitCode BuildFile(BuildOptions options, const std::string& file, const Interrup
   if (const std::string stale = StaleText(plan); !stale.empty())
     console.Notice(AfterFileName(file, stale));
   WarnOfBlending(plan, options, file, console);
+  if (plan.room.blursAlpha) console.Warning(AfterFileName(file, BlurredAlphaText()));
   const Outcome outcome = RunJob(job, plan, options, file, interruption, console);
   if (!outcome.built)
     return ReportFailure(outcome, plan, options, file, interruption.Requested(), console);

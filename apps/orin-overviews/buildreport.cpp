@@ -125,6 +125,13 @@ std::string BlendedClassesText() {
       "classes that the image does not hold. Use --method mode or --method nearest.");
 }
 
+std::string BlurredAlphaText() {
+  return _(
+      "JPEG keeps the alpha channel of the levels roughly: transparent pixels do not stay quite "
+      "transparent, opaque ones not quite opaque. Programs that read the masks of the levels see "
+      "them exactly. Another COMPRESS keeps alpha as it is.");
+}
+
 std::string HiddenLevelsText(const LevelState& state) {
   const auto stands = [&](datasources::LevelPlace place) {
     return std::any_of(state.descriptions.begin(), state.descriptions.end(),

@@ -20,6 +20,8 @@ std::string StaleText(const BuildPlan& plan);
 std::string LeftOutText(const BuildPlan& plan, unsigned level);
 /// Why a method that computes means does not suit a palette or classes.
 std::string BlendedClassesText();
+/// What becomes of an alpha channel that is stored with loss.
+std::string BlurredAlphaText();
 /// What to know of levels in both places; empty when they stand in one.
 std::string HiddenLevelsText(const LevelState& state);
 std::string InterruptedText(const LevelState& state, const BuildOptions& options);

@@ -47,6 +47,7 @@ Json JsonOf(const LevelDescription& level) {
           {"program", OrNull(level.program)},
           {"state", NameOf(level.status)},
           {"fingerprint", OrNull(level.image.fingerprint)},
+          {"mask", level.hasMask},
           {"channels", ChannelsOf(level)}};
 }
 
@@ -64,6 +65,8 @@ std::string JsonOf(const RasterInfo& info) {
       {"width", info.width},
       {"height", info.height},
       {"channels", channels},
+      {"mask", info.hasMask},
+      {"alphaChannel", info.alphaChannel ? Json(info.alphaChannel) : Json()},
       {"levels", levels}};
   // A file name need not be UTF-8, JSON must be.
   return all.dump(2, ' ', false, Json::error_handler_t::replace) + "\n";

@@ -1,8 +1,9 @@
 /// What `info` tells, for people.
 // SPDX-License-Identifier: MIT
 #include <algorithm>
-#include <array>
 #include <filesystem>
+#include <string>
+#include <vector>
 
 #include "apps/orin-overviews/numberlist.h"
 #include "apps/orin-overviews/rasterinfo.h"
@@ -13,8 +14,7 @@ namespace {
 
 using datasources::LevelDescription;
 
-constexpr size_t kColumns = 7;
-using Row = std::array<std::string, kColumns>;
+using Row = std::vector<std::string>;
 
 /// Columns that a terminal shows of an UTF-8 text without wide characters.
 size_t LengthOf(const std::string& text) {
@@ -31,6 +31,16 @@ std::string TypesText(const std::vector<gobs::DataType>& channels) {
   std::string text;
   for (const gobs::DataType& type : channels) text += (text.empty() ? "" : ", ") + TypeName(type);
   return text;
+}
+
+/// A line that names what tells, beside a no-data value, which pixels hold data; empty: nothing.
+std::string ValidityText(const RasterInfo& info) {
+  if (info.hasMask && info.alphaChannel)
+    return FormatString(_("no data by: a mask, alpha (channel %u)\n"), info.alphaChannel);
+  if (info.hasMask) return _("no data by: a mask\n");
+  if (info.alphaChannel)
+    return FormatString(_("no data by: alpha (channel %u)\n"), info.alphaChannel);
+  return "";
 }
 
 std::string PlaceText(const LevelDescription& level) {
@@ -64,25 +74,35 @@ std::string ShownText(const std::string& text) {
   return shown.empty() ? "-" : shown;
 }
 
-Row RowOf(const LevelDescription& level) {
-  return {std::to_string(level.level),
-          std::to_string(level.width) + " x " + std::to_string(level.height),
-          PlaceText(level),
-          ShownText(level.method),
-          level.sourceLevel == 0 ? "-" : std::to_string(level.sourceLevel),
-          ValidText(level),
-          ShownText(level.program)};
+/// The masks of levels are worth a column where there are any, or should be.
+bool TellsOfMasks(const RasterInfo& info) {
+  return info.hasMask || std::any_of(info.levels.begin(), info.levels.end(),
+                                     [](const LevelDescription& level) { return level.hasMask; });
 }
 
+Row RowOf(const LevelDescription& level, bool tellsOfMasks) {
+  Row row = {std::to_string(level.level),
+             std::to_string(level.width) + " x " + std::to_string(level.height),
+             PlaceText(level),
+             ShownText(level.method),
+             level.sourceLevel == 0 ? "-" : std::to_string(level.sourceLevel),
+             ValidText(level)};
+  if (tellsOfMasks) row.push_back(level.hasMask ? _("yes") : _("no"));
+  row.push_back(ShownText(level.program));
+  return row;
+}
+
+/// \pre there is a row, and all have as many columns
 std::string TextOf(const std::vector<Row>& rows) {
-  std::array<size_t, kColumns> widths{};
+  const size_t columns = rows.front().size();
+  std::vector<size_t> widths(columns);
   for (const Row& row : rows)
-    for (size_t i = 0; i < kColumns; ++i) widths[i] = std::max(widths[i], LengthOf(row[i]));
+    for (size_t i = 0; i < columns; ++i) widths[i] = std::max(widths[i], LengthOf(row[i]));
   std::string text;
   for (const Row& row : rows) {
-    for (size_t i = 0; i < kColumns; ++i) {
+    for (size_t i = 0; i < columns; ++i) {
       text += row[i];
-      if (i + 1 < kColumns) text.append(widths[i] - LengthOf(row[i]) + 2, ' ');
+      if (i + 1 < columns) text.append(widths[i] - LengthOf(row[i]) + 2, ' ');
     }
     text += '\n';
   }
@@ -95,10 +115,14 @@ std::string TableOf(const RasterInfo& info) {
   std::string text = FormatString(_("%s: %u x %u pixels, channels: %zu (%s), %s\n"),
                                   info.file.c_str(), info.width, info.height, info.channels.size(),
                                   TypesText(info.channels).c_str(), info.formatDescription.c_str());
+  text += ValidityText(info);
   if (info.levels.empty()) return text + _("no overview levels\n");
-  std::vector<Row> rows = {
-      {_("level"), _("size"), _("place"), _("method"), _("from"), _("valid"), _("program")}};
-  for (const LevelDescription& level : info.levels) rows.push_back(RowOf(level));
+  const bool tellsOfMasks = TellsOfMasks(info);
+  Row heading = {_("level"), _("size"), _("place"), _("method"), _("from"), _("valid")};
+  if (tellsOfMasks) heading.push_back(_("mask"));
+  heading.push_back(_("program"));
+  std::vector<Row> rows = {heading};
+  for (const LevelDescription& level : info.levels) rows.push_back(RowOf(level, tellsOfMasks));
   return text + TextOf(rows);
 }
 

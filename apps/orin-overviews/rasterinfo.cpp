@@ -48,6 +48,8 @@ RasterInfo CollectInfo(const std::string& file) {
   for (unsigned channel = 1; channel <= raster->GetChannelCount(); ++channel)
     info.channels.push_back(
         std::unique_ptr<datasources::IChannelInfo>(raster->GetChannelInfo(channel))->GetDataType());
+  info.hasMask = raster->GetSource()->HasMask();
+  info.alphaChannel = raster->GetSource()->AlphaChannel();
   const std::unique_ptr<datasources::IOverviewInfo> levels(raster->GetOverviewInfo());
   auto* store = raster->GetSource()->Levels();
   if (store) store->KeepAnswers();

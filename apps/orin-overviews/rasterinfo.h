@@ -18,6 +18,8 @@ struct RasterInfo {
   unsigned height = 0;            ///< pixels
   std::vector<gobs::DataType> channels;
   std::vector<datasources::LevelDescription> levels;  ///< ascending, those in both places twice
+  bool hasMask = false;       ///< of the image, inside its file or beside it
+  unsigned alphaChannel = 0;  ///< 1-based, 0: none
 };
 
 /// \throws orin::Exception  the file cannot be opened or is no raster

@@ -1,4 +1,4 @@
-/// What it takes to make levels, known before the first byte is written.
+/// What it takes to make levels, and what becomes of them, known before the first byte is written.
 // SPDX-License-Identifier: MIT
 #pragma once
 
@@ -10,8 +10,9 @@ namespace orin::datasources {
 struct LevelRoom {
   std::string file;    ///< that grows, or is made; empty: the levels take no room in a file
   uint64_t bytes = 0;  ///< expected: exact without compression, else from how the image compresses
-  std::string obstacle;  ///< why the file's format may not hold them, naming it; empty: it does
-  std::string advice;    ///< what to do about the obstacle
+  std::string obstacle;     ///< why the file's format may not hold them, naming it; empty: it does
+  std::string advice;       ///< what to do about the obstacle
+  bool blursAlpha = false;  ///< opacity is stored with loss; masks say exactly what holds data
 };
 
 /// Why the file system cannot take the levels, naming what is needed and what is free; empty when

@@ -36,6 +36,7 @@ struct LevelDescription {
                                     ///< known to be out of date
   LevelStatus status = LevelStatus::kUnverified;
   ImageRecord image = {};  ///< that it was computed from; blank when unknown
+  bool hasMask = false;    ///< a mask of its own stands with its pixels
 };
 
 /// True when `entries` holds true for every one of `channels` (1-based).

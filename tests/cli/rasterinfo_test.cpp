@@ -80,6 +80,35 @@ TEST(RasterInfo, ALevelIsValidStaleUnverifiedOrNot) {
   EXPECT_EQ("channels 1 unverified", validOf(LevelStatus::kUnverified, {true, false}));
 }
 
+TEST(RasterInfo, TheTableTellsOfMasksAndAlphaWhereThereAreAny) {
+  RasterInfo info = Scene();
+  info.hasMask = true;
+  info.levels[1].hasMask = true;
+  EXPECT_EQ(
+      "scene.tif: 1001 x 777 pixels, channels: 2 (uint8), TIFF / GeoTIFF\n"
+      "no data by: a mask\n"
+      "level  size       place          method   from  valid       mask  program\n"
+      "2      500 x 388  inside         NEAREST  1     yes         no    Orin Overviews 0.1.0\n"
+      "4      250 x 194  scene.tif.ovr  -        -     channels 1  yes   -\n",
+      TableOf(info));
+  info.levels.clear();
+  info.alphaChannel = 2;
+  EXPECT_NE(std::string::npos, TableOf(info).find("no data by: a mask, alpha (channel 2)\n"));
+  info.hasMask = false;
+  EXPECT_NE(std::string::npos, TableOf(info).find("no data by: alpha (channel 2)\n"));
+}
+
+TEST(RasterInfo, JsonTellsOfMasksAndAlpha) {
+  RasterInfo info = Scene();
+  EXPECT_NE(std::string::npos, JsonOf(info).find("\"alphaChannel\": null"));
+  EXPECT_EQ(std::string::npos, JsonOf(info).find("\"mask\": true"));
+  info.alphaChannel = 2;
+  info.levels[0].hasMask = true;
+  const std::string json = JsonOf(info);
+  EXPECT_NE(std::string::npos, json.find("\"alphaChannel\": 2"));
+  EXPECT_NE(std::string::npos, json.find("\"mask\": true"));
+}
+
 TEST(RasterInfo, WithoutLevelsTheTableSaysSo) {
   RasterInfo info = Scene();
   info.levels.clear();

@@ -168,7 +168,9 @@ class Info(Case):
         self.assertEqual({"level": 2, "width": 501, "height": 388, "place": "internal",
                           "file": self.file, "method": "NEAREST", "sourceLevel": 1,
                           "program": program, "state": "current",
-                          "fingerprint": beside["fingerprint"], "channels": valid}, inside)
+                          "fingerprint": beside["fingerprint"], "mask": False,
+                          "channels": valid}, inside)
+        self.assertEqual((False, None), (answer["mask"], answer["alphaChannel"]))
         self.assertRegex(inside["fingerprint"], "^[0-9a-f]{32}$")
         self.assertEqual("current", beside["state"])
         found = [beside[key] for key in ("place", "file", "level", "width", "height")]

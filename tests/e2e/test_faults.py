@@ -11,6 +11,8 @@ import unittest
 import numpy
 
 import disklog
+from mask_case import write_mask_beside
+from mask_twin import disc
 from orin_e2e import Case, info, overview_sizes, random_pixels, read_pixels, run, write_tiff
 
 FAULTS = {
@@ -137,6 +139,15 @@ class Faults(Case):
         self.assertRan(run("build", image, "--levels", "2", "--method", "nearest"))
         failed = self.check_all("build", "--levels", "2", "--method", "average", "--force")
         self.assertLessEqual({"pwrite", "fsync", "open", "flock"}, failed)
+
+    def test_of_a_masked_build_of_two_channels_beside_the_file(self):
+        image = os.path.join(self.original, "image.tif")
+        valid = disc(50, 40)
+        self.pixels = random_pixels((2, 40, 50), numpy.uint8, 8) * valid
+        write_tiff(image, self.pixels, "Byte", ["TILED=YES", "BLOCKXSIZE=16", "BLOCKYSIZE=16"])
+        write_mask_beside(image, valid)
+        failed = self.check_all("build", "--levels", "2", "--external")
+        self.assertLessEqual({"pwrite", "fsync", "ftruncate", "rename"}, failed)
 
     def test_of_removing_levels(self):
         self.assertRan(run("build", os.path.join(self.original, "image.tif"), "--levels", "2,4"))

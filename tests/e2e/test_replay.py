@@ -24,6 +24,8 @@ KINDS = {
 
 
 class Replayed(Case):
+    image = "image.tif"
+
     def setUp(self):
         super().setUp()
         self.pixels = random_pixels((2, SIZE[1], SIZE[0]), numpy.uint8, 8)
@@ -36,7 +38,7 @@ class Replayed(Case):
         shutil.copytree(self.original, self.recorded)
         log = self.path("log")
         self.assertRan(disklog.run(self.recorded, *arguments[:1],
-                                   os.path.join(self.recorded, "image.tif"), *arguments[1:],
+                                   os.path.join(self.recorded, self.image), *arguments[1:],
                                    log=log))
         return disklog.changes_in(log)
 
@@ -50,7 +52,7 @@ class Replayed(Case):
             change.apply(lambda path: names.get(path, path).replace(self.recorded, folder))
             if change.name == "rename":
                 names[change.paths[0]] = change.paths[1]
-        yield os.path.join(folder, "image.tif")
+        yield os.path.join(folder, self.image)
         shutil.rmtree(folder)
 
     def levels(self, image):
@@ -84,7 +86,7 @@ class Replayed(Case):
 
         \\returns the changes that the run made"""
         changes = self.record(*arguments)
-        expected = self.levels(os.path.join(self.recorded, "image.tif"))
+        expected = self.levels(os.path.join(self.recorded, self.image))
         self.assertGreater(len(changes), 3)
         self.check_each(self.states(changes), arguments, expected)
         return changes

@@ -65,6 +65,11 @@ bool HasAlpha(const LevelCoding& coding) {
          std::any_of(entry->bytes.begin(), entry->bytes.end(), [](uint8_t b) { return b != 0; });
 }
 
+/// Lossy WebP keeps opacity as it is; JPEG takes it for one more colour.
+bool BlursAlpha(const LevelCoding& coding) {
+  return coding.format.compression == COMPRESSION_JPEG && HasAlpha(coding);
+}
+
 /// What the codec would change of such samples although it is to keep them; empty: nothing.
 std::string UnfaithfulnessOf(const LevelCoding& coding) {
   const PixelFormat& format = coding.format;
@@ -191,7 +196,8 @@ void ApplyOptions(const LevelOptions& options, const std::string& file, uint64_t
   if (options.compression) {
     if (const std::string obstacle = ObstacleIn(coding); !obstacle.empty())
       Refuse(file, TextOf(*options.compression), obstacle);
-  } else if (!UnfaithfulnessOf(coding).empty() || !TileEncoder::CanEncode(coding)) {
+  } else if (!UnfaithfulnessOf(coding).empty() || BlursAlpha(coding) ||
+             !TileEncoder::CanEncode(coding)) {
     FallBackToDeflate(coding);
   }
   if (options.predictor) ApplyPredictor(*options.predictor, file, coding);

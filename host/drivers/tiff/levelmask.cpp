@@ -111,8 +111,10 @@ StoredMask OpenStoredMask(const PositionedFile& file, const TiffStructure& struc
                           size_t index) {
   const TiffDirectory& directory = structure.directories[index];
   StoredMask mask;
-  mask.pixels =
-      std::make_unique<PixelReader>(file.Path(), directory.offset, std::vector<unsigned>{1});
+  const auto pixels =
+      std::make_shared<PixelReader>(file.Path(), directory.offset, std::vector<unsigned>{1});
+  mask.readTile = [pixels](uint32_t tile, uint8_t* bits) { pixels->ReadTile(tile, bits); };
+  mask.format = pixels->Format();
   const auto numbers = [&](uint16_t tag) {
     const TiffEntry* entry = directory.Find(tag);
     return entry ? ReadNumbers(file, structure, *entry) : std::vector<uint64_t>();
@@ -122,6 +124,19 @@ StoredMask OpenStoredMask(const PositionedFile& file, const TiffStructure& struc
   for (size_t i = 0; i < std::min(offsets.size(), counts.size()); ++i)
     mask.places.push_back({offsets[i], counts[i]});
   return mask;
+}
+
+StoredMask OpenAppendedMask(const LevelBuild& mask, const std::string& file,
+                            std::function<std::vector<uint8_t>(const TilePlace&)> read) {
+  StoredMask appended;
+  appended.format = mask.Coding().format;
+  appended.places.assign(mask.PlacesOf(0), mask.PlacesOf(0) + mask.TilesPerPlane());
+  const TileEncoder encoder(mask.Coding(), file);
+  appended.readTile = [=, places = appended.places](uint32_t tile, uint8_t* bits) {
+    const std::vector<uint8_t> samples = encoder.Decode(read(places[tile]), 0);
+    std::copy(samples.begin(), samples.end(), bits);
+  };
+  return appended;
 }
 
 LevelMaskWriter::LevelMaskWriter(LevelBuild& build, std::string file, StoredMask before, bool joins,
@@ -181,9 +196,9 @@ LevelMaskWriter::OpenTile LevelMaskWriter::MakeTile(uint32_t tileX, uint32_t til
 }
 
 void LevelMaskWriter::Finish(uint64_t tile, std::vector<uint8_t>& bits) {
-  if (before_.pixels) {
+  if (before_.readTile) {
     std::vector<uint8_t> stored(bits.size());
-    before_.pixels->ReadTile(static_cast<uint32_t>(tile), stored.data());
+    before_.readTile(static_cast<uint32_t>(tile), stored.data());
     if (joins_)
       std::transform(bits.begin(), bits.end(), stored.begin(), bits.begin(),
                      [](uint8_t a, uint8_t b) { return static_cast<uint8_t>(a | b); });

@@ -61,13 +61,21 @@ struct TypeChange {
 /// an image, and want that one's mask not to be called reduced.
 std::vector<TypeChange> MaskTypeChanges(const PositionedFile& file, const TiffStructure& structure);
 
-/// A mask that a level has in the file.
+/// A mask of which the file holds the tiles.
 struct StoredMask {
-  std::unique_ptr<PixelReader> pixels;
+  /// Writes a byte a pixel, 0 or 1, of the whole tile; empty: there is no mask.
+  /// \throws orin::Exception  the tile cannot be read
+  std::function<void(uint32_t tile, uint8_t* bits)> readTile;
+  PixelFormat format;
   std::vector<TilePlace> places;  ///< of its tiles
 };
 /// \param index  of its directory. \throws orin::Exception  it cannot be read
 StoredMask OpenStoredMask(const PositionedFile& file, const TiffStructure& structure, size_t index);
+/// One that no directory names yet. \pre it is complete
+/// \param file  named in error texts
+/// \param read  the bytes of a tile
+StoredMask OpenAppendedMask(const LevelBuild& mask, const std::string& file,
+                            std::function<std::vector<uint8_t>(const TilePlace&)> read);
 
 /// Gathers the validity of blocks into the mask's tiles.
 class LevelMaskWriter {

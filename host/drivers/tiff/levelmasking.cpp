@@ -12,13 +12,38 @@ namespace {
 
 /// False when tiles of the mask that is there cannot take the place of new ones.
 bool HasTilesOf(const StoredMask& before, const LevelBuild& mask) {
-  if (!before.pixels || before.places.size() != mask.TilesPerPlane()) return false;
-  const PixelFormat& there = before.pixels->Format();
+  if (!before.readTile || before.places.size() != mask.TilesPerPlane()) return false;
+  const PixelFormat& there = before.format;
   const PixelFormat& wanted = mask.Coding().format;
   return there.tileWidth == wanted.tileWidth && there.tileHeight == wanted.tileHeight;
 }
 
 }  // namespace
+
+/// Whether a level of that form holds opacity, and not as it was written.
+bool TiffLevelStore::BlursAlpha(const PixelFormat& level) const {
+  return settings_.validity.alphaChannel != 0 && level.compression == COMPRESSION_JPEG;
+}
+
+/// Whether a level of that form is to have a mask: its image has one, or its alpha does not tell
+/// what holds data.
+bool TiffLevelStore::GetsMask(const PixelFormat& level) const {
+  return settings_.validity.hasMask || BlursAlpha(level);
+}
+
+/// The mask that the new one joins or replaces: that of the channels that wait, else the one that
+/// the level has in the file, as far as its tiles can take the place of new ones.
+StoredMask TiffLevelStore::MaskBefore(unsigned level, const LevelBuild& mask) {
+  StoredMask before;
+  const StoredLevel* ours = FindOurs(level);
+  const auto pending = pending_.find(level);
+  if (pending != pending_.end() && pending->second.waitingMask)
+    before = OpenAppendedMask(*pending->second.waitingMask, file_->Path(),
+                              [this](const TilePlace& place) { return ReadAppended(place); });
+  else if (ours && ours->mask)
+    before = OpenStoredMask(file_->File(), file_->Structure(), *ours->mask);
+  return HasTilesOf(before, mask) ? std::move(before) : StoredMask();
+}
 
 /// A side-car is written channel by channel: a pixel of its mask is valid when it is in any of the
 /// channels of one run.
@@ -26,12 +51,10 @@ std::unique_ptr<LevelMaskWriter> TiffLevelStore::BeginMask(unsigned level,
                                                            const std::vector<unsigned>& channels,
                                                            LevelBuild& build) {
   const std::lock_guard lock(mutex_);
-  if (!settings_.validity.hasMask || build.mask) return nullptr;
-  const StoredLevel* ours = FindOurs(level);
-  StoredMask before;
-  if (ours && ours->mask) before = OpenStoredMask(file_->File(), file_->Structure(), *ours->mask);
+  const bool isWritten = build.mask && build.writers > 1;  // else who wrote it has left
+  if (!GetsMask(build.Coding().format) || isWritten) return nullptr;
   build.mask = std::make_unique<LevelBuild>(MaskCodingOf(build.Coding()), build.FirstEnd());
-  if (!HasTilesOf(before, *build.mask)) before = {};
+  StoredMask before = MaskBefore(level, *build.mask);
   std::vector<unsigned>& done = maskedChannels_[level];
   const bool joins =
       !done.empty() && std::none_of(channels.begin(), channels.end(), [&](unsigned c) {
@@ -52,12 +75,12 @@ LevelValidity TiffLevelStore::OpenValidity(unsigned level, const std::vector<uns
   LevelValidity validity;
   if (!stored || !image.open) return validity;
   datasources::ValidityReaders readers;
-  bool isWhole = true;
-  if (image.hasMask && stored->mask)
+  const bool isMasked = GetsMask(stored->format);
+  bool isWhole = !isMasked || stored->mask;
+  if (isMasked && stored->mask)
     readers.push_back(
         OpenTiffMask(file_->Path(), file_->Structure().directories[*stored->mask].offset));
-  else if (image.hasMask) isWhole = false;
-  const unsigned alpha = image.alphaChannel;
+  const unsigned alpha = BlursAlpha(stored->format) ? 0 : image.alphaChannel;
   const auto found = std::find(channels.begin(), channels.end(), alpha);
   if (alpha != 0 && stored->isOurs && stored->metadata.validity[alpha - 1] == kAbsent)
     isWhole = false;

@@ -74,6 +74,7 @@ LevelRoom TiffLevelStore::RoomOf(const std::vector<unsigned>& levels,
   for (const unsigned level : levels) {
     if (settings_.image.width / level == 0 || settings_.image.height / level == 0) continue;
     const LevelCoding coding = PendingFor(level).coding;
+    room.blursAlpha = room.blursAlpha || BlursAlpha(coding.format);
     const auto planes = static_cast<uint32_t>(PlanesOf(coding, channels).size());
     size += StoredSizeOf(coding, planes, structure.isBig);
   }

@@ -57,8 +57,9 @@ LevelMetadata TiffLevelStore::MetadataFor(unsigned level, const Pending& pending
   return metadata;
 }
 
+/// \param mask  of the level, complete; null for none
 void TiffLevelStore::AddDirectory(const Pending& pending, const LevelMetadata& metadata,
-                                  const std::vector<uint32_t>& planes) {
+                                  const std::vector<uint32_t>& planes, const LevelBuild* mask) {
   const TiffStructure& structure = file_->Structure();
   const LevelBuild& build = *pending.build;
   const StoredLevel* before = Find(metadata.level);
@@ -82,14 +83,14 @@ void TiffLevelStore::AddDirectory(const Pending& pending, const LevelMetadata& m
              : PlaceOfNew(file_->File(), structure, settings_.image, format.width, format.height);
   std::optional<uint64_t> strayMask;
   if (before && before->mask) {
-    const TiffDirectory& mask = structure.directories[*before->mask];
-    if (*before->mask == before->index + 1) place.next = mask.next;
-    else strayMask = mask.offset;
+    const TiffDirectory& there = structure.directories[*before->mask];
+    if (*before->mask == before->index + 1) place.next = there.next;
+    else strayMask = there.offset;
   }
-  if (build.mask) {
+  if (mask) {
     const bool isFirst = place.linkPosition == structure.HeadLinkPosition();
-    place.next = file_->ToAppend().AppendDirectory(
-        MaskEntriesOf(*build.mask, structure.isBig, isFirst), place.next);
+    place.next = file_->ToAppend().AppendDirectory(MaskEntriesOf(*mask, structure.isBig, isFirst),
+                                                   place.next);
   }
   file_->Link(place, file_->ToAppend().AppendDirectory(std::move(entries), place.next));
   TidyMasks(strayMask);
@@ -110,18 +111,18 @@ void TiffLevelStore::TidyMasks(std::optional<uint64_t> strayMask) {
   if (!changes.empty()) file_->Sync();
 }
 
-/// Whether finished channels are kept back, and keeps them: other programs would show a level of
-/// which the rest is empty. What is kept back is lost when the program is killed.
+/// Whether finished channels are kept back, and keeps them and their mask: other programs would
+/// show a level of which the rest is empty. What is kept back is lost when the program is killed.
 /// \param image  that they were computed from
 bool TiffLevelStore::Waits(unsigned level, Pending& pending, const std::vector<unsigned>& channels,
                            const datasources::ImageRecord& image) const {
-  const bool joinsMasks = settings_.validity.hasMask;  // from channel to channel, in the file
-  if (!pending.coding.format.planar || joinsMasks || FindOurs(level)) return false;
+  if (!pending.coding.format.planar || FindOurs(level)) return false;
   std::set<unsigned> all(pending.waiting.begin(), pending.waiting.end());
   all.insert(channels.begin(), channels.end());
   pending.waiting.assign(all.begin(), all.end());
   pending.waitingImage = image;
   pending.waitingSource = lastRead_;
+  if (pending.build->mask) pending.waitingMask = std::move(pending.build->mask);
   return pending.waiting.size() < settings_.image.samples;
 }
 
@@ -139,7 +140,8 @@ void TiffLevelStore::StoreAllWaitingBut(unsigned level) {
   for (const unsigned other : levels) StoreWaiting(other);
 }
 
-/// Stores `channels` and those that wait, and marks them valid.
+/// Stores `channels` and those that wait, and marks them valid. What is being written of another
+/// mask meanwhile stays.
 void TiffLevelStore::StoreFinished(unsigned level, Pending& pending,
                                    const std::vector<unsigned>& channels,
                                    const datasources::ImageRecord& image) {
@@ -147,13 +149,17 @@ void TiffLevelStore::StoreFinished(unsigned level, Pending& pending,
   all.insert(pending.waiting.begin(), pending.waiting.end());
   pending.waiting.clear();
   const std::vector<unsigned> finished(all.begin(), all.end());
-  Store(level, pending, PlanesOf(pending.coding, finished), image);
+  std::unique_ptr<LevelBuild> mask =
+      std::move(pending.waitingMask ? pending.waitingMask : pending.build->mask);
+  Store(level, pending, PlanesOf(pending.coding, finished), std::move(mask), image);
   MarkStored(level, finished, true);
 }
 
 /// Puts the tiles of `planes` into the level's directory; its validity is turned on by nobody here.
+/// \param mask   of all channels of the level; null for none
 /// \param image  that they were computed from; none: what the level remembers stays
 void TiffLevelStore::Store(unsigned level, Pending& pending, const std::vector<uint32_t>& planes,
+                           std::unique_ptr<LevelBuild> mask,
                            const std::optional<datasources::ImageRecord>& image) {
   const std::shared_ptr<LevelBuild> build = pending.build;
   file_->Sync();
@@ -161,11 +167,11 @@ void TiffLevelStore::Store(unsigned level, Pending& pending, const std::vector<u
   const StoredLevel* before = pending.isRecoded ? nullptr : FindOurs(level);
   const datasources::ImageRecord kept =
       before ? before->metadata.image : datasources::ImageRecord();
-  AddDirectory(pending, MetadataFor(level, pending, before, image.value_or(kept)), planes);
+  AddDirectory(pending, MetadataFor(level, pending, before, image.value_or(kept)), planes,
+               mask.get());
   pending.isRecoded = false;
   Reload();
   for (const uint32_t plane : planes) build->Release(plane);
-  build->mask.reset();
   if (!build->IsEmpty()) return;
   build->isClosed = true;
   pending_.erase(level);

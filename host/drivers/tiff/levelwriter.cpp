@@ -2,6 +2,8 @@
 #include "host/drivers/tiff/levelwriter.h"
 
 #include <algorithm>
+#include <bit>
+#include <cstddef>
 #include <cstring>
 #include <functional>
 #include <numeric>
@@ -94,9 +96,10 @@ void LevelWriter::WriteMask(const Raster& block) {
   if (mask_) mask_->Write(block);
 }
 
-/// Opacity of pixels without data is 0, whatever value their channels were filled with.
-void LevelWriter::ClearAlpha(const Raster& block, const Piece& piece,
-                             const std::vector<unsigned>& positions, OpenTile& to) const {
+/// Opacity tells what holds data: it is 0 in pixels without, whatever value their channels were
+/// filled with, and 1 at least in the others, where bicubic may have gone below.
+void LevelWriter::SettleAlpha(const Raster& block, const Piece& piece,
+                              const std::vector<unsigned>& positions, OpenTile& to) const {
   const auto isAlpha = [this](unsigned position) {
     return channels_[position] == store_.AlphaChannel();
   };
@@ -104,11 +107,15 @@ void LevelWriter::ClearAlpha(const Raster& block, const Piece& piece,
   if (!block.validity || alpha == positions.end()) return;
   const uint64_t sample = format_.SampleBytes();
   const uint64_t inTile = format_.planar ? 0 : channels_[*alpha] - 1;
+  const bool isCounted = !format_.type.isFloat && !format_.type.isComplex;
   for (uint32_t y = piece.y; y < piece.y + piece.height; ++y)
     for (uint32_t x = piece.x; x < piece.x + piece.width; ++x) {
-      if (block.validity->IsValid(int64_t{x} - block.x, int64_t{y} - block.y)) continue;
       const uint64_t pixel = uint64_t{y - piece.tileY} * format_.tileWidth + (x - piece.tileX);
-      std::memset(&to.samples[(pixel * format_.TileSamples() + inTile) * sample], 0, sample);
+      uint8_t* opacity = &to.samples[(pixel * format_.TileSamples() + inTile) * sample];
+      if (!block.validity->IsValid(int64_t{x} - block.x, int64_t{y} - block.y))
+        std::memset(opacity, 0, sample);
+      else if (isCounted && std::count(opacity, opacity + sample, 0) == std::ptrdiff_t(sample))
+        opacity[std::endian::native == std::endian::little ? 0 : sample - 1] = 1;
     }
 }
 
@@ -132,7 +139,7 @@ void LevelWriter::WriteInto(const Raster& block, const Piece& piece, uint32_t pl
     open = tiles_.emplace(tile, MakeTile(tile, piece)).first;
   }
   CopyPixels(block, piece, positions, open->second);
-  ClearAlpha(block, piece, positions, open->second);
+  SettleAlpha(block, piece, positions, open->second);
   Cover(piece, format_.tileWidth, open->second);
   if (open->second.missing > 0) return;
   Finish(tile, plane, piece, open->second.samples);

@@ -79,8 +79,8 @@ class LevelWriter final : public datasources::ReaderState<datasources::IRasterWr
   PixelFormat format_;
 
   void WriteMask(const gobs::Raster& block);
-  void ClearAlpha(const gobs::Raster& block, const Piece& piece,
-                  const std::vector<unsigned>& positions, OpenTile& tile) const;
+  void SettleAlpha(const gobs::Raster& block, const Piece& piece,
+                   const std::vector<unsigned>& positions, OpenTile& tile) const;
 
   // opened by the first Read
   std::unique_ptr<PixelReader> reader_;

@@ -94,9 +94,11 @@ LevelDescription TiffLevelStore::Describe(const StoredLevel& stored,
   entry.place = settings_.place;
   entry.file = file_->Path();
   entry.method = stored.metadata.method;
+  entry.hasMask = stored.mask.has_value();
   entry.status = status;
   const std::string& validity = stored.metadata.validity;
-  const bool lacksMask = settings_.validity.hasMask && !stored.mask;
+  const bool lacksMask = GetsMask(stored.format) && !stored.mask;
+  if (stored.isOurs && lacksMask && !isStale) entry.status = datasources::LevelStatus::kUnfinished;
   for (uint32_t i = 0; i < settings_.image.samples; ++i) {
     entry.presentChannels.push_back(!stored.isOurs || validity[i] != kAbsent);
     entry.validChannels.push_back(!stored.isOurs ||
@@ -271,6 +273,17 @@ TilePlace TiffLevelStore::AppendTile(const std::vector<uint8_t>& bytes) {
   return {appender->Append(bytes), bytes.size()};
 }
 
+std::vector<uint8_t> TiffLevelStore::ReadAppended(TilePlace place) const {
+  const PositionedFile* file = nullptr;
+  {
+    const std::lock_guard lock(mutex_);
+    file = &file_->File();
+  }
+  std::vector<uint8_t> bytes(place.count);
+  file->Read(place.offset, bytes.data(), bytes.size());
+  return bytes;
+}
+
 void TiffLevelStore::GiveUp(unsigned level, LevelBuild& build) {
   build.isClosed = true;
   pending_.erase(level);
@@ -288,7 +301,7 @@ void TiffLevelStore::EndWriting(unsigned level, LevelBuild& build) noexcept {
   try {
     if (isWaited) StoreWaiting(level);
     else if (!build.IsEmpty() && build.HasOnlyCompletePlanes())
-      Store(level, pending_.at(level), CompletePlanes(build), std::nullopt);
+      Store(level, pending_.at(level), CompletePlanes(build), std::move(build.mask), std::nullopt);
   } catch (const std::exception&) {
     // deliberate: a destructor calls this; the level stays what it was in the file
   }

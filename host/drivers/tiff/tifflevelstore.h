@@ -32,7 +32,8 @@ std::unique_ptr<datasources::ILevelStore> OpenInternalLevels(
 /// A level appears in the file when it is complete: tiles first, then its directory, then the link
 /// to it, then its validity, each durable before the next. Until then it is pending here; a pending
 /// level that is given up leaves nothing behind. A new level of planes appears with all of its
-/// channels: finished ones wait for the others, as long as the level is the one being made.
+/// channels and their mask: finished ones wait for the others, as long as the level is the one
+/// being made.
 ///
 /// Operations may be called from several threads.
 class TiffLevelStore final : public datasources::ILevelStore {
@@ -73,6 +74,8 @@ class TiffLevelStore final : public datasources::ILevelStore {
   std::shared_ptr<LevelBuild> BeginWriting(unsigned level, const std::vector<unsigned>& channels);
   /// Adds a tile to the file. \returns where it is
   TilePlace AppendTile(const std::vector<uint8_t>& bytes);
+  /// The bytes of a tile that was added.
+  std::vector<uint8_t> ReadAppended(TilePlace place) const;
   /// A writer of the mask of a level that is being written; null when levels get none, or the build
   /// has one already.
   std::unique_ptr<LevelMaskWriter> BeginMask(unsigned level, const std::vector<unsigned>& channels,
@@ -96,8 +99,11 @@ class TiffLevelStore final : public datasources::ILevelStore {
     std::vector<unsigned> waiting;          ///< channels that are finished and wait for the others
     datasources::ImageRecord waitingImage;  ///< what these were computed from
     unsigned waitingSource = 0;             ///< and from which level; 0 as for `lastRead_`
+    std::unique_ptr<LevelBuild> waitingMask;  ///< of these; null when they have none
   };
 
+  bool BlursAlpha(const PixelFormat& level) const;
+  bool GetsMask(const PixelFormat& level) const;
   const StoredLevel* Find(unsigned level) const;
   const StoredLevel* FindOurs(unsigned level) const;
   void Reload();
@@ -135,9 +141,11 @@ class TiffLevelStore final : public datasources::ILevelStore {
                      const datasources::ImageRecord& image);
   void MarkStored(unsigned level, const std::vector<unsigned>& channels, bool valid);
   void Store(unsigned level, Pending& pending, const std::vector<uint32_t>& planes,
+             std::unique_ptr<LevelBuild> mask,
              const std::optional<datasources::ImageRecord>& image);
   void AddDirectory(const Pending& pending, const LevelMetadata& metadata,
-                    const std::vector<uint32_t>& planes);
+                    const std::vector<uint32_t>& planes, const LevelBuild* mask);
+  StoredMask MaskBefore(unsigned level, const LevelBuild& mask);
   void TidyMasks(std::optional<uint64_t> strayMask);
   std::vector<size_t> DirectoriesOf(const std::vector<unsigned>& levels) const;
   void RemoveStored(const std::vector<unsigned>& levels);

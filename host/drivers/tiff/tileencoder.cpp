@@ -87,6 +87,10 @@ bool ExchangesParts(const LevelCoding& coding) {
          coding.format.bitsPerSample == 16;
 }
 
+void ExchangeParts(std::vector<uint8_t>& samples) {
+  for (size_t i = 0; i + 1 < samples.size(); i += 2) std::swap(samples[i], samples[i + 1]);
+}
+
 }  // namespace
 
 TileEncoder::TileEncoder(const LevelCoding& coding, std::string file)
@@ -104,6 +108,18 @@ std::vector<uint8_t> TileEncoder::Pack(const std::vector<uint8_t>& samples) cons
   return packed;
 }
 
+std::vector<uint8_t> TileEncoder::Unpack(const std::vector<uint8_t>& packed) const {
+  const PixelFormat& format = coding_.format;
+  if (format.WholeBytes()) return packed;
+  const uint64_t count = uint64_t{format.tileWidth} * format.TileSamples();
+  const uint64_t packedRow = PackedBytes(count, format.bitsPerSample);
+  std::vector<uint8_t> samples(coding_.TileBytes());
+  for (uint32_t row = 0; row < format.tileHeight; ++row)
+    UnpackSamples(&packed[row * packedRow], format.bitsPerSample, count, format.type.isSigned,
+                  &samples[row * format.TileRowBytes()], format.SampleBytes());
+  return samples;
+}
+
 std::vector<uint8_t> TileEncoder::Encode(const std::vector<uint8_t>& samples,
                                          uint32_t plane) const {
   std::vector<uint8_t> packed = Pack(samples);  // a copy: bytes are turned round in place
@@ -111,17 +127,41 @@ std::vector<uint8_t> TileEncoder::Encode(const std::vector<uint8_t>& samples,
     coding_.byteOrder.Swap(packed, StoredUnit(coding_.format));
     return packed;
   }
-  if (ExchangesParts(coding_))
-    for (size_t i = 0; i + 1 < packed.size(); i += 2) std::swap(packed[i], packed[i + 1]);
-  // The floating point predictor has one order in every file, which libtiff 4.5 gets wrong in files
-  // of the other byte order.
-  const bool hasOwnOrder = coding_.predictor == PREDICTOR_FLOATINGPOINT;
-  const MemoryTiff memory(hasOwnOrder ? std::endian::native : coding_.byteOrder.order, file_);
+  if (ExchangesParts(coding_)) ExchangeParts(packed);
+  const MemoryTiff memory(CodecOrder(), file_);
   if (!SetLayout(memory.Get(), coding_) || !SetCodec(memory.Get(), coding_)) memory.Fail();
   const auto size = static_cast<tmsize_t>(packed.size());
   if (TIFFTileSize(memory.Get()) != size) memory.Fail();
   if (TIFFWriteEncodedTile(memory.Get(), plane, packed.data(), size) != size) memory.Fail();
   return memory.StoredTile(plane);
+}
+
+std::vector<uint8_t> TileEncoder::Decode(const std::vector<uint8_t>& stored, uint32_t plane) const {
+  const PixelFormat& format = coding_.format;
+  if (format.compression == COMPRESSION_NONE) {
+    std::vector<uint8_t> packed = stored;
+    coding_.byteOrder.Swap(packed, StoredUnit(format));
+    return Unpack(packed);
+  }
+  const MemoryTiff memory(CodecOrder(), file_);
+  if (!SetLayout(memory.Get(), coding_) || !SetCodec(memory.Get(), coding_)) memory.Fail();
+  std::vector<uint8_t> bytes = stored;  // a copy: libtiff takes no constant
+  const auto storedSize = static_cast<tmsize_t>(bytes.size());
+  if (TIFFWriteRawTile(memory.Get(), plane, bytes.data(), storedSize) != storedSize) memory.Fail();
+  // A handle that has written only has no buffer to read into.
+  if (!TIFFReadBufferSetup(memory.Get(), nullptr, storedSize)) memory.Fail();
+  std::vector<uint8_t> packed(static_cast<size_t>(TIFFTileSize(memory.Get())));
+  const auto size = static_cast<tmsize_t>(packed.size());
+  if (TIFFReadEncodedTile(memory.Get(), plane, packed.data(), size) != size) memory.Fail();
+  if (ExchangesParts(coding_)) ExchangeParts(packed);
+  return Unpack(packed);
+}
+
+/// The floating point predictor has one order in every file, which libtiff 4.5 gets wrong in files
+/// of the other byte order.
+std::endian TileEncoder::CodecOrder() const {
+  const bool hasOwnOrder = coding_.predictor == PREDICTOR_FLOATINGPOINT;
+  return hasOwnOrder ? std::endian::native : coding_.byteOrder.order;
 }
 
 bool TileEncoder::CanEncode(const LevelCoding& coding) {

@@ -1,7 +1,8 @@
-/// Encodes the tiles of a level with libtiff's codecs, in memory.
+/// Encodes the tiles of a level with libtiff's codecs, in memory, and decodes them again.
 // SPDX-License-Identifier: MIT
 #pragma once
 
+#include <bit>
 #include <cstdint>
 #include <string>
 #include <vector>
@@ -23,11 +24,17 @@ class TileEncoder {
   /// \throws orin::Exception  the codec fails; the text names the file and the reason
   std::vector<uint8_t> Encode(const std::vector<uint8_t>& samples, uint32_t plane) const;
 
+  /// The samples of a tile that was encoded so, as `Encode` takes them.
+  /// \throws orin::Exception  the codec does not know its own bytes again
+  std::vector<uint8_t> Decode(const std::vector<uint8_t>& stored, uint32_t plane) const;
+
   /// True when a tile of this coding can be written here, found out with one.
   static bool CanEncode(const LevelCoding& coding);
 
  private:
   std::vector<uint8_t> Pack(const std::vector<uint8_t>& samples) const;
+  std::vector<uint8_t> Unpack(const std::vector<uint8_t>& packed) const;
+  std::endian CodecOrder() const;
 
   LevelCoding coding_;
   std::string file_;

@@ -46,6 +46,7 @@ struct Layout {
   uint16_t photometric = PHOTOMETRIC_MINISBLACK;
   const char* mode = "w";  ///< "wb": big-endian, "w8": BigTIFF
   const char* noData = nullptr;
+  uint16_t alpha = 0;  ///< what the last sample means, EXTRASAMPLE_UNASSALPHA for one; 0: a colour
 
   uint32_t TileWidth() const { return tile ? tile : width; }
   uint32_t TileHeight() const { return tile ? tile : rowsPerStrip; }
@@ -162,6 +163,7 @@ inline void SetTags(TIFF* tiff, const Layout& layout) {
   } else {
     TIFFSetField(tiff, TIFFTAG_ROWSPERSTRIP, layout.rowsPerStrip);
   }
+  if (layout.alpha) TIFFSetField(tiff, TIFFTAG_EXTRASAMPLES, 1, &layout.alpha);
   if (layout.noData) {
     static const TIFFFieldInfo kNoData{42113,        -1, -1, TIFF_ASCII,
                                        FIELD_CUSTOM, 1,  0,  const_cast<char*>("no data")};

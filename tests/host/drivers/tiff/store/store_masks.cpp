@@ -18,6 +18,8 @@ using IsValid = std::function<bool(uint32_t, uint32_t)>;
 
 bool Checks(uint32_t x, uint32_t y) { return (x / 7 + y / 5) % 2 == 0; }
 bool Columns(uint32_t x, uint32_t) { return x % 3 != 0; }
+bool Corner(uint32_t x, uint32_t y) { return x > 60 && y > 40; }
+bool AnyOfThem(uint32_t x, uint32_t y) { return Checks(x, y) || Columns(x, y) || Corner(x, y); }
 
 /// Adds a mask of the image's size, all valid, as libtiff writes one.
 void AddImageMask(const std::string& file, uint16_t bits) {
@@ -139,17 +141,58 @@ TEST_P(StoredMasks, AreReadWithTheBlocksOfTheirLevel) {
 
 TEST_P(StoredMasks, BesideTheImageJoinTheChannelsOfOneRun) {
   const std::string sideCar = file_ + ".ovr";
-  auto dataset = OpenGeneric(file_);
+  for (const unsigned edge : {100u, 37u}) {
+    auto dataset = OpenGeneric(file_);
+    WriteLevel(*dataset, Checks, edge, {2});
+    WriteLevel(*dataset, Columns, edge, {1});
+    WriteLevel(*dataset, Corner, edge, {3});
+    EXPECT_EQ("1 4", TypesOf(sideCar));
+    EXPECT_EQ("", WrongMask(sideCar, 1, AnyOfThem)) << edge;
+    WriteLevel(*dataset, Columns, edge, {1});  // a channel again: another round
+    EXPECT_EQ("", WrongMask(sideCar, 1, Columns));
+    dataset.reset();
+    WriteLevel(*OpenGeneric(file_), Checks, edge, {3});
+    EXPECT_EQ("", WrongMask(sideCar, 1, Checks));
+    std::filesystem::remove(sideCar);
+  }
+}
+
+TEST_P(StoredMasks, BesideTheImageAppearWithAllChannelsOfTheirLevel) {
+  const std::string sideCar = file_ + ".ovr";
+  const auto dataset = OpenGeneric(file_);
   WriteLevel(*dataset, Checks, 100, {1});
-  WriteLevel(*dataset, Columns, 100, {2});
+  WriteLevel(*dataset, Checks, 100, {2});
+  EXPECT_FALSE(std::filesystem::exists(sideCar));
+  EXPECT_EQ("11-", ValidityOf(LevelsOf(*dataset).at(0)));
+  WriteLevel(*dataset, Checks, 100, {3});
+  EXPECT_EQ("1 4", TypesOf(sideCar));
+  EXPECT_EQ("111", ValidityOf(LevelsOf(*OpenGeneric(file_)).at(0)));
+  EXPECT_EQ("", WrongMask(sideCar, 1, Checks));
+}
+
+TEST_P(StoredMasks, OfFinishedChannelsStayWhenTheNextOneFails) {
+  const std::string sideCar = file_ + ".ovr";
+  {
+    const auto dataset = OpenGeneric(file_);
+    WriteLevel(*dataset, Corner, 37, {1});
+    WriteLevel(*dataset, Columns, 37, {3});
+    EXPECT_THROW(WriteLevel(*dataset, Checks, 37, {2}, 4), Exception);
+  }
+  EXPECT_EQ("101", ValidityOf(LevelsOf(*OpenGeneric(file_)).at(0)));
   EXPECT_EQ("1 4", TypesOf(sideCar));
   EXPECT_EQ("", WrongMask(sideCar, 1,
-                          [](uint32_t x, uint32_t y) { return Checks(x, y) || Columns(x, y); }));
-  WriteLevel(*dataset, Columns, 100, {1});  // a channel again: another round
-  EXPECT_EQ("", WrongMask(sideCar, 1, Columns));
-  dataset.reset();
-  WriteLevel(*OpenGeneric(file_), Checks, 100, {3});
-  EXPECT_EQ("", WrongMask(sideCar, 1, Checks));
+                          [](uint32_t x, uint32_t y) { return Corner(x, y) || Columns(x, y); }));
+}
+
+TEST_P(StoredMasks, OfFinishedChannelsStandBesideTheImageWhenTheRunEnds) {
+  WriteLevel(*OpenGeneric(file_), Checks, 100, {2});
+  EXPECT_EQ("-1-", ValidityOf(LevelsOf(*OpenGeneric(file_)).at(0)));
+  EXPECT_EQ("", WrongMask(file_ + ".ovr", 1, Checks));
+  const auto dataset = OpenGeneric(file_);  // in the file they are joined as well
+  WriteLevel(*dataset, Columns, 100, {1});
+  WriteLevel(*dataset, Corner, 100, {3});
+  EXPECT_EQ("", WrongMask(file_ + ".ovr", 1,
+                          [](uint32_t x, uint32_t y) { return Corner(x, y) || Columns(x, y); }));
 }
 
 TEST_P(StoredMasks, ThatStayTheSameKeepTheirTiles) {

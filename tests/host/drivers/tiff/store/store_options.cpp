@@ -79,6 +79,27 @@ TEST_F(TiffStore, PredictorSuitsTheSamplesUnlessTheUserSaysOtherwise) {
   EXPECT_EQ("", WrongTile(file, 1, LevelLayout(floats, 2)));
 }
 
+TEST_F(TiffStore, LevelOfAJpegImageWithAlphaIsJpegOnlyWhenTheUserSaysSo) {
+  const std::string file = folder_.File("image.tif");
+  Layout image = kImage;
+  image.samples = 4;
+  image.compression = COMPRESSION_JPEG;
+  EXPECT_EQ(COMPRESSION_JPEG, LevelWith(file, image, {}).compression);
+  for (const uint16_t alpha : {EXTRASAMPLE_ASSOCALPHA, EXTRASAMPLE_UNASSALPHA})
+    for (const bool planar : {false, true})
+      for (const char* mode : {"w", "wb"}) {
+        image.alpha = alpha;
+        image.planar = planar;
+        image.mode = mode;
+        const Seen level = LevelWith(file, image, {});
+        EXPECT_EQ(COMPRESSION_ADOBE_DEFLATE, level.compression);
+        EXPECT_EQ(2, level.predictor);
+        EXPECT_EQ(planar ? PLANARCONFIG_SEPARATE : PLANARCONFIG_CONTIG, level.planar);
+        EXPECT_EQ("", WrongTile(file, 1, LevelLayout(image, 2)));
+        EXPECT_EQ(COMPRESSION_JPEG, LevelWith(file, image, {"COMPRESS=JPEG"}).compression);
+      }
+}
+
 TEST_F(TiffStore, OptionThatDoesNotFitIsNamedAndNothingIsWritten) {
   const std::string file = folder_.File("image.tif");
   Layout wide = kImage;

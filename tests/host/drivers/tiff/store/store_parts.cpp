@@ -282,6 +282,33 @@ TEST_F(Parts, EncoderNamesTheFileAndTheCodecsReason) {
   }
 }
 
+TEST_F(Parts, EncoderDecodesWhatItEncoded) {
+  for (const uint16_t codec : {COMPRESSION_NONE, COMPRESSION_ADOBE_DEFLATE, COMPRESSION_LZW})
+    for (const auto& [type, bits] : {std::pair{gobs::eDT_BIT, 1u},
+                                     {gobs::eDT_8U, 8u},
+                                     {gobs::DataTypeOf<uint16_t>(), 12u},
+                                     {gobs::DataTypeOf<float>(), 32u}})
+      for (const std::endian order : {std::endian::little, std::endian::big}) {
+        drivers::LevelCoding coding = drivers::PlainCoding(48, 32, 1, type, "");
+        coding.format.tileWidth = 48;
+        coding.format.tileHeight = 32;
+        coding.format.compression = codec;
+        coding.format.bitsPerSample = bits;
+        coding.byteOrder.order = order;
+        const bool predicts = bits % 8 == 0 && codec != COMPRESSION_NONE;
+        coding.predictor = predicts ? drivers::UsualPredictor(coding.format) : PREDICTOR_NONE;
+        std::vector<uint8_t> samples(coding.TileBytes());
+        const uint32_t bytes = coding.format.SampleBytes();
+        for (size_t i = 0; i < samples.size(); ++i) {
+          const bool isHigh = i % bytes == 1 && bits == 12;  // the upper part of 12 bits
+          samples[i] = static_cast<uint8_t>((i * i / 7) & (bits == 1 ? 1 : isHigh ? 15 : 255));
+        }
+        const drivers::TileEncoder encoder(coding, "scene.tif");
+        EXPECT_EQ(samples, encoder.Decode(encoder.Encode(samples, 0), 0))
+            << codec << ", " << bits << " bits";
+      }
+}
+
 TEST_F(Parts, LevelWithTooManyTilesIsRefusedBeforeAnythingIsReserved) {
   const auto image = drivers::PlainCoding(4294967295u, 4294967295u, 1, gobs::eDT_8U, "");
   EXPECT_NO_THROW(drivers::CodingOfLevel(image, 4000, "scene.tif"));

@@ -56,6 +56,34 @@ TEST_F(TiffStore, RoomOfCompressedLevelsFollowsTheImage) {
   EXPECT_LT(rooms[0], rooms[1]);
 }
 
+TEST_F(TiffStore, RoomOfALevelThatIsNoJpegAlthoughItsImageIsOneIsThatOfItsOwnCodec) {
+  Layout image{.width = 1024,
+               .height = 1024,
+               .samples = 4,
+               .tile = 64,
+               .compression = COMPRESSION_JPEG,
+               .photometric = PHOTOMETRIC_RGB};
+  const std::string file = folder_.File("image.tif");
+  std::vector<uint32_t> skipped(200);  // of 256 tiles: few bytes for many samples
+  std::iota(skipped.begin(), skipped.end(), 0u);
+  WriteImage(file, image, skipped);
+  const uint64_t asJpeg = std::filesystem::file_size(file) / 4;
+  EXPECT_NEAR(double(asJpeg), double(RoomFor(*Open(file, datasources::kReadOnly), {2}).bytes),
+              kDirectories);
+  image.alpha = EXTRASAMPLE_UNASSALPHA;
+  WriteImage(file, image, skipped);
+  const LevelRoom room = RoomFor(*Open(file, datasources::kReadOnly), {2});
+  EXPECT_LE(512u * 512 * 4 / 2, room.bytes);  // half the samples
+  EXPECT_FALSE(room.blursAlpha);
+  datasources::LevelOptions options;
+  EXPECT_EQ("", datasources::ReadLevelOption("COMPRESS=JPEG", options));
+  datasources::SetLevelOptions(options);
+  const LevelRoom blurred = RoomFor(*Open(file, datasources::kReadOnly), {2});
+  datasources::SetLevelOptions({});
+  EXPECT_TRUE(blurred.blursAlpha);
+  EXPECT_NEAR(double(asJpeg), double(blurred.bytes), kDirectories);
+}
+
 TEST_F(TiffStore, RoomOfOneChannelBesideTheFileIsItsPlanes) {
   const Layout image{.width = 1024, .height = 1024, .samples = 4, .tile = 64};
   const std::string file = folder_.File("image.tif");
