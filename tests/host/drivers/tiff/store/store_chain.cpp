@@ -142,6 +142,7 @@ TEST_F(Chain, RebuildByAnotherMethodTakesThePlaceOfTheOldDirectory) {
   Build(file_, kImage, {.level = 2});
   Build(file_, kImage, {.level = 4});
   const auto before = DirectoriesOf(file_);
+  const std::ifstream reader(file_);  // so that it stays where it was built
   Build(file_, kImage, {.level = 2, .method = "AVERAGE"});
   EXPECT_EQ("401x301 200x150 100x75", SizesOf(file_));
   EXPECT_NE(before[1].offset, DirectoriesOf(file_)[1].offset);
