@@ -157,7 +157,16 @@ class MaskFilesThatCannotServe(MaskCase):
     def test_no_tiff_at_all(self):
         with open(self.file + ".msk", "wb") as mask:
             mask.write(b"mask")
-        self.check("tiff", "")
+        self.check("tiff", "it is no TIFF")
+
+    def test_a_damaged_one_ends_the_build(self):
+        """Nobody knows then which pixels hold data."""
+        write_mask_beside(self.file, self.valid)
+        os.truncate(self.file + ".msk", 20)
+        answer = run("build", self.file, "--levels", "2")
+        self.assertNotEqual(0, answer.returncode)
+        self.assertIn("scene.tif.msk: cannot be read", answer.stderr)
+        self.assertEqual([], overview_sizes(self.file))
 
 
 if __name__ == "__main__":

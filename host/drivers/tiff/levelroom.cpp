@@ -3,6 +3,7 @@
 #include <utility>
 
 #include "host/datasources/levelroom.h"
+#include "host/drivers/tiff/levelmask.h"
 #include "host/drivers/tiff/storedsize.h"
 #include "host/drivers/tiff/tifflevelstore.h"
 #include "host/services/text.h"
@@ -12,19 +13,25 @@ namespace orin::drivers {
 using datasources::BigTiff;
 using datasources::LevelRoom;
 
-namespace {
+/// What a level of `planes` planes takes, with its mask where it gets one.
+StoredSize TiffLevelStore::SizeOf(const LevelCoding& level, uint32_t planes, bool isBig) const {
+  StoredSize size = StoredSizeOf(level, planes, isBig);
+  if (GetsMask(level.format)) size += StoredSizeOf(MaskCodingOf(level), 1, isBig);
+  return size;
+}
 
 /// What the user wishes, else whether the usual pyramids and this level could pass the limit.
-bool BecomesBig(const ImageShape& image, const LevelCoding& level) {
+bool TiffLevelStore::BecomesBig(const LevelCoding& level) const {
   constexpr uint64_t kSaferBytes = uint64_t{1} << 31;
   const BigTiff wish = datasources::CurrentLevelOptions().bigTiff;
   if (wish == BigTiff::kYes || wish == BigTiff::kNo) return wish == BigTiff::kYes;
-  const uint64_t most = MostBytesOfPyramids(image.width, image.height, level) +
-                        StoredSizeOf(level, level.Planes(), true).most;
+  const ImageShape& image = settings_.image;
+  uint64_t most = MostBytesOfPyramids(image.width, image.height, level) +
+                  SizeOf(level, level.Planes(), true).most;
+  if (GetsMask(level.format))
+    most += MostBytesOfPyramids(image.width, image.height, MaskCodingOf(level));
   return most > (wish == BigTiff::kIfSafer ? kSaferBytes : kClassicBytes);
 }
-
-}  // namespace
 
 /// A stored level of ours keeps its form unless the user's options are to give it another.
 TiffLevelStore::Pending TiffLevelStore::PendingFor(unsigned level) const {
@@ -76,7 +83,7 @@ LevelRoom TiffLevelStore::RoomOf(const std::vector<unsigned>& levels,
     const LevelCoding coding = PendingFor(level).coding;
     room.blursAlpha = room.blursAlpha || BlursAlpha(coding.format);
     const auto planes = static_cast<uint32_t>(PlanesOf(coding, channels).size());
-    size += StoredSizeOf(coding, planes, structure.isBig);
+    size += SizeOf(coding, planes, structure.isBig);
   }
   if (size.most == 0) return room;
   room.file = file_->Path();
@@ -91,7 +98,7 @@ LevelRoom TiffLevelStore::RoomOf(const std::vector<unsigned>& levels,
 /// Makes sure, or throws; a file not yet made becomes a BigTIFF where that is needed.
 void TiffLevelStore::RequireRoomFor(unsigned level, const std::vector<unsigned>& channels) {
   datasources::RequireRoom(RoomOf({level}, channels));
-  if (!file_->Exists() && BecomesBig(settings_.image, PendingFor(level).coding)) file_->BecomeBig();
+  if (!file_->Exists() && BecomesBig(PendingFor(level).coding)) file_->BecomeBig();
 }
 
 }  // namespace orin::drivers

@@ -1,25 +1,19 @@
 // SPDX-License-Identifier: MIT
 #include "host/drivers/tiff/tiffdriver.h"
 
-#include <array>
 #include <fstream>
 #include <memory>
 #include <string>
-#include <string_view>
 
 #include <sys/stat.h>
 
 #include "host/datasources/formats.h"
 #include "host/drivers/tiff/sidecar.h"
+#include "host/drivers/tiff/tiffmagic.h"
 #include "host/drivers/tiff/tiffsource.h"
 
 namespace orin::drivers {
 namespace {
-
-using namespace std::string_view_literals;
-
-constexpr std::array kMagics = {"II*\0"sv, "MM\0*"sv, "II+\0"sv,
-                                "MM\0+"sv};  // classic, then BigTIFF
 
 class TiffDriver final : public datasources::IFormatDriver {
  public:
@@ -30,12 +24,10 @@ class TiffDriver final : public datasources::IFormatDriver {
   ZMBFormatType Identify(const std::string& file) const override {
     struct stat status;
     if (stat(file.c_str(), &status) != 0 || !S_ISREG(status.st_mode)) return kFormatUnknown;
-    std::array<char, 4> magic{};
+    TiffMagic magic{};
     if (!std::ifstream(file, std::ios::binary).read(magic.data(), magic.size()))
       return kFormatUnknown;
-    for (const std::string_view known : kMagics)
-      if (known == std::string_view(magic.data(), magic.size())) return kFormatTiff;
-    return kFormatUnknown;
+    return IsTiff(magic) ? kFormatTiff : kFormatUnknown;
   }
 
   std::unique_ptr<datasources::IRasterSource> Open(const std::string& file,

@@ -17,6 +17,7 @@
 #include "host/drivers/tiff/levelfreshness.h"
 #include "host/drivers/tiff/levelmask.h"
 #include "host/drivers/tiff/pixelreader.h"
+#include "host/drivers/tiff/storedsize.h"
 
 namespace orin::drivers {
 
@@ -104,6 +105,8 @@ class TiffLevelStore final : public datasources::ILevelStore {
 
   bool BlursAlpha(const PixelFormat& level) const;
   bool GetsMask(const PixelFormat& level) const;
+  StoredSize SizeOf(const LevelCoding& level, uint32_t planes, bool isBig) const;
+  bool BecomesBig(const LevelCoding& level) const;
   const StoredLevel* Find(unsigned level) const;
   const StoredLevel* FindOurs(unsigned level) const;
   void Reload();

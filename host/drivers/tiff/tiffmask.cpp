@@ -12,6 +12,8 @@
 
 #include "host/drivers/tiff/gdalmetadata.h"
 #include "host/drivers/tiff/pixelreader.h"
+#include "host/drivers/tiff/positionedfile.h"
+#include "host/drivers/tiff/tiffmagic.h"
 #include "host/services/exception.h"
 #include "host/services/text.h"
 #include "host/services/warning.h"
@@ -44,8 +46,13 @@ bool IsMaskFormat(const PixelFormat& format) {
   return format.samplesPerPixel == 1 && format.SampleBytes() == 1;
 }
 
-/// What keeps the file from being a mask of the image, empty when nothing does.
+/// What keeps the file from being a mask of the image, empty when nothing does. A file that cannot
+/// be read is another matter: nobody knows then which pixels hold data.
 std::string ReasonAgainst(const std::string& path, unsigned width, unsigned height) {
+  const PositionedFile file(path, PositionedFile::Mode::kRead);
+  TiffMagic magic{};
+  if (file.Size() >= magic.size()) file.Read(0, magic.data(), magic.size());
+  if (!IsTiff(magic)) return _("it is no TIFF");
   const TiffHandle tiff = TiffHandle::OpenAt(path, 0);
   const PixelFormat format = FormatOf(tiff);
   if (format.width != width || format.height != height)
@@ -65,14 +72,6 @@ std::string MaskFileOf(const std::string& imageFile) {
   const std::string path = imageFile + ".msk";
   std::error_code ignored;
   return std::filesystem::is_regular_file(path, ignored) ? path : "";
-}
-
-std::string ReasonOrFailure(const std::string& path, unsigned width, unsigned height) {
-  try {
-    return ReasonAgainst(path, width, height);
-  } catch (const Exception& failure) {
-    return failure.GetMessage();
-  }
 }
 
 /// An image is opened several times by one build.
@@ -114,7 +113,7 @@ std::unique_ptr<IValidityReader> OpenMaskBeside(const std::string& imageFile, un
                                                 unsigned height) {
   const std::string path = MaskFileOf(imageFile);
   if (path.empty()) return nullptr;
-  const std::string reason = ReasonOrFailure(path, width, height);
+  const std::string reason = ReasonAgainst(path, width, height);
   if (reason.empty()) return OpenTiffMask(path, 0);
   WarnOnce(FormatString(_("%s: is not used as the mask of its image: %s."), path.c_str(),
                         reason.c_str()));

@@ -25,6 +25,7 @@ std::optional<uint64_t> FindImageMask(const PositionedFile& file, const TiffStru
 
 /// A reader of the file `IMAGEFILE.msk` if it says how it applies, and to all channels alike. Null
 /// without one; the user is warned of a file that cannot serve.
+/// \throws orin::Exception  there is such a file, and it cannot be read
 std::unique_ptr<datasources::IValidityReader> OpenMaskBeside(const std::string& imageFile,
                                                              unsigned width, unsigned height);
 
