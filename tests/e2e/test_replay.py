@@ -21,6 +21,8 @@ KINDS = {
 
 
 class Replayed(Case):
+    name = "image.tif"
+
     def setUp(self):
         super().setUp()
         self.pixels = random_pixels((2, SIZE[1], SIZE[0]), numpy.uint8, 8)
@@ -34,7 +36,7 @@ class Replayed(Case):
         shutil.copytree(self.original, self.recorded)
         log = self.path("log")
         self.assertRan(disklog.run(self.recorded, *arguments[:1],
-                                   os.path.join(self.recorded, "image.tif"), *arguments[1:],
+                                   os.path.join(self.recorded, self.name), *arguments[1:],
                                    log=log))
         return disklog.changes_in(log)
 
@@ -47,7 +49,7 @@ class Replayed(Case):
             change.apply(lambda path: names.get(path, path).replace(self.recorded, self.replayed))
             if change.name == "rename":
                 names[change.paths[0]] = change.paths[1]
-        return os.path.join(self.replayed, "image.tif")
+        return os.path.join(self.replayed, self.name)
 
     def levels(self, image):
         """{factor: pixels} as GDAL reads them."""
@@ -78,7 +80,7 @@ class Replayed(Case):
     def check_all(self, arguments):
         """Every prefix of the run, and every loss of one write that no sync followed."""
         changes = self.record(*arguments)
-        recorded = os.path.join(self.recorded, "image.tif")
+        recorded = os.path.join(self.recorded, self.name)
         expected = self.levels(recorded)
         self.assertGreater(len(changes), 3)
         for count in range(len(changes) + 1):

@@ -1,0 +1,69 @@
+/// How levels leave an ERDAS Imagine file, and how the space goes that replaced and removed levels
+/// had.
+// SPDX-License-Identifier: MIT
+#include <fcntl.h>
+#include <sys/stat.h>
+#include <unistd.h>
+
+#include <algorithm>
+#include <optional>
+
+#include "host/drivers/gdal/hfalevelstore.h"
+#include "host/drivers/gdal/hfaremoval.h"
+#include "host/drivers/gdal/hfaspace.h"
+#include "host/services/filealone.h"
+#include "host/services/text.h"
+
+namespace orin::drivers {
+
+void HfaLevelStore::Remove(const std::vector<unsigned>& levels) {
+  const std::lock_guard lock(mutex_);
+  std::vector<std::string> items;
+  std::optional<unsigned> going;
+  for (const auto& names : pyramid_.channels)
+    for (const HfaLevelName& name : names)
+      if (std::find(levels.begin(), levels.end(), name.factor) != levels.end()) {
+        going = name.factor;
+        items.push_back(HfaRecordKey(name.factor));
+      }
+  if (!going) return;
+  if (!mayChange_) Fail(_("%s: is open for reading only; level %u cannot be removed."), *going);
+  LockFile();
+  BeginChange();
+  const ByteRanges removed = RemoveHfaLevels(path_, levels, items);
+  freed_.Add(removed);
+  Reload();
+  GiveBackSpace(removed);
+  Settle();
+}
+
+/// Cuts off the end of the file that nothing uses, if nobody may be reading it.
+/// \param removed  what may be cut off even so: a level that was removed can no longer be read
+void HfaLevelStore::Shorten(const ByteRanges& removed) {
+  const HfaSpace space = FindHfaSpace(path_, freed_);
+  if (space.end >= space.size) return;
+  const auto cut = [&] {
+    struct stat now {};
+    const bool isSame = fstat(lock_, &now) == 0 && uint64_t(now.st_size) == space.size;
+    if (isSame && ftruncate(lock_, static_cast<off_t>(space.end)) == 0) fsync(lock_);
+  };
+  if (DoAlone(lock_, cut) != Alone::kDone && removed.Has(space.end, space.size)) cut();
+}
+
+/// Moves levels into the space of those that they replaced, and makes the file shorter. While
+/// somebody reads the file, it waits: for he may be reading what was replaced.
+void HfaLevelStore::GiveBackSpace(const ByteRanges& removed) {
+  constexpr int kMostPasses = 4;  // what one pass leaves room for, the next one moves
+  isChanged_ = false;
+  if (lock_ < 0 || pyramid_.isSpilled) return;
+  if (FindHfaSpace(path_, freed_).free.Size() == 0) return;
+  BeginChange();
+  for (int pass = 0; pass < kMostPasses; ++pass) {
+    const bool isAlone = DoAlone(lock_, [] {}) == Alone::kDone;
+    if (!isAlone || !MoveHfaLevelsDown(path_, FindHfaSpace(path_, freed_))) break;
+  }
+  Shorten(removed);
+  freed_ = {};
+}
+
+}  // namespace orin::drivers
