@@ -3,6 +3,7 @@
 
 #include <algorithm>
 #include <array>
+#include <span>
 #include <string_view>
 #include <utility>
 
@@ -177,11 +178,15 @@ class Moves {
  public:
   /// Chooses places for what can move down. Large things first: they fit into fewer.
   explicit Moves(HfaSpace& space) {
-    std::stable_sort(space.movables.begin(), space.movables.end(),
+    auto& all = space.movables;
+    std::stable_sort(all.begin(), all.end(),
                      [](const auto& a, const auto& b) { return a.bytes > b.bytes; });
-    for (const HfaMovable& movable : space.movables)
-      if (const auto place = space.free.TakeBefore(movable.position, movable.bytes))
-        moves_[movable.position] = {movable.bytes, static_cast<uint32_t>(*place)};
+    for (auto first = all.begin(); first != all.end();) {
+      const auto last = std::find_if(first, all.end(),
+                                     [&](const auto& other) { return other.bytes != first->bytes; });
+      PlaceAlike({first, last}, space.free);
+      first = last;
+    }
   }
 
   struct Move {
@@ -198,6 +203,32 @@ class Moves {
   }
 
  private:
+  /// Things of one size, ascending: as many as can go to a lower place, the last ones, so that no
+  /// more move than there are places, and their order stays.
+  void PlaceAlike(std::span<const HfaMovable> alike, ByteRanges& free) {
+    const uint32_t bytes = alike.front().bytes;
+    std::vector<uint32_t> places;
+    while (places.size() < alike.size()) {
+      const auto place = free.TakeBefore(alike.back().position, bytes);
+      if (!place) break;
+      places.push_back(static_cast<uint32_t>(*place));
+    }
+    const auto fits = [&](size_t count) {
+      const auto last = alike.last(count);
+      for (size_t i = 0; i < count; ++i)
+        if (places[i] >= last[i].position) return false;
+      return true;
+    };
+    size_t count = 0, tooMany = places.size() + 1;
+    while (count + 1 < tooMany) {
+      const size_t middle = (count + tooMany) / 2;
+      (fits(middle) ? count : tooMany) = middle;
+    }
+    for (size_t i = 0; i < count; ++i)
+      moves_[alike.last(count)[i].position] = {bytes, places[i]};
+    for (size_t i = count; i < places.size(); ++i) free.Add(places[i], uint64_t{places[i]} + bytes);
+  }
+
   std::map<uint32_t, Move> moves_;
 };
 

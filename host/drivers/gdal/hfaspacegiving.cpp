@@ -53,7 +53,7 @@ void HfaLevelStore::Shorten(const ByteRanges& removed) {
 /// Moves levels into the space of those that they replaced, and makes the file shorter. While
 /// somebody reads the file, it waits: for he may be reading what was replaced.
 void HfaLevelStore::GiveBackSpace(const ByteRanges& removed) {
-  constexpr int kMostPasses = 4;  // what one pass leaves room for, the next one moves
+  constexpr int kMostPasses = 12;  // what one pass leaves room for, the next one moves
   isChanged_ = false;
   if (lock_ < 0 || pyramid_.isSpilled) return;
   if (FindHfaSpace(path_, freed_).free.Size() == 0) return;
