@@ -113,7 +113,7 @@ class HfaLevelStore final : public datasources::ILevelStore {
   std::map<unsigned, Pending> pending_;
   std::shared_ptr<HfaBuild> build_;
   std::shared_ptr<datasources::ImageWatch> watch_;  ///< of the image; null when nothing can be told
-  ByteRanges freed_;  ///< that levels had which were written anew since the store was opened
+  ByteRanges freed_;         ///< that levels had which were written anew since the store was opened
   bool isChanged_ = false;   ///< space may be given back
   bool isChanging_ = false;  ///< from the first write into the file to the last
   std::optional<datasources::ImageStamp> before_;  ///< of the image, when the changes began

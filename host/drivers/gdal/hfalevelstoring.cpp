@@ -68,9 +68,8 @@ void HfaLevelStore::Record(unsigned level, const HfaRecord& record) {
 std::optional<datasources::ImageRecord> HfaLevelStore::SourceImage() const {
   if (lastRead_ == 0) return std::nullopt;
   const auto source = records_.find(lastRead_);
-  const bool isCurrent =
-      source != records_.end() &&
-      StatusOf(lastRead_, FingerprintNow()) == datasources::LevelStatus::kCurrent;
+  const bool isCurrent = source != records_.end() && StatusOf(lastRead_, FingerprintNow()) ==
+                                                         datasources::LevelStatus::kCurrent;
   return isCurrent ? source->second.image : datasources::ImageRecord();
 }
 
@@ -119,7 +118,7 @@ std::shared_ptr<HfaBuild> HfaLevelStore::BeginWriting(unsigned level,
   if (missing.empty() && item && item->textBytes == ComposeHfaRecord(record).size() + 1)
     build->record = record;
   else Record(level, record);  // too long for its place: the level is not valid from here on
-  if (!missing.empty()) RemoveUnlistedHfaLevel(path_, level);
+  RemoveUnlistedHfaLevels(path_, level);
   OpenBuild(*build, missing);
   return build_ = std::move(build);
 }

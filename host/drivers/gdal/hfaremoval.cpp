@@ -4,6 +4,7 @@
 #include <algorithm>
 #include <functional>
 
+#include "host/drivers/gdal/hfarecord.h"
 #include "host/drivers/gdal/hfaspace.h"
 #include "host/drivers/gdal/hfatree.h"
 #include "host/drivers/gdal/patchedfile.h"
@@ -40,12 +41,20 @@ ByteRanges ShortenLists(const std::string& path, const std::vector<unsigned>& fa
   return bytes;
 }
 
+/// Takes nodes out of a list of children. \returns their bytes
+ByteRanges TakeOut(PatchedFile& file, const std::string& path, const std::vector<HfaNode>& children,
+                   const std::function<bool(const HfaNode&)>& goes) {
+  ByteRanges bytes;
+  for (const HfaPointer& pointer : PointersWithout(children, goes)) Point(file, pointer);
+  for (const HfaNode& child : children)
+    if (goes(child)) bytes.Add(HfaBytesOf(path, child));
+  return bytes;
+}
+
 using Goes = std::function<bool(const HfaNode& part, const std::vector<unsigned>& listed)>;
 
-/// Takes the parts of the channels that `goes` out of the tree, and the items.
-/// \returns their bytes
-ByteRanges TakeOut(const std::string& path, const Goes& goes,
-                   const std::vector<std::string>& items) {
+/// Takes the parts of the channels that `goes` out of the tree. \returns their bytes
+ByteRanges TakeOutParts(const std::string& path, const Goes& goes) {
   PatchedFile file(path);
   ByteRanges bytes;
   HfaTree tree(file.LibraryName());
@@ -53,13 +62,23 @@ ByteRanges TakeOut(const std::string& path, const Goes& goes,
     std::vector<unsigned> listed;
     for (const HfaNode& part : layer.parts)
       if (IsHfaNameList(part)) listed = FactorsInHfaList(tree.DataOf(part));
-    const auto partGoes = [&](const HfaNode& part) { return goes(part, listed); };
-    for (const HfaPointer& pointer : PointersWithout(layer.parts, partGoes)) Point(file, pointer);
-    for (const HfaNode& part : layer.parts)
-      if (partGoes(part)) bytes.Add(HfaBytesOf(path, part));
+    bytes.Add(
+        TakeOut(file, path, layer.parts, [&](const HfaNode& part) { return goes(part, listed); }));
   }
-  for (const HfaPointer& pointer : PointersWithoutItems(file.LibraryName(), items))
-    Point(file, pointer);
+  if (!file.Waiting().empty()) file.Commit();
+  return bytes;
+}
+
+/// The last step: as long as a level's item is there, what is left of it is known to be ours.
+ByteRanges TakeOutItems(const std::string& path, const std::vector<std::string>& items) {
+  PatchedFile file(path);
+  ByteRanges bytes;
+  HfaTree tree(file.LibraryName());
+  for (const std::vector<HfaNode>& list : HfaItemListsOf(tree))
+    bytes.Add(TakeOut(file, path, list, [&](const HfaNode& node) {
+      return std::any_of(items.begin(), items.end(),
+                         [&](const std::string& key) { return IsHfaItem(node, key); });
+    }));
   if (!file.Waiting().empty()) file.Commit();
   return bytes;
 }
@@ -78,15 +97,31 @@ ByteRanges RemoveHfaLevels(const std::string& path, const std::vector<unsigned>&
     const unsigned factor = FactorOfHfaPart(part);
     return factor != 0 && !Holds(listed, factor) && (Holds(factors, factor) || !listed.empty());
   };
-  bytes.Add(TakeOut(path, goes, items));
+  bytes.Add(TakeOutParts(path, goes));
+  bytes.Add(TakeOutItems(path, items));
   return bytes;
 }
 
-void RemoveUnlistedHfaLevel(const std::string& path, unsigned factor) {
-  const auto goes = [&](const HfaNode& part, const std::vector<unsigned>& listed) {
-    return FactorOfHfaPart(part) == factor && !listed.empty() && !Holds(listed, factor);
+void RemoveUnlistedHfaLevels(const std::string& path, unsigned factor) {
+  const HfaPyramid pyramid = ReadHfaPyramid(path);
+  const auto isListed = [&](unsigned level) {
+    return std::any_of(pyramid.channels.begin(), pyramid.channels.end(), [&](const auto& names) {
+      return std::any_of(names.begin(), names.end(),
+                         [&](const HfaLevelName& name) { return name.factor == level; });
+    });
   };
-  TakeOut(path, goes, {});
+  std::vector<std::string> items;
+  const auto goes = [&](const HfaNode& part, const std::vector<unsigned>& listed) {
+    const unsigned level = FactorOfHfaPart(part);
+    if (level == 0 || listed.empty() || Holds(listed, level)) return false;
+    const std::string key = HfaRecordKey(level);
+    if (level == factor) return true;
+    if (!FindHfaItem(path, key)) return false;
+    if (!isListed(level)) items.push_back(key);
+    return true;
+  };
+  TakeOutParts(path, goes);
+  TakeOutItems(path, items);
 }
 
 }  // namespace orin::drivers

@@ -182,8 +182,8 @@ class Moves {
     std::stable_sort(all.begin(), all.end(),
                      [](const auto& a, const auto& b) { return a.bytes > b.bytes; });
     for (auto first = all.begin(); first != all.end();) {
-      const auto last = std::find_if(first, all.end(),
-                                     [&](const auto& other) { return other.bytes != first->bytes; });
+      const auto last = std::find_if(
+          first, all.end(), [&](const auto& other) { return other.bytes != first->bytes; });
       PlaceAlike({first, last}, space.free);
       first = last;
     }
@@ -224,8 +224,7 @@ class Moves {
       const size_t middle = (count + tooMany) / 2;
       (fits(middle) ? count : tooMany) = middle;
     }
-    for (size_t i = 0; i < count; ++i)
-      moves_[alike.last(count)[i].position] = {bytes, places[i]};
+    for (size_t i = 0; i < count; ++i) moves_[alike.last(count)[i].position] = {bytes, places[i]};
     for (size_t i = count; i < places.size(); ++i) free.Add(places[i], uint64_t{places[i]} + bytes);
   }
 
@@ -237,9 +236,9 @@ std::string CopyOf(PatchedFile& file, uint32_t from, uint32_t count, const HfaSp
                    const Moves& moves) {
   std::string bytes(count, '\0');  // what the file ends before was never written
   file.Read(from, bytes.data(), bytes.size());
-  const auto first =
-      std::lower_bound(space.pointers.begin(), space.pointers.end(), from,
-                       [](const HfaPointer& pointer, uint32_t at) { return pointer.position < at; });
+  const auto first = std::lower_bound(
+      space.pointers.begin(), space.pointers.end(), from,
+      [](const HfaPointer& pointer, uint32_t at) { return pointer.position < at; });
   for (auto at = first; at != space.pointers.end() && at->position - from + 4 <= count; ++at)
     PutHfaNumber(bytes, at->position - from, moves.Moved(at->value));
   return bytes;
@@ -255,13 +254,15 @@ ByteRanges HfaBytesOf(const std::string& path, const HfaNode& node) {
   return SpaceFinder(path).BytesOf(node);
 }
 
-bool MoveHfaLevelsDown(const std::string& path, HfaSpace space) {
+uint64_t MoveHfaLevelsDown(const std::string& path, HfaSpace space) {
   const Moves moves(space);
-  if (moves.All().empty()) return false;
+  if (moves.All().empty()) return 0;
   PatchedFile file(path);
+  uint64_t moved = 0;
   for (const auto& [from, move] : moves.All()) {
     const std::string bytes = CopyOf(file, from, move.bytes, space, moves);
     file.WriteNow(move.to, bytes.data(), bytes.size());
+    moved += bytes.size();
   }
   std::string number(4, '\0');
   for (const HfaPointer& pointer : space.pointers) {
@@ -273,7 +274,7 @@ bool MoveHfaLevelsDown(const std::string& path, HfaSpace space) {
   }
   file.RequireWritten();
   file.Commit();
-  return true;
+  return moved;
 }
 
 }  // namespace orin::drivers

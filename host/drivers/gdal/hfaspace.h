@@ -35,10 +35,10 @@ HfaSpace FindHfaSpace(const std::string& path, const ByteRanges& given);
 
 /// Moves what can be moved to free bytes before it. What it leaves stays as it is, so that whoever
 /// meets a pointer that still leads there reads the same.
-/// \returns false: there was nothing to move
+/// \returns how many bytes moved
 /// \throws orin::Exception  it cannot be written; all that is reached is where it was, or where it
 ///                          goes
-bool MoveHfaLevelsDown(const std::string& path, HfaSpace space);
+uint64_t MoveHfaLevelsDown(const std::string& path, HfaSpace space);
 
 /// The bytes of a node, and of all that it leads to.
 /// \throws orin::Exception  the file's tree cannot be read

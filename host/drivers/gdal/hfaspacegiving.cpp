@@ -15,6 +15,19 @@
 #include "host/services/text.h"
 
 namespace orin::drivers {
+namespace {
+
+/// True when `bytes` holds nothing but levels that were removed, and gaps between them: where there
+/// is no room for a list of blocks, nobody reads a level that was replaced.
+bool AreOfRemovedLevels(ByteRanges bytes, const ByteRanges& removed) {
+  constexpr uint64_t kSmallestList = 36;
+  bytes.Remove(removed);
+  for (const auto& [start, end] : bytes.All())
+    if (end - start >= kSmallestList) return false;
+  return true;
+}
+
+}  // namespace
 
 void HfaLevelStore::Remove(const std::vector<unsigned>& levels) {
   const std::lock_guard lock(mutex_);
@@ -47,21 +60,22 @@ void HfaLevelStore::Shorten(const ByteRanges& removed) {
     const bool isSame = fstat(lock_, &now) == 0 && uint64_t(now.st_size) == space.size;
     if (isSame && ftruncate(lock_, static_cast<off_t>(space.end)) == 0) fsync(lock_);
   };
-  if (DoAlone(lock_, cut) != Alone::kDone && removed.Has(space.end, space.size)) cut();
+  ByteRanges tail;
+  tail.Add(space.end, space.size);
+  if (DoAlone(lock_, cut) != Alone::kDone && AreOfRemovedLevels(tail, removed)) cut();
 }
 
 /// Moves levels into the space of those that they replaced, and makes the file shorter. While
 /// somebody reads the file, it waits: for he may be reading what was replaced.
 void HfaLevelStore::GiveBackSpace(const ByteRanges& removed) {
-  constexpr int kMostPasses = 12;  // what one pass leaves room for, the next one moves
+  constexpr int kMostPasses = 12;         // what one pass leaves room for, the next one moves
+  constexpr uint64_t kWorthAPass = 4096;  // that the last one moved
   isChanged_ = false;
   if (lock_ < 0 || pyramid_.isSpilled) return;
   if (FindHfaSpace(path_, freed_).free.Size() == 0) return;
   BeginChange();
-  for (int pass = 0; pass < kMostPasses; ++pass) {
-    const bool isAlone = DoAlone(lock_, [] {}) == Alone::kDone;
-    if (!isAlone || !MoveHfaLevelsDown(path_, FindHfaSpace(path_, freed_))) break;
-  }
+  for (int pass = 0; pass < kMostPasses && DoAlone(lock_, [] {}) == Alone::kDone; ++pass)
+    if (MoveHfaLevelsDown(path_, FindHfaSpace(path_, freed_)) < kWorthAPass) break;
   Shorten(removed);
   freed_ = {};
 }

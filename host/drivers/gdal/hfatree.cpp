@@ -3,7 +3,6 @@
 
 #include <algorithm>
 #include <charconv>
-#include <functional>
 #include <string_view>
 
 namespace orin::drivers {
@@ -53,12 +52,6 @@ std::vector<HfaLevelName> ParseNames(std::string_view data) {
   return names;
 }
 
-/// Calls `use` for each item with the list that its node stands in.
-void ForEachItem(HfaTree& tree, const std::function<void(const std::vector<HfaNode>&)>& use) {
-  for (const HfaNode& table : tree.ChildrenOf(tree.Root()))
-    if (table.name == "GDAL_MetaData" && table.type == "Edsc_Table") use(tree.ChildrenOf(table));
-}
-
 }  // namespace
 
 bool HfaPyramid::NamesAnotherFileThan(const std::string& name) const {
@@ -77,31 +70,27 @@ int HfaPyramid::Find(unsigned channel, unsigned factor) const {
   return found == levels.end() ? -1 : static_cast<int>(found - levels.begin());
 }
 
-std::optional<HfaItemPlace> FindHfaItem(const std::string& path, const std::string& key) {
-  HfaTree tree(path);
-  std::optional<HfaItemPlace> place;
-  ForEachItem(tree, [&](const std::vector<HfaNode>& columns) {
-    for (const HfaNode& column : columns) {
-      if (place || column.name != key || column.type != "Edsc_Column") continue;
-      const std::string data = tree.DataOf(column);  // rows, position, type of 2 bytes, length
-      place = HfaItemPlace{HfaNumberAt(data, 4), HfaNumberAt(data, 10)};
-    }
-  });
-  return place;
+std::vector<std::vector<HfaNode>> HfaItemListsOf(HfaTree& tree) {
+  std::vector<std::vector<HfaNode>> lists;
+  for (const HfaNode& table : tree.ChildrenOf(tree.Root()))
+    if (table.name == "GDAL_MetaData" && table.type == "Edsc_Table")
+      lists.push_back(tree.ChildrenOf(table));
+  return lists;
 }
 
-std::vector<HfaPointer> PointersWithoutItems(const std::string& path,
-                                             const std::vector<std::string>& keys) {
+bool IsHfaItem(const HfaNode& node, const std::string& key) {
+  return node.name == key && node.type == "Edsc_Column";
+}
+
+std::optional<HfaItemPlace> FindHfaItem(const std::string& path, const std::string& key) {
   HfaTree tree(path);
-  std::vector<HfaPointer> pointers;
-  ForEachItem(tree, [&](const std::vector<HfaNode>& columns) {
-    const auto some = PointersWithout(columns, [&](const HfaNode& column) {
-      return column.type == "Edsc_Column" &&
-             std::find(keys.begin(), keys.end(), column.name) != keys.end();
-    });
-    pointers.insert(pointers.end(), some.begin(), some.end());
-  });
-  return pointers;
+  for (const std::vector<HfaNode>& columns : HfaItemListsOf(tree))
+    for (const HfaNode& column : columns) {
+      if (!IsHfaItem(column, key)) continue;
+      const std::string data = tree.DataOf(column);  // rows, position, type of 2 bytes, length
+      return HfaItemPlace{HfaNumberAt(data, 4), HfaNumberAt(data, 10)};
+    }
+  return std::nullopt;
 }
 
 std::vector<HfaLayer> HfaLayersOf(HfaTree& tree) {

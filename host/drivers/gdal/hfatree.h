@@ -43,9 +43,10 @@ struct HfaItemPlace {
 /// Nothing when the file has no such item.
 /// \throws orin::Exception  the file's tree cannot be read
 std::optional<HfaItemPlace> FindHfaItem(const std::string& path, const std::string& key);
-/// What takes items out of the tree, as far as they are there.
-std::vector<HfaPointer> PointersWithoutItems(const std::string& path,
-                                             const std::vector<std::string>& keys);
+/// The lists of children that the metadata items of the file stand in, whole.
+std::vector<std::vector<HfaNode>> HfaItemListsOf(HfaTree& tree);
+/// True for the item of that name.
+bool IsHfaItem(const HfaNode& node, const std::string& key);
 
 /// The node of a channel's image, with what belongs to its levels.
 struct HfaLayer {

@@ -186,8 +186,8 @@ TEST_F(HfaLevels, AreReadAsTheyWereByWhoHadTheFileOpen) {
     {
       const std::unique_ptr<GDALDataset> reader(GDALDataset::Open(file_.c_str()));
       const std::string first = ShownBy(*reader, 1, 64);
-      const std::string all = ShownBy(*std::unique_ptr<GDALDataset>(
-                                          GDALDataset::Open(file_.c_str())), 1, 101);
+      const std::string all =
+          ShownBy(*std::unique_ptr<GDALDataset>(GDALDataset::Open(file_.c_str())), 1, 101);
       for (const unsigned edition : {1u, 2u}) {
         for (const unsigned level : {2u, 4u}) {
           const auto dataset = Open(file_, kUpdate);
@@ -330,11 +330,11 @@ TEST_F(HfaLevels, AreRemovedWhileOthersStayAndMoveUp) {
     for (const unsigned level : {2u, 3u, 5u})
       EXPECT_EQ(std::count(stays.begin(), stays.end(), level) ? "11" : "", Validity(file_, level));
     EXPECT_EQ("", WrongPixels(file_));
-    EXPECT_GE(fresh + kLittle, std::filesystem::file_size(file_)) << ::testing::PrintToString(stays);
-    EXPECT_EQ(int(stays.size()),
-              std::unique_ptr<GDALDataset>(GDALDataset::Open(file_.c_str()))
-                  ->GetRasterBand(2)
-                  ->GetOverviewCount());
+    EXPECT_GE(fresh + kLittle, std::filesystem::file_size(file_))
+        << ::testing::PrintToString(stays);
+    EXPECT_EQ(int(stays.size()), std::unique_ptr<GDALDataset>(GDALDataset::Open(file_.c_str()))
+                                     ->GetRasterBand(2)
+                                     ->GetOverviewCount());
     for (const unsigned level : goes) Build(*Open(file_, kUpdate), level, {1, 2});
     EXPECT_EQ("", WrongPixels(file_));
     std::filesystem::remove(file_);

@@ -56,11 +56,9 @@ class HfaBytes : public GdalFiles {
   void WriteLevels() {
     WritePicture(file_, "HFA", {.width = 301, .height = 203, .channels = 2},
                  [](GDALDataset& image) { image.SetMetadataItem("SENSOR", "camera"); });
-    const std::unique_ptr<GDALDataset> dataset(
-        GDALDataset::Open(file_.c_str(), GDAL_OF_UPDATE));
+    const std::unique_ptr<GDALDataset> dataset(GDALDataset::Open(file_.c_str(), GDAL_OF_UPDATE));
     int levels[] = {2, 4, 8};
-    ASSERT_EQ(CE_None,
-              dataset->BuildOverviews("NEAREST", 3, levels, 0, nullptr, nullptr, nullptr));
+    ASSERT_EQ(CE_None, dataset->BuildOverviews("NEAREST", 3, levels, 0, nullptr, nullptr, nullptr));
   }
 
   /// Every level as the library reads it, by its width.
@@ -71,9 +69,9 @@ class HfaBytes : public GdalFiles {
       for (int i = 0; i < dataset->GetRasterBand(channel)->GetOverviewCount(); ++i) {
         GDALRasterBand& band = *dataset->GetRasterBand(channel)->GetOverview(i);
         std::string pixels(size_t(band.GetXSize()) * size_t(band.GetYSize()), '\0');
-        EXPECT_EQ(CE_None, band.RasterIO(GF_Read, 0, 0, band.GetXSize(), band.GetYSize(),
-                                         pixels.data(), band.GetXSize(), band.GetYSize(), GDT_Byte,
-                                         0, 0, nullptr));
+        EXPECT_EQ(CE_None,
+                  band.RasterIO(GF_Read, 0, 0, band.GetXSize(), band.GetYSize(), pixels.data(),
+                                band.GetXSize(), band.GetYSize(), GDT_Byte, 0, 0, nullptr));
         levels[band.GetXSize()] += pixels;
       }
     return levels;
@@ -131,7 +129,7 @@ TEST_F(HfaBytes, OfRemovedLevelsAreTakenByTheOnesThatStay) {
     const auto size = FindHfaSpace(file_, {}).end;
     const ByteRanges given = drivers::RemoveHfaLevels(file_, goes, {});
     EXPECT_EQ(3 - goes.size(), Levels().size());
-    while (drivers::MoveHfaLevelsDown(file_, FindHfaSpace(file_, given))) {
+    while (drivers::MoveHfaLevelsDown(file_, FindHfaSpace(file_, given)) > 0) {
     }
     const HfaSpace space = FindHfaSpace(file_, given);
     std::filesystem::resize_file(file_, space.end);

@@ -61,8 +61,12 @@ TEST_F(HfaTree, TellsWhereItemsStandAndHowTheyAreTakenOut) {
     const auto item = drivers::FindHfaItem(File("image.img"), removed);
     ASSERT_TRUE(item);
     EXPECT_EQ(removed + "!", bytes.substr(item->text, item->textBytes - 1));
-    for (const drivers::HfaPointer& pointer :
-         drivers::PointersWithoutItems(File("image.img"), {removed, "FOURTH"}))
+    drivers::HfaTree tree(File("image.img"));
+    const auto lists = drivers::HfaItemListsOf(tree);
+    ASSERT_EQ(1u, lists.size());
+    for (const drivers::HfaPointer& pointer : drivers::PointersWithout(
+             lists[0],
+             [&](const drivers::HfaNode& node) { return drivers::IsHfaItem(node, removed); }))
       std::memcpy(&bytes[pointer.position], &pointer.value, sizeof pointer.value);
     WriteBytes(File("without.img"), bytes);
     EXPECT_FALSE(drivers::FindHfaItem(File("without.img"), removed));
