@@ -81,7 +81,7 @@ HfaLevelStore::HfaLevelStore(std::string path, const GdalFormat& format,
 HfaLevelStore::~HfaLevelStore() {
   if (build_) EndWriting(*build_);
   try {
-    if (isChanged_) GiveBackSpace({});
+    if (isChanged_) GiveBackSpace();
     Settle();
   } catch (const std::exception&) {
     // deliberate: nothing is lost but space, which the next change finds again

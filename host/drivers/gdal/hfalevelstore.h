@@ -88,8 +88,8 @@ class HfaLevelStore final : public datasources::ILevelStore {
   std::optional<datasources::ImageRecord> SourceImage() const;
   void OpenBuild(HfaBuild& build, const std::vector<unsigned>& missing);
   void StoreBuild();
-  void GiveBackSpace(const ByteRanges& removed);
-  void Shorten(const ByteRanges& removed);
+  void GiveBackSpace();
+  void Shorten();
 
   std::optional<datasources::ImageStamp> Now() const;
   void Trust(const datasources::ImageStamp& now) const;

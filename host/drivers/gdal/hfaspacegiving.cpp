@@ -15,19 +15,6 @@
 #include "host/services/text.h"
 
 namespace orin::drivers {
-namespace {
-
-/// True when `bytes` holds nothing but levels that were removed, and gaps between them: where there
-/// is no room for a list of blocks, nobody reads a level that was replaced.
-bool AreOfRemovedLevels(ByteRanges bytes, const ByteRanges& removed) {
-  constexpr uint64_t kSmallestList = 36;
-  bytes.Remove(removed);
-  for (const auto& [start, end] : bytes.All())
-    if (end - start >= kSmallestList) return false;
-  return true;
-}
-
-}  // namespace
 
 void HfaLevelStore::Remove(const std::vector<unsigned>& levels) {
   const std::lock_guard lock(mutex_);
@@ -43,16 +30,15 @@ void HfaLevelStore::Remove(const std::vector<unsigned>& levels) {
   if (!mayChange_) Fail(_("%s: is open for reading only; level %u cannot be removed."), *going);
   LockFile();
   BeginChange();
-  const ByteRanges removed = RemoveHfaLevels(path_, levels, items);
-  freed_.Add(removed);
+  freed_.Add(RemoveHfaLevels(path_, levels, items));
   Reload();
-  GiveBackSpace(removed);
+  GiveBackSpace();
   Settle();
 }
 
-/// Cuts off the end of the file that nothing uses, if nobody may be reading it.
-/// \param removed  what may be cut off even so: a level that was removed can no longer be read
-void HfaLevelStore::Shorten(const ByteRanges& removed) {
+/// Cuts off the end of the file that nothing uses, if nobody may be reading what a level was
+/// before; where there are no levels any more, even so.
+void HfaLevelStore::Shorten() {
   const HfaSpace space = FindHfaSpace(path_, freed_);
   if (space.end >= space.size) return;
   const auto cut = [&] {
@@ -60,14 +46,14 @@ void HfaLevelStore::Shorten(const ByteRanges& removed) {
     const bool isSame = fstat(lock_, &now) == 0 && uint64_t(now.st_size) == space.size;
     if (isSame && ftruncate(lock_, static_cast<off_t>(space.end)) == 0) fsync(lock_);
   };
-  ByteRanges tail;
-  tail.Add(space.end, space.size);
-  if (DoAlone(lock_, cut) != Alone::kDone && AreOfRemovedLevels(tail, removed)) cut();
+  const bool isEmpty = std::all_of(pyramid_.channels.begin(), pyramid_.channels.end(),
+                                   [](const auto& levels) { return levels.empty(); });
+  if (DoAlone(lock_, cut) != Alone::kDone && isEmpty) cut();
 }
 
 /// Moves levels into the space of those that they replaced, and makes the file shorter. While
 /// somebody reads the file, it waits: for he may be reading what was replaced.
-void HfaLevelStore::GiveBackSpace(const ByteRanges& removed) {
+void HfaLevelStore::GiveBackSpace() {
   constexpr int kMostPasses = 12;         // what one pass leaves room for, the next one moves
   constexpr uint64_t kWorthAPass = 4096;  // that the last one moved
   isChanged_ = false;
@@ -76,7 +62,7 @@ void HfaLevelStore::GiveBackSpace(const ByteRanges& removed) {
   BeginChange();
   for (int pass = 0; pass < kMostPasses && DoAlone(lock_, [] {}) == Alone::kDone; ++pass)
     if (MoveHfaLevelsDown(path_, FindHfaSpace(path_, freed_)) < kWorthAPass) break;
-  Shorten(removed);
+  Shorten();
   freed_ = {};
 }
 
