@@ -5,6 +5,7 @@ import json
 import os
 import subprocess
 import tempfile
+import time
 import unittest
 
 import numpy
@@ -32,6 +33,18 @@ def run(*arguments, environment=None, **options):
     full = dict(os.environ, ORIN_PREFERENCES="/dev/null", LC_ALL="C", **(environment or {}))
     return subprocess.run([TOOL, *map(str, arguments)], capture_output=True, text=True, env=full,
                           timeout=240, **options)
+
+
+def kill_build(delay, file, arguments):
+    """Starts a build and kills it after `delay` seconds. True when it was still running."""
+    environment = dict(os.environ, ORIN_PREFERENCES="/dev/null")
+    process = subprocess.Popen([TOOL, "build", file, *arguments], env=environment,
+                               stdout=subprocess.DEVNULL, stderr=subprocess.DEVNULL)
+    time.sleep(delay)
+    running = process.poll() is None
+    process.kill()
+    process.wait()
+    return running
 
 
 def info(path):

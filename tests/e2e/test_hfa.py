@@ -15,8 +15,8 @@ import rasterio
 
 from mask_case import write_mask_beside
 from mask_twin import disc, level_validity, masks_of_levels
-from orin_e2e import (Case, NUMPY_TYPES, TOOL, info, nearest, overview_sizes, random_pixels,
-                      read_pixels, run)
+from orin_e2e import (Case, NUMPY_TYPES, TOOL, info, kill_build, nearest, overview_sizes,
+                      random_pixels, read_pixels, run)
 
 SOMEBODY = {"user": 65534} if os.geteuid() == 0 else {}  # the superuser may write to anything
 KILLS = 20
@@ -131,16 +131,6 @@ class Inside(Hfa):
         self.assertEqual(before, pathlib.Path(self.file).read_bytes())
         self.assertEqual(stamp, os.stat(self.file).st_mtime_ns)
 
-    def test_rebuilding_lets_the_file_grow_by_the_records_alone(self):
-        write(self.file, self.pixels, "Byte")
-        self.assertRan(run("build", self.file, "--method", "nearest", "--levels", "2,4"))
-        size = os.path.getsize(self.file)
-        for _ in range(3):
-            self.assertRan(run("build", self.file, "--method", "nearest", "--levels", "2,4",
-                               "--force"))
-        self.assertLess(os.path.getsize(self.file), size + 4096)
-        self.check_levels(self.file, self.pixels)
-
     def test_levels_of_another_program_count_and_are_replaced_when_forced(self):
         write(self.file, self.pixels, "Byte")
         dataset = gdal.Open(self.file, gdal.GA_Update)
@@ -214,13 +204,26 @@ class Cleaned(Hfa):
         self.assertRan(run("clean", self.file, "--levels", "2,4,8"))
         self.check_clean()
 
-    def test_takes_all_levels_or_none(self):
-        before = pathlib.Path(self.file).read_bytes()
-        answer = run("clean", self.file, "--levels", "2")
-        self.assertNotEqual(0, answer.returncode)
-        self.assertIn("scene.img: levels inside this format are removed all together, and level 4 "
-                      "is to stay", answer.stderr)
-        self.assertEqual(before, pathlib.Path(self.file).read_bytes())
+    def test_takes_some_levels_and_leaves_the_rest(self):
+        self.assertRan(run("build", self.file, "--levels", "8", "--method", "nearest"))
+        for going, staying in ((2, [4, 8]), (8, [4])):
+            size = os.path.getsize(self.file)
+            answer = run("clean", self.file, "--levels", going)
+            self.assertRan(answer)
+            self.assertIn(f"levels removed: {going} (inside the file)", answer.stdout)
+            self.assertEqual(staying, all_valid(self.file))
+            self.assertEqual([-(-333 // level) for level in staying],
+                             [columns for columns, _ in overview_sizes(self.file)])
+            room = 2 * (-(-333 // going // 64)) * (-(-205 // going // 64)) * 64 * 64
+            self.assertLessEqual(os.path.getsize(self.file), size - room)
+        level = nearest(nearest(self.pixels, 1, 2, (333, 205)), 2, 4, (333, 205))
+        self.assertSamePixels(level, read_pixels(self.file, 0)[:, :51, :83])
+        self.assertIn("Overviews: 84x52\n",
+                      subprocess.run(["gdalinfo", self.file], capture_output=True, text=True,
+                                     check=True).stdout)
+        self.assertSamePixels(self.pixels, read_pixels(self.file))
+        self.assertEqual({"SENSOR", "ORIN_LEVEL_4"},
+                         set(gdal.Open(self.file).GetMetadata()))
 
     def test_takes_levels_of_other_programs(self):
         dataset = gdal.Open(self.file, gdal.GA_Update)
@@ -342,17 +345,6 @@ class Survives(Hfa):
         self.pixels = random_pixels((2, 1300, 1400), numpy.uint8, 9)
         self.arguments = ["--levels", "2,4,8", "--method", "nearest"]
 
-    def kill_at(self, delay, file, arguments):
-        """Starts a build and kills it after `delay` seconds. True when it was still running."""
-        environment = dict(os.environ, ORIN_PREFERENCES="/dev/null")
-        process = subprocess.Popen([TOOL, "build", file, *arguments], env=environment,
-                                   stdout=subprocess.DEVNULL, stderr=subprocess.DEVNULL)
-        time.sleep(delay)
-        running = process.poll() is None
-        process.kill()
-        process.wait()
-        return running
-
     def check_killed(self, original, arguments, kills):
         """Kills builds of copies of a folder's only file, which all have its name."""
         start = time.monotonic()
@@ -362,7 +354,7 @@ class Survives(Hfa):
         killed = 0
         for number in range(kills):
             file = self.copy_of(original, f"killed{number}")
-            killed += self.kill_at(delays.uniform(0, duration), file, arguments)
+            killed += kill_build(delays.uniform(0, duration), file, arguments)
             self.assertSamePixels(self.pixels, read_pixels(file))
             expected, source = self.pixels, 1
             for level in (2, 4, 8):
@@ -385,11 +377,6 @@ class Survives(Hfa):
     def test_being_killed_at_any_moment(self):
         write(self.file, self.pixels, "Byte")
         self.check_killed(self.file, self.arguments, KILLS)
-
-    def test_being_killed_at_any_moment_of_a_rebuild(self):
-        write(self.file, self.pixels, "Byte", ["COMPRESSED=YES"])
-        self.assertRan(run("build", self.file, *self.arguments))
-        self.check_killed(self.file, [*self.arguments, "--force"], KILLS // 2)
 
     def test_a_full_disk(self):
         write(self.file, self.pixels, "Byte")

@@ -5,29 +5,18 @@ same command again ends with what an undisturbed run makes."""
 import os
 import random
 import shutil
-import subprocess
 import time
 import unittest
 
 import numpy
 
-from orin_e2e import Case, TOOL, info, overview_sizes, random_pixels, read_pixels, run, write_tiff
+from orin_e2e import (Case, info, kill_build, overview_sizes, random_pixels, read_pixels, run,
+                      write_tiff)
 
 KILLS = 50
 
 
 class Killed(Case):
-    def kill_at(self, delay, file, arguments):
-        """Starts a build and kills it after `delay` seconds. True when it was still running."""
-        environment = dict(os.environ, ORIN_PREFERENCES="/dev/null")
-        process = subprocess.Popen([TOOL, "build", file, *arguments], env=environment,
-                                   stdout=subprocess.DEVNULL, stderr=subprocess.DEVNULL)
-        time.sleep(delay)
-        running = process.poll() is None
-        process.kill()
-        process.wait()
-        return running
-
     def check(self, arguments):
         pixels = random_pixels((3, 2400, 2600), numpy.uint8, 9)
         original = self.path("original.tif")
@@ -45,7 +34,7 @@ class Killed(Case):
         for number in range(KILLS // 2):
             file = self.path(f"killed{number}.tif")
             shutil.copy(original, file)
-            killed += self.kill_at(delays.uniform(0, duration), file, arguments)
+            killed += kill_build(delays.uniform(0, duration), file, arguments)
             self.assertSamePixels(pixels, read_pixels(file))
             valid = [entry for entry in info(file)["levels"]
                      if all(channel["valid"] for channel in entry["channels"])]

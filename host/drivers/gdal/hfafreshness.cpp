@@ -102,7 +102,7 @@ void HfaLevelStore::RememberImage(HfaRecord& record) const {
 /// Has the levels of the image `fingerprint` remember how it looks. The file's time is set by the
 /// caller: these are its last writes.
 void HfaLevelStore::Restamp(const std::string& fingerprint, const ImageStamp& stamp) const {
-  PatchedFile file(path_, PatchedFile::Overwrites::kWait);
+  PatchedFile file(path_);
   const std::string text = datasources::TextOf(stamp);
   for (const auto& [level, record] : records_) {
     if (record.image.fingerprint != fingerprint || record.image.stamp == stamp) continue;

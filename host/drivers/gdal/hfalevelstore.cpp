@@ -80,6 +80,12 @@ HfaLevelStore::HfaLevelStore(std::string path, const GdalFormat& format,
 
 HfaLevelStore::~HfaLevelStore() {
   if (build_) EndWriting(*build_);
+  try {
+    if (isChanged_) GiveBackSpace();
+    Settle();
+  } catch (const std::exception&) {
+    // deliberate: nothing is lost but space, which the next change finds again
+  }
   if (lock_ >= 0) close(lock_);
 }
 
@@ -104,7 +110,7 @@ void HfaLevelStore::Reload() {
 /// Keeps other builds away until the store goes.
 void HfaLevelStore::LockFile() {
   if (lock_ >= 0) return;
-  lock_ = open(path_.c_str(), O_RDONLY | O_CLOEXEC);
+  lock_ = open(path_.c_str(), O_RDWR | O_CLOEXEC);
   // A file system without locks is none to refuse work on.
   if (lock_ < 0 || flock(lock_, LOCK_EX | LOCK_NB) == 0 || errno != EWOULDBLOCK) return;
   close(lock_);

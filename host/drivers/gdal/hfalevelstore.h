@@ -11,6 +11,7 @@
 
 #include "host/datasources/imagewatch.h"
 #include "host/datasources/levelstore.h"
+#include "host/drivers/gdal/byteranges.h"
 #include "host/drivers/gdal/gdalformats.h"
 #include "host/drivers/gdal/hfarecord.h"
 #include "host/drivers/gdal/hfatree.h"
@@ -34,13 +35,15 @@ struct HfaBuild {
   std::vector<unsigned> channels;
   std::vector<GDALRasterBandH> bands;  ///< one for each of `channels`
   std::vector<bool> covered;           ///< one for each pixel of the level
+  ByteRanges replaced;                 ///< where the pixels stand that these ones replace
+  std::optional<HfaRecord> record;     ///< to be put over the level's before they do
   bool isClosed = false;               ///< stored or given up
   /// Of the level that it is computed from; none: it is computed from the image.
   std::optional<datasources::ImageRecord> source;
 };
 
 /// A level appears in the file when all of its pixels are on the disk, and is marked not valid at
-/// first; one that is written anew is marked not valid before.
+/// first. One that is written anew stays what it was until then.
 ///
 /// Operations may be called from several threads; one level is written at a time.
 class HfaLevelStore final : public datasources::ILevelStore {
@@ -64,7 +67,7 @@ class HfaLevelStore final : public datasources::ILevelStore {
   const GdalFormat& Format() const { return format_; }
   /// Where the stored level stands in the lists of `channels`. \throws orin::Exception  it does not
   std::vector<int> PositionsOf(unsigned level, const std::vector<unsigned>& channels);
-  /// Takes the level's validity away, and opens the file.
+  /// Opens the file, and makes room for the pixels.
   std::shared_ptr<HfaBuild> BeginWriting(unsigned level, const std::vector<unsigned>& channels);
   /// Gives up what is not stored.
   void EndWriting(HfaBuild& build) noexcept;
@@ -82,7 +85,11 @@ class HfaLevelStore final : public datasources::ILevelStore {
   void RequireRoom(unsigned level, const std::vector<unsigned>& channels) const;
   HfaRecord RecordToWrite(unsigned level, const std::vector<unsigned>& channels);
   void Record(unsigned level, const HfaRecord& record);
+  std::optional<datasources::ImageRecord> SourceImage() const;
+  void OpenBuild(HfaBuild& build, const std::vector<unsigned>& missing);
   void StoreBuild();
+  void GiveBackSpace();
+  void Shorten();
 
   std::optional<datasources::ImageStamp> Now() const;
   void Trust(const datasources::ImageStamp& now) const;
@@ -106,6 +113,8 @@ class HfaLevelStore final : public datasources::ILevelStore {
   std::map<unsigned, Pending> pending_;
   std::shared_ptr<HfaBuild> build_;
   std::shared_ptr<datasources::ImageWatch> watch_;  ///< of the image; null when nothing can be told
+  ByteRanges freed_;         ///< that levels had which were written anew since the store was opened
+  bool isChanged_ = false;   ///< space may be given back
   bool isChanging_ = false;  ///< from the first write into the file to the last
   std::optional<datasources::ImageStamp> before_;  ///< of the image, when the changes began
   unsigned lastRead_ = 0;                          ///< level read since the last Create

@@ -1,17 +1,16 @@
-/// How a level gets into an ERDAS Imagine file: not valid first, then its pixels, then valid; and
-/// how levels leave it.
+/// How a level gets into an ERDAS Imagine file: its pixels, then not valid, then valid.
 // SPDX-License-Identifier: MIT
 #include <algorithm>
 #include <filesystem>
 
 #include "host/drivers/gdal/hfalevelstore.h"
+#include "host/drivers/gdal/hfaremoval.h"
+#include "host/drivers/gdal/hfaspace.h"
 #include "host/drivers/gdal/patchedfile.h"
 #include "host/services/exception.h"
 #include "host/services/text.h"
 
 namespace orin::drivers {
-
-using Overwrites = PatchedFile::Overwrites;
 
 /// The format would go on in a second file.
 void HfaLevelStore::RequireRoom(unsigned level, const std::vector<unsigned>& channels) const {
@@ -40,6 +39,8 @@ HfaRecord HfaLevelStore::RecordToWrite(unsigned level, const std::vector<unsigne
   if (pending != pending_.end()) record.method = pending->second.method;
   record.sourceLevel = lastRead_ ? lastRead_ : 1;
   record.program = HfaProgramName();
+  if (before != records_.end() && before->second.method != record.method)
+    std::replace(record.validity.begin(), record.validity.end(), kHfaValid, kHfaInvalid);
   for (const unsigned channel : channels) record.validity.at(channel - 1) = kHfaInvalid;
   return record;
 }
@@ -52,15 +53,45 @@ void HfaLevelStore::Record(unsigned level, const HfaRecord& record) {
   BeginChange();
   const auto item = FindHfaItem(path_, HfaRecordKey(level));
   if (item && item->textBytes == text.size() + 1) {
-    PatchedFile file(path_, Overwrites::kWait);
+    PatchedFile file(path_);
     file.Write(item->text, text.data(), text.size());
     file.Commit();
   } else {
-    HfaUpdate update(path_, Overwrites::kWait);
+    HfaUpdate update(path_);
     update.SetItem(HfaRecordKey(level), text);
     update.Commit();
   }
   Reload();
+}
+
+/// What the level that is about to be built remembers of the image; none: what the image is now.
+std::optional<datasources::ImageRecord> HfaLevelStore::SourceImage() const {
+  if (lastRead_ == 0) return std::nullopt;
+  const auto source = records_.find(lastRead_);
+  const bool isCurrent = source != records_.end() && StatusOf(lastRead_, FingerprintNow()) ==
+                                                         datasources::LevelStatus::kCurrent;
+  return isCurrent ? source->second.image : datasources::ImageRecord();
+}
+
+/// Opens the file for the build: stored channels get new room, `missing` ones their level.
+void HfaLevelStore::OpenBuild(HfaBuild& build, const std::vector<unsigned>& missing) {
+  std::vector<HfaBlockMap> renewed;
+  for (const unsigned channel : build.channels) {
+    if (pyramid_.Find(channel, build.level) < 0) continue;
+    auto map = FindHfaBlockMap(path_, channel, build.level);
+    if (!map) Fail(_("%s: level %u is damaged and cannot be written."), build.level);
+    build.replaced.Add(HfaBytesOf(path_, map->node));
+    renewed.push_back(std::move(*map));
+  }
+  build.update = std::make_unique<HfaUpdate>(path_, renewed);
+  if (!missing.empty()) build.update->AddLevel(build.level, missing);
+  for (const unsigned channel : build.channels) {
+    const int stored = pyramid_.Find(channel, build.level);
+    const int added = channel <= pyramid_.channels.size()
+                          ? static_cast<int>(pyramid_.channels[channel - 1].size())
+                          : 0;
+    build.bands.push_back(build.update->LevelBand(channel, stored >= 0 ? stored : added));
+  }
 }
 
 std::shared_ptr<HfaBuild> HfaLevelStore::BeginWriting(unsigned level,
@@ -74,28 +105,21 @@ std::shared_ptr<HfaBuild> HfaLevelStore::BeginWriting(unsigned level,
   std::vector<unsigned> missing;
   for (const unsigned channel : channels)
     if (pyramid_.Find(channel, level) < 0) missing.push_back(channel);
-  if (!missing.empty()) RequireRoom(level, missing);
+  RequireRoom(level, channels);
   BeginChange();
+  isChanged_ = true;
   auto build = std::make_shared<HfaBuild>();
-  if (const auto source = records_.find(lastRead_); source != records_.end())
-    build->source = StatusOf(lastRead_, FingerprintNow()) == datasources::LevelStatus::kCurrent
-                        ? source->second.image
-                        : datasources::ImageRecord();
-  else if (lastRead_) build->source = datasources::ImageRecord();
-  Record(level, RecordToWrite(level, channels));
-  build->update =
-      std::make_unique<HfaUpdate>(path_, missing.empty() ? Overwrites::kDirect : Overwrites::kWait);
-  if (!missing.empty()) build->update->AddLevel(level, missing);
-  for (const unsigned channel : channels) {
-    const int stored = pyramid_.Find(channel, level);
-    const int added = channel <= pyramid_.channels.size()
-                          ? static_cast<int>(pyramid_.channels[channel - 1].size())
-                          : 0;
-    build->bands.push_back(build->update->LevelBand(channel, stored >= 0 ? stored : added));
-  }
   build->level = level;
   build->channels = channels;
   build->covered.resize(uint64_t{image_.Width() / level} * (image_.Height() / level));
+  build->source = SourceImage();
+  const HfaRecord record = RecordToWrite(level, channels);
+  const auto item = FindHfaItem(path_, HfaRecordKey(level));
+  if (missing.empty() && item && item->textBytes == ComposeHfaRecord(record).size() + 1)
+    build->record = record;
+  else Record(level, record);  // too long for its place: the level is not valid from here on
+  RemoveUnlistedHfaLevels(path_, level);
+  OpenBuild(*build, missing);
   return build_ = std::move(build);
 }
 
@@ -119,7 +143,12 @@ void HfaLevelStore::StoreBuild() {
     Fail(_("%s: level %u is not complete and cannot be marked valid."), build.level);
   build.isClosed = true;
   const std::unique_ptr<HfaUpdate> update = std::move(build.update);
+  if (build.record) {
+    records_[build.level] = *build.record;
+    update->OverwriteItem(HfaRecordKey(build.level), ComposeHfaRecord(*build.record));
+  }
   update->Commit();
+  freed_.Add(build.replaced);
   pending_.erase(build.level);
   Reload();
 }
@@ -144,31 +173,6 @@ void HfaLevelStore::SetValid(unsigned level, const std::vector<unsigned>& channe
     for (const unsigned channel : channels) now.validity.at(channel - 1) = kHfaValid;
   Record(level, now);
   Settle();
-}
-
-/// The library knows no other way than to remove all of them; the space that they took stays.
-void HfaLevelStore::Remove(const std::vector<unsigned>& levels) {
-  const std::lock_guard lock(mutex_);
-  std::vector<std::string> keys;
-  std::optional<unsigned> going, staying;
-  for (const auto& names : pyramid_.channels)
-    for (const HfaLevelName& name : names) {
-      const bool goes = std::find(levels.begin(), levels.end(), name.factor) != levels.end();
-      if (name.factor >= 2) (goes ? going : staying) = name.factor;
-      keys.push_back(HfaRecordKey(name.factor));
-    }
-  if (!going) return;
-  if (staying)
-    Fail(
-        _("%s: levels inside this format are removed all together, and level %u is to stay. Remove "
-          "all of them, then build those again that are wanted."),
-        *staying);
-  if (!mayChange_) Fail(_("%s: is open for reading only; level %u cannot be removed."), *going);
-  LockFile();
-  HfaUpdate update(path_, Overwrites::kWait);
-  update.RemoveLevels(keys);
-  update.Commit();
-  Reload();
 }
 
 }  // namespace orin::drivers

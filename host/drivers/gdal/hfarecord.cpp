@@ -1,6 +1,7 @@
 // SPDX-License-Identifier: MIT
 #include "host/drivers/gdal/hfarecord.h"
 
+#include <algorithm>
 #include <charconv>
 #include <sstream>
 #include <vector>
@@ -9,8 +10,19 @@ namespace orin::drivers {
 
 std::string HfaRecordKey(unsigned level) { return "ORIN_LEVEL_" + std::to_string(level); }
 
+namespace {
+
+std::string Padded(std::string text, size_t length) {
+  text.resize(std::max(length, text.size()), ' ');
+  return text;
+}
+
+}  // namespace
+
 std::string ComposeHfaRecord(const HfaRecord& record) {
-  return record.method + ";" + std::to_string(record.sourceLevel) + ";" + record.program + ";" +
+  constexpr size_t kMethodLength = 8, kLevelLength = 5;
+  return Padded(record.method, kMethodLength) + ";" +
+         Padded(std::to_string(record.sourceLevel), kLevelLength) + ";" + record.program + ";" +
          record.validity + ";" + datasources::TextOf(record.image);
 }
 
@@ -20,6 +32,7 @@ std::optional<HfaRecord> ParseHfaRecord(const std::string& text, size_t channels
   for (std::string field; std::getline(stream, field, ';');) fields.push_back(field);
   if (fields.size() != 5) return std::nullopt;
   HfaRecord record{fields[0], 0, fields[2], fields[3], datasources::ParseImageRecord(fields[4])};
+  record.method.erase(record.method.find_last_not_of(' ') + 1);
   std::from_chars(fields[1].data(), fields[1].data() + fields[1].size(), record.sourceLevel);
   const bool isWhole = record.validity.size() == channels &&
                        record.validity.find_first_not_of("-01") == std::string::npos;

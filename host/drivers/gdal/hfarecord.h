@@ -24,8 +24,8 @@ struct HfaRecord {
 
 /// Name of the metadata item of the file that holds the record of `level`.
 std::string HfaRecordKey(unsigned level);
-/// The item's text, which ParseHfaRecord reads back. It ends with the stamp of `image`, and has the
-/// same length as long as nothing changes but validity and image.
+/// The item's text, which ParseHfaRecord reads back. It ends with the stamp of `image`, and all
+/// texts of one program for one number of channels have one length, but for levels beyond 99999.
 std::string ComposeHfaRecord(const HfaRecord& record);
 /// \param channels  of the image
 /// \returns nothing for a text that is no record of that many channels

@@ -1,105 +1,12 @@
 // SPDX-License-Identifier: MIT
 #include "host/drivers/gdal/hfatree.h"
 
-#include <cpl_vsi.h>
-
 #include <algorithm>
 #include <charconv>
-#include <cstdint>
-#include <cstring>
-#include <memory>
 #include <string_view>
-
-#include "host/services/exception.h"
-#include "host/services/text.h"
 
 namespace orin::drivers {
 namespace {
-
-// Positions within the file's parts, bytes; all numbers are little-endian.
-constexpr uint32_t kHeaderPointerAt = 16;
-constexpr uint32_t kRootPointerInHeader = 8;
-constexpr uint32_t kNodeBytes = 124;
-constexpr uint32_t kNameAt = 24, kNameBytes = 64;
-constexpr uint32_t kTypeAt = 88, kTypeBytes = 32;
-
-constexpr unsigned kMostNodes = 100000;        // more is a loop, or no file to work with
-constexpr uint32_t kMostListBytes = 1u << 20;  // of a list of names
-
-constexpr uint32_t kNextAt = 0, kPreviousAt = 4, kChildAt = 12;
-
-struct Node {
-  uint32_t position, next, child, data, dataBytes;
-  std::string name, type;
-};
-
-uint32_t NumberAt(std::string_view bytes, size_t at) {
-  uint32_t number = 0;
-  for (size_t i = 0; i < 4 && at + i < bytes.size(); ++i)
-    number |= uint32_t{static_cast<uint8_t>(bytes[at + i])} << (8 * i);
-  return number;
-}
-
-std::string TextAt(std::string_view bytes, size_t at, size_t length) {
-  const std::string_view field = bytes.substr(at, length);
-  return std::string(field.substr(0, field.find('\0')));
-}
-
-class TreeReader {
- public:
-  explicit TreeReader(const std::string& path)
-      : path_(path), file_(VSIFOpenL(path.c_str(), "rb"), [](VSILFILE* f) { VSIFCloseL(f); }) {
-    if (!file_) Fail();
-  }
-
-  Node Root() {
-    return NodeAt(
-        NumberAt(Bytes(NumberAt(Bytes(kHeaderPointerAt, 4), 0), 20), kRootPointerInHeader));
-  }
-
-  std::vector<Node> ChildrenOf(const Node& parent) {
-    std::vector<Node> children;
-    for (uint32_t at = parent.child; at != 0; at = children.back().next) {
-      if (++nodesRead_ > kMostNodes) Fail();
-      children.push_back(NodeAt(at));
-    }
-    return children;
-  }
-
-  std::string DataOf(const Node& node) {
-    return Bytes(node.data, std::min(node.dataBytes, kMostListBytes));
-  }
-
- private:
-  std::string Bytes(uint32_t position, uint32_t count) {
-    std::string bytes(count, '\0');
-    if (VSIFSeekL(file_.get(), position, SEEK_SET) != 0 ||
-        VSIFReadL(bytes.data(), 1, count, file_.get()) != count)
-      Fail();
-    return bytes;
-  }
-
-  Node NodeAt(uint32_t position) {
-    const std::string bytes = Bytes(position, kNodeBytes);
-    return {position,
-            NumberAt(bytes, kNextAt),
-            NumberAt(bytes, kChildAt),
-            NumberAt(bytes, 16),
-            NumberAt(bytes, 20),
-            TextAt(bytes, kNameAt, kNameBytes),
-            TextAt(bytes, kTypeAt, kTypeBytes)};
-  }
-
-  [[noreturn]] void Fail() const {
-    throw Exception(FormatString(_("%s: cannot be read: %s."), path_.c_str(),
-                                 _("its list of contents is damaged")),
-                    "host/drivers/gdal/hfatree", "orin::drivers::ReadHfaPyramid", 0);
-  }
-
-  std::string path_;
-  std::unique_ptr<VSILFILE, void (*)(VSILFILE*)> file_;
-  unsigned nodesRead_ = 0;
-};
 
 /// "scene.img(:Layer_1:_ss_4_)"; factor 0 for what is no level.
 HfaLevelName ParseName(std::string_view text) {
@@ -113,21 +20,35 @@ HfaLevelName ParseName(std::string_view text) {
   return name;
 }
 
-/// A text is its length, a position that nobody needs, and its characters. The list's first text is
-/// the name of a method; then come the number of names, a position, and the names.
+/// A text of a list of levels: its length, its position in the file, and its characters.
+struct ListText {
+  size_t at;  ///< of the length, within the list's data
+  std::string_view text;
+};
+constexpr size_t kTextHeaderBytes = 8;
+
+/// The list's first text is the name of a method; then come the number of names, a position, and
+/// the names.
+std::vector<ListText> NamesIn(std::string_view data) {
+  std::vector<ListText> names;
+  size_t at = kTextHeaderBytes + size_t{HfaNumberAt(data, 0)};
+  if (at + kTextHeaderBytes > data.size()) return names;
+  const uint32_t count = HfaNumberAt(data, at);
+  at += kTextHeaderBytes;
+  for (uint32_t i = 0; i < count && at + kTextHeaderBytes <= data.size(); ++i) {
+    const size_t length = HfaNumberAt(data, at);
+    if (length > data.size() - at - kTextHeaderBytes) break;
+    const std::string_view text = data.substr(at + kTextHeaderBytes, length);
+    names.push_back({at, text.substr(0, text.find('\0'))});
+    at += kTextHeaderBytes + length;
+  }
+  return names;
+}
+
 std::vector<HfaLevelName> ParseNames(std::string_view data) {
   std::vector<HfaLevelName> names;
-  size_t at = 8 + size_t{NumberAt(data, 0)};
-  if (at + 8 > data.size()) return names;
-  const uint32_t count = NumberAt(data, at);
-  at += 8;
-  for (uint32_t i = 0; i < count && at + 8 <= data.size(); ++i) {
-    const size_t length = NumberAt(data, at);
-    at += 8;
-    if (length > data.size() - at) break;
-    if (length > 0) names.push_back(ParseName(TextAt(data, at, length)));
-    at += length;
-  }
+  for (const ListText& entry : NamesIn(data))
+    if (HfaNumberAt(data, entry.at) > 0) names.push_back(ParseName(entry.text));
   return names;
 }
 
@@ -149,39 +70,49 @@ int HfaPyramid::Find(unsigned channel, unsigned factor) const {
   return found == levels.end() ? -1 : static_cast<int>(found - levels.begin());
 }
 
-std::vector<HfaPointer> PointersWithout(const HfaItemPlace& item) {
-  std::vector<HfaPointer> pointers;
-  pointers.push_back(item.previous ? HfaPointer{item.previous + kNextAt, item.next}
-                                   : HfaPointer{item.parent + kChildAt, item.next});
-  if (item.next) pointers.push_back({item.next + kPreviousAt, item.previous});
-  return pointers;
+std::vector<std::vector<HfaNode>> HfaItemListsOf(HfaTree& tree) {
+  std::vector<std::vector<HfaNode>> lists;
+  for (const HfaNode& table : tree.ChildrenOf(tree.Root()))
+    if (table.name == "GDAL_MetaData" && table.type == "Edsc_Table")
+      lists.push_back(tree.ChildrenOf(table));
+  return lists;
+}
+
+bool IsHfaItem(const HfaNode& node, const std::string& key) {
+  return node.name == key && node.type == "Edsc_Column";
 }
 
 std::optional<HfaItemPlace> FindHfaItem(const std::string& path, const std::string& key) {
-  TreeReader tree(path);
-  for (const Node& table : tree.ChildrenOf(tree.Root())) {
-    if (table.name != "GDAL_MetaData" || table.type != "Edsc_Table") continue;
-    uint32_t previous = 0;
-    for (const Node& column : tree.ChildrenOf(table)) {
-      if (column.name == key && column.type == "Edsc_Column") {
-        const std::string data = tree.DataOf(column);  // rows, position, type of 2 bytes, length
-        return HfaItemPlace{NumberAt(data, 4), NumberAt(data, 10), column.position,
-                            previous,          column.next,        table.position};
-      }
-      previous = column.position;
+  HfaTree tree(path);
+  for (const std::vector<HfaNode>& columns : HfaItemListsOf(tree))
+    for (const HfaNode& column : columns) {
+      if (!IsHfaItem(column, key)) continue;
+      const std::string data = tree.DataOf(column);  // rows, position, type of 2 bytes, length
+      return HfaItemPlace{HfaNumberAt(data, 4), HfaNumberAt(data, 10)};
     }
-  }
   return std::nullopt;
 }
 
+std::vector<HfaLayer> HfaLayersOf(HfaTree& tree) {
+  std::vector<HfaLayer> layers;
+  for (const HfaNode& layer : tree.ChildrenOf(tree.Root()))
+    if (layer.type == "Eimg_Layer") layers.push_back({layer, tree.ChildrenOf(layer)});
+  return layers;
+}
+
+unsigned FactorOfHfaPart(const HfaNode& part) {
+  return part.type == "Eimg_Layer_SubSample" ? ParseName("(:" + part.name).factor : 0;
+}
+
+bool IsHfaNameList(const HfaNode& part) { return part.type == "Eimg_RRDNamesList"; }
+
 HfaPyramid ReadHfaPyramid(const std::string& path) {
-  TreeReader tree(path);
+  HfaTree tree(path);
   HfaPyramid pyramid;
-  for (const Node& layer : tree.ChildrenOf(tree.Root())) {
-    if (layer.type != "Eimg_Layer") continue;
+  for (const HfaLayer& layer : HfaLayersOf(tree)) {
     std::vector<HfaLevelName> names, unlisted;
-    for (const Node& part : tree.ChildrenOf(layer)) {
-      if (part.type == "Eimg_RRDNamesList") names = ParseNames(tree.DataOf(part));
+    for (const HfaNode& part : layer.parts) {
+      if (IsHfaNameList(part)) names = ParseNames(tree.DataOf(part));
       if (part.type == "Eimg_Layer_SubSample") unlisted.push_back(ParseName("(:" + part.name));
       if (part.type == "ImgExternalRaster") pyramid.isSpilled = true;
     }
@@ -189,6 +120,49 @@ HfaPyramid ReadHfaPyramid(const std::string& path) {
     pyramid.channels.push_back(std::move(names.empty() ? unlisted : names));
   }
   return pyramid;
+}
+
+std::vector<unsigned> FactorsInHfaList(const std::string& data) {
+  std::vector<unsigned> factors;
+  for (const HfaLevelName& name : ParseNames(data)) factors.push_back(name.factor);
+  return factors;
+}
+
+HfaNameList NamesWithout(const std::string& data, const std::vector<unsigned>& factors) {
+  HfaNameList list;
+  std::string names;
+  for (const ListText& entry : NamesIn(data)) {
+    const unsigned factor = ParseName(entry.text).factor;
+    if (std::find(factors.begin(), factors.end(), factor) != factors.end()) {
+      list.isShorter = true;
+      continue;
+    }
+    ++list.names;
+    names += data.substr(entry.at, kTextHeaderBytes + HfaNumberAt(data, entry.at));
+  }
+  list.data = data;
+  if (!list.isShorter) return list;
+  const size_t count = kTextHeaderBytes + size_t{HfaNumberAt(data, 0)};
+  PutHfaNumber(list.data, count, list.names);
+  std::fill(list.data.begin() + std::ptrdiff_t(count + kTextHeaderBytes), list.data.end(), '\0');
+  list.data.replace(count + kTextHeaderBytes, names.size(), names);
+  return list;
+}
+
+std::vector<uint32_t> PointersInHfaNameList(const std::string& data) {
+  const size_t count = kTextHeaderBytes + size_t{HfaNumberAt(data, 0)};
+  std::vector<uint32_t> pointers;
+  if (count + kTextHeaderBytes > data.size()) return pointers;
+  for (const size_t at : {size_t{0}, count}) pointers.push_back(static_cast<uint32_t>(at + 4));
+  for (const ListText& entry : NamesIn(data))
+    pointers.push_back(static_cast<uint32_t>(entry.at + 4));
+  return pointers;
+}
+
+std::string PlaceHfaNameList(std::string data, uint32_t position) {
+  // What each leads to begins right behind it.
+  for (const uint32_t at : PointersInHfaNameList(data)) PutHfaNumber(data, at, position + at + 4);
+  return data;
 }
 
 }  // namespace orin::drivers

@@ -7,6 +7,8 @@
 #include <string>
 #include <vector>
 
+#include "host/drivers/gdal/hfanode.h"
+
 namespace orin::drivers {
 
 /// An entry of a channel's list of levels.
@@ -28,31 +30,50 @@ struct HfaPyramid {
   int Find(unsigned channel, unsigned factor) const;
 };
 
-/// Where a metadata item of the file stands: its text, and its node with the node's neighbours.
-struct HfaItemPlace {
-  uint32_t text = 0;       ///< position, bytes
-  uint32_t textBytes = 0;  ///< with the zero at its end
-  uint32_t node = 0;
-  uint32_t previous = 0;  ///< 0: it is the first child of `parent`
-  uint32_t next = 0;      ///< 0: it is the last one
-  uint32_t parent = 0;
-};
-
-/// A pointer of the tree that gets another value.
-struct HfaPointer {
-  uint32_t position;
-  uint32_t value;
-};
-
-/// What takes an item out of the tree.
-std::vector<HfaPointer> PointersWithout(const HfaItemPlace& item);
-
-/// Nothing when the file has no such item. \param path  as below
-/// \throws orin::Exception  the file's tree cannot be read
-std::optional<HfaItemPlace> FindHfaItem(const std::string& path, const std::string& key);
-
 /// \param path  also a name of the library: "/vsizip/..."
 /// \throws orin::Exception  the file's tree cannot be read
 HfaPyramid ReadHfaPyramid(const std::string& path);
+
+/// Where the text of a metadata item of the file stands.
+struct HfaItemPlace {
+  uint32_t text = 0;       ///< position, bytes
+  uint32_t textBytes = 0;  ///< with the zero at its end
+};
+
+/// Nothing when the file has no such item.
+/// \throws orin::Exception  the file's tree cannot be read
+std::optional<HfaItemPlace> FindHfaItem(const std::string& path, const std::string& key);
+/// The lists of children that the metadata items of the file stand in, whole.
+std::vector<std::vector<HfaNode>> HfaItemListsOf(HfaTree& tree);
+/// True for the item of that name.
+bool IsHfaItem(const HfaNode& node, const std::string& key);
+
+/// The node of a channel's image, with what belongs to its levels.
+struct HfaLayer {
+  HfaNode node;
+  std::vector<HfaNode> parts;  ///< its children
+};
+
+/// The channels in their order.
+std::vector<HfaLayer> HfaLayersOf(HfaTree& tree);
+/// The decimation factor of the level that `part` of a channel is; 0: it is none.
+unsigned FactorOfHfaPart(const HfaNode& part);
+/// True for a channel's list of levels.
+bool IsHfaNameList(const HfaNode& part);
+
+/// The factors that a list of levels names. \param data  of its node
+std::vector<unsigned> FactorsInHfaList(const std::string& data);
+
+/// A channel's list of levels without some of them, for a place of its own.
+struct HfaNameList {
+  std::string data;    ///< as many bytes as before; PlaceHfaNameList puts its pointers right
+  unsigned names = 0;  ///< that are left
+  bool isShorter = false;
+};
+HfaNameList NamesWithout(const std::string& data, const std::vector<unsigned>& factors);
+/// Where the numbers stand in `data` that lead to its own bytes.
+std::vector<uint32_t> PointersInHfaNameList(const std::string& data);
+/// `data` of a list, with the pointers that it has when it stands at `position`.
+std::string PlaceHfaNameList(std::string data, uint32_t position);
 
 }  // namespace orin::drivers

@@ -46,8 +46,11 @@ GDALDatasetH OpenForUpdate(const std::string& path, const std::string& libraryNa
 
 }  // namespace
 
-HfaUpdate::HfaUpdate(const std::string& path, PatchedFile::Overwrites overwrites)
-    : path_(path), file_(path, overwrites), dataset_(OpenForUpdate(path, file_.LibraryName())) {}
+HfaUpdate::HfaUpdate(const std::string& path, const std::vector<HfaBlockMap>& renewed)
+    : path_(path), file_(path) {
+  for (const HfaBlockMap& map : renewed) RenewHfaBlocks(file_, map);
+  dataset_ = OpenForUpdate(path, file_.LibraryName());
+}
 
 HfaUpdate::~HfaUpdate() {
   const GdalErrors ignored;
@@ -88,26 +91,13 @@ void HfaUpdate::AddLevel(unsigned level, const std::vector<unsigned>& channels) 
           "host/drivers/gdal/hfaupdate", "orin::drivers::HfaUpdate::AddLevel", 0);
 }
 
-void HfaUpdate::RemoveLevels(const std::vector<std::string>& keys) {
-  const GdalErrors errors;
-  const CPLErr answer =
-      GDALBuildOverviews(dataset_, "NONE", 0, nullptr, 0, nullptr, GDALDummyProgress, nullptr);
-  file_.RequireWritten();  // says why, which the library does not
-  errors.Require(answer == CE_None, CannotWrite(), path_);
-  removedItems_ = keys;
-}
-
-/// The library cannot: it would leave the item there with an empty text.
-void HfaUpdate::TakeOut(const std::string& key) {
+void HfaUpdate::OverwriteItem(const std::string& key, const std::string& text) {
   const auto item = FindHfaItem(file_.LibraryName(), key);
-  if (!item) return;
-  for (const HfaPointer& pointer : PointersWithout(*item)) {
-    const uint32_t value = pointer.value;
-    const unsigned char bytes[] = {
-        static_cast<unsigned char>(value), static_cast<unsigned char>(value >> 8),
-        static_cast<unsigned char>(value >> 16), static_cast<unsigned char>(value >> 24)};
-    file_.Write(pointer.position, bytes, sizeof bytes);
-  }
+  if (!item || item->textBytes != text.size() + 1)
+    throw Exception(FormatString(CannotWrite(), path_.c_str(), _("another program changed it")),
+                    "host/drivers/gdal/hfaupdate", "orin::drivers::HfaUpdate::OverwriteItem", 0);
+  file_.WriteNow(item->text, text.data(), text.size());
+  file_.Sync();
 }
 
 GDALRasterBandH HfaUpdate::LevelBand(unsigned channel, int position) const {
@@ -155,7 +145,6 @@ void HfaUpdate::Commit() {
     file_.RequireWritten();
     errors.Require(true, CannotWrite(), path_);
   }
-  for (const std::string& key : removedItems_) TakeOut(key);
   file_.Commit();
 }
 

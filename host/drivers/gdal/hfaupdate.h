@@ -9,6 +9,7 @@
 #include <vector>
 
 #include "basic/gobs/raster.h"
+#include "host/drivers/gdal/hfablocks.h"
 #include "host/drivers/gdal/patchedfile.h"
 
 namespace orin::drivers {
@@ -17,9 +18,9 @@ namespace orin::drivers {
 /// again, what it was. For one thread at a time.
 class HfaUpdate {
  public:
-  /// \param overwrites  kDirect for writing over the pixels of levels that are there
+  /// \param renewed  of levels whose pixels get a new place, where they are all written anew
   /// \throws orin::Exception  the file cannot be opened for writing
-  HfaUpdate(const std::string& path, PatchedFile::Overwrites overwrites);
+  explicit HfaUpdate(const std::string& path, const std::vector<HfaBlockMap>& renewed = {});
   ~HfaUpdate();
   HfaUpdate(const HfaUpdate&) = delete;
   HfaUpdate& operator=(const HfaUpdate&) = delete;
@@ -29,9 +30,9 @@ class HfaUpdate {
   /// Adds a level to `channels` (1-based), none of which has it.
   /// \throws orin::Exception  the file already holds a level of the same size, or it cannot be made
   void AddLevel(unsigned level, const std::vector<unsigned>& channels);
-  /// Takes all levels of all channels out of the file, and the items of those names.
-  /// \throws orin::Exception  they cannot be removed
-  void RemoveLevels(const std::vector<std::string>& keys);
+  /// Puts another text of the same length into the item, at once and durably, before everything
+  /// else. \throws orin::Exception  there is no such item, or it cannot be written
+  void OverwriteItem(const std::string& key, const std::string& text);
   /// The level at `position` of the channel's list.
   GDALRasterBandH LevelBand(unsigned channel, int position) const;
   /// Stores one channel of a block, and where the block ends at the level's last column or row, the
@@ -46,12 +47,10 @@ class HfaUpdate {
 
  private:
   void Close();
-  void TakeOut(const std::string& key);
 
   std::string path_;
   PatchedFile file_;
   GDALDatasetH dataset_ = nullptr;
-  std::vector<std::string> removedItems_;
 };
 
 }  // namespace orin::drivers

@@ -17,10 +17,8 @@
 
 namespace orin::drivers {
 
-PatchedFile::PatchedFile(std::string path, Overwrites overwrites)
-    : path_(std::move(path)),
-      overwrites_(overwrites),
-      descriptor_(open(path_.c_str(), O_RDWR | O_CLOEXEC)) {
+PatchedFile::PatchedFile(std::string path)
+    : path_(std::move(path)), descriptor_(open(path_.c_str(), O_RDWR | O_CLOEXEC)) {
   struct stat status {};
   if (descriptor_ < 0 || fstat(descriptor_, &status) != 0) {
     const int reason = errno;
@@ -77,7 +75,7 @@ bool PatchedFile::PutThrough(uint64_t position, const char* bytes, size_t count)
 size_t PatchedFile::Write(uint64_t position, const void* bytes, size_t count) {
   const auto* from = static_cast<const char*>(bytes);
   size_t done = 0;
-  while (overwrites_ == Overwrites::kWait && done < count && position + done < end_) {
+  while (done < count && position + done < end_) {
     const uint64_t at = position + done;
     const size_t inPage = at % kPageBytes;
     const size_t part = std::min({count - done, kPageBytes - inPage, size_t(end_ - at)});
@@ -86,6 +84,24 @@ size_t PatchedFile::Write(uint64_t position, const void* bytes, size_t count) {
   }
   if (done < count && !PutThrough(position + done, from + done, count - done)) return done;
   return error_ == 0 ? count : 0;
+}
+
+void PatchedFile::WriteNow(uint64_t position, const void* bytes, size_t count) {
+  const auto* from = static_cast<const char*>(bytes);
+  PutThrough(position, from, count);
+  for (auto page = pages_.lower_bound(position / kPageBytes);
+       page != pages_.end() && page->first * kPageBytes < position + count; ++page) {
+    const uint64_t first = std::max(position, page->first * kPageBytes);
+    const uint64_t last = std::min(position + count, (page->first + 1) * kPageBytes);
+    std::memcpy(page->second.data() + first % kPageBytes, from + (first - position), last - first);
+  }
+}
+
+void PatchedFile::Sync() {
+  RequireWritten();
+  if (fsync(descriptor_) == 0) return;
+  error_ = errno;
+  FailToWrite();
 }
 
 size_t PatchedFile::Read(uint64_t position, void* bytes, size_t count) {
@@ -143,18 +159,12 @@ void PatchedFile::RequireWritten() const {
 }
 
 void PatchedFile::Commit() {
-  RequireWritten();
-  const auto sync = [this] {
-    if (fsync(descriptor_) == 0) return;
-    error_ = errno;
-    FailToWrite();
-  };
   const std::vector<FilePatch> patches = Waiting();
-  sync();
+  Sync();
   isCommitted_ = true;  // from here on something may refer to what was appended
   for (const FilePatch& patch : patches)
     if (!PutThrough(patch.position, patch.bytes.data(), patch.bytes.size())) FailToWrite();
-  sync();
+  Sync();
 }
 
 }  // namespace orin::drivers

@@ -22,13 +22,8 @@ struct FilePatch {
 /// back to what it was. For one thread at a time.
 class PatchedFile {
  public:
-  enum class Overwrites {
-    kWait,   ///< until `Commit`
-    kDirect  ///< go to the file at once: for pixels that nobody counts on
-  };
-
   /// \throws orin::Exception  the file cannot be opened for writing
-  PatchedFile(std::string path, Overwrites overwrites);
+  explicit PatchedFile(std::string path);
   ~PatchedFile();
   PatchedFile(const PatchedFile&) = delete;
   PatchedFile& operator=(const PatchedFile&) = delete;
@@ -40,6 +35,12 @@ class PatchedFile {
   /// Makes what was appended durable, then the waiting overwrites, each by one write.
   /// \throws orin::Exception  a write of the library failed, or one of these does
   void Commit();
+
+  /// Overwrites bytes that nothing refers to, or that may change before everything else, at once.
+  void WriteNow(uint64_t position, const void* bytes, size_t count);
+  /// Makes durable what was written at once.
+  /// \throws orin::Exception  it cannot be
+  void Sync();
 
   /// Throws when a write failed, also one that the library said nothing of.
   /// \throws orin::Exception
@@ -60,7 +61,6 @@ class PatchedFile {
 
   std::string path_;
   std::string libraryName_;
-  Overwrites overwrites_;
   int descriptor_ = -1;
   uint64_t end_ = 0;   ///< of what was there before; bytes
   uint64_t size_ = 0;  ///< with what was appended

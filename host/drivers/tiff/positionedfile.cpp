@@ -2,7 +2,6 @@
 #include "host/drivers/tiff/positionedfile.h"
 
 #include <cerrno>
-#include <csignal>
 #include <cstdio>
 #include <cstring>
 #include <filesystem>
@@ -213,20 +212,6 @@ void PositionedFile::Remove() {
   if (unlink(path_.c_str()) != 0)
     Fail(_("%s: cannot be deleted: %s."), path_, std::strerror(errno), "PositionedFile::Remove()");
   SyncFolderOf(path_);
-}
-
-PositionedFile::Alone PositionedFile::DoAlone(const std::function<void()>& action) {
-  // Who opens the file meanwhile waits, and the system announces it by a signal: by one that is
-  // ignored where nobody asked for it, not by the usual one, which ends the process.
-  if (fcntl(descriptor_, F_SETSIG, SIGURG) != 0) return Alone::kCannotTell;
-  if (fcntl(descriptor_, F_SETLEASE, F_WRLCK) != 0)
-    return errno == EAGAIN ? Alone::kOthersHaveItOpen : Alone::kCannotTell;
-  const struct Release {
-    int descriptor;
-    ~Release() { fcntl(descriptor, F_SETLEASE, F_UNLCK); }
-  } release{descriptor_};
-  action();
-  return Alone::kDone;
 }
 
 }  // namespace orin::drivers

@@ -9,6 +9,8 @@
 #include <mutex>
 #include <string>
 
+#include "host/services/filealone.h"
+
 namespace orin::drivers {
 
 /// Reads and writes of different threads do not disturb each other.
@@ -53,10 +55,10 @@ class PositionedFile {
   /// Removes the file's name, durably.
   void Remove();
 
-  enum class Alone { kDone, kOthersHaveItOpen, kCannotTell };
+  using Alone = orin::Alone;
   /// Does `action` while nothing else has the file open, in this process or another, and nobody can
   /// open it. \returns whether it was done, or why not
-  Alone DoAlone(const std::function<void()>& action);
+  Alone DoAlone(const std::function<void()>& action) { return orin::DoAlone(descriptor_, action); }
 
  private:
   int64_t Modified() const;

@@ -1,6 +1,8 @@
 // SPDX-License-Identifier: MIT
 #include <gmock/gmock.h>
 
+#include <algorithm>
+
 #include "host/datasources/overviewaccessors.h"
 #include "host/drivers/gdal/hfarecord.h"
 #include "host/drivers/gdal/hfatree.h"
@@ -27,12 +29,13 @@ class HfaLevels : public GdalFiles {
   std::string file_;
 };
 
-uint8_t LevelPixel(uint32_t x, uint32_t y, unsigned channel, unsigned level) {
-  return uint8_t(x * 3 + y * 5 + channel * 17 + level);
+/// Pixels of different editions of a level differ everywhere.
+uint8_t LevelPixel(uint32_t x, uint32_t y, unsigned channel, unsigned level, unsigned edition = 0) {
+  return uint8_t(x * 3 + y * 5 + channel * 17 + level + edition * 101);
 }
 
 /// Writes the rows from `first` up to `last` of a level.
-void WriteRows(IRasterWriter& writer, uint32_t first, uint32_t last) {
+void WriteRows(IRasterWriter& writer, uint32_t first, uint32_t last, unsigned edition = 0) {
   for (uint32_t y = first; y < last; y += 64) {
     gobs::Raster block({writer.GetWidth(), std::min(64u, last - y), writer.GetChannelCount(),
                         writer.GetDataType()},
@@ -41,23 +44,24 @@ void WriteRows(IRasterWriter& writer, uint32_t first, uint32_t last) {
     for (uint32_t row = 0; row < block.height; ++row)
       for (uint32_t x = 0; x < block.width; ++x)
         for (const unsigned channel : writer.GetChannelsInfo())
-          *to++ = LevelPixel(x, y + row, channel, writer.GetLevel());
+          *to++ = LevelPixel(x, y + row, channel, writer.GetLevel(), edition);
     writer.Write(block);
   }
 }
 
 void Build(datasources::IRasterDataset& dataset, unsigned level,
-           const std::vector<unsigned>& channels) {
+           const std::vector<unsigned>& channels, unsigned edition = 0,
+           const std::string& method = "NEAREST") {
   BasicOverviewWriterAccessor accessor(&dataset, channels);
-  accessor.SetResamplingName("NEAREST");
+  accessor.SetResamplingName(method);
   accessor.CreateLevel(level);
   const std::unique_ptr<IRasterWriter> writer(accessor.CreateRasterWriter(level));
-  WriteRows(*writer, 0, writer->GetHeight());
+  WriteRows(*writer, 0, writer->GetHeight(), edition);
   accessor.SetLevelValid(level, true);
 }
 
 /// What is wrong with the image or its levels in the eyes of the library; empty when nothing is.
-std::string WrongPixels(const std::string& file) {
+std::string WrongPixels(const std::string& file, unsigned edition = 0) {
   const drivers::GdalErrors errors;
   const std::unique_ptr<GDALDataset> dataset(GDALDataset::Open(file.c_str()));
   if (!dataset) return "cannot be opened: " + errors.Reason();
@@ -79,7 +83,7 @@ std::string WrongPixels(const std::string& file) {
         return "level cannot be read: " + errors.Reason();
       for (int i = 0; i < width * height; ++i)
         if (pixels[size_t(i)] != LevelPixel(uint32_t(i % width), uint32_t(i / width),
-                                            unsigned(channel), unsigned(factor)))
+                                            unsigned(channel), unsigned(factor), edition))
           return "level " + std::to_string(factor) + " differs";
     }
   }
@@ -136,21 +140,90 @@ TEST_F(HfaLevels, ThatAreGivenUpLeaveTheFileAsItWasButForTheRecord) {
   EXPECT_LT(std::filesystem::file_size(file_), size + 4096);
 }
 
-TEST_F(HfaLevels, LoseTheirValidityByTheFirstWriteAndKeepItLostWhenGivenUp) {
+TEST_F(HfaLevels, StayWhatTheyAreWhenTheirNewPixelsAreGivenUp) {
   Build(*Open(file_, kUpdate), 2, {1, 2});
+  const std::string before = BytesOf(file_);
   const auto dataset = Open(file_, kUpdate);
   BasicOverviewWriterAccessor accessor(dataset.get(), {2});
+  accessor.SetResamplingName("AVERAGE");
   accessor.CreateLevel(2);
-  EXPECT_EQ("11", Validity(file_, 2));
   {
     const std::unique_ptr<IRasterWriter> writer(accessor.CreateRasterWriter(2));
-    WriteRows(*writer, 0, 64);
-    EXPECT_EQ("10", Validity(file_, 2));
+    WriteRows(*writer, 0, writer->GetHeight(), 1);
+    EXPECT_EQ("11", Validity(file_, 2));
+    EXPECT_EQ("", WrongPixels(file_));
+    EXPECT_LT(before.size() + 150 * 101, std::filesystem::file_size(file_));
   }
-  EXPECT_EQ("10", Validity(file_, 2));
-  EXPECT_EQ("", WrongPixels(file_));
-  Build(*dataset, 2, {2});
   EXPECT_EQ("11", Validity(file_, 2));
+  EXPECT_EQ("", WrongPixels(file_));
+  EXPECT_EQ(before.size(), std::filesystem::file_size(file_));
+}
+
+TEST_F(HfaLevels, ThatAreWrittenAnewForSomeChannelsByAnotherMethodAreNotValidForTheOthers) {
+  Build(*Open(file_, kUpdate), 2, {1, 2});
+  Build(*Open(file_, kUpdate), 2, {2}, 0, "MODE");
+  EXPECT_EQ("01", Validity(file_, 2));
+  Build(*Open(file_, kUpdate), 2, {1}, 0, "MODE");
+  EXPECT_EQ("11", Validity(file_, 2));
+}
+
+/// One channel of a level as a dataset that stays open shows it.
+std::string ShownBy(GDALDataset& dataset, int channel, int rows) {
+  GDALRasterBand& level = *dataset.GetRasterBand(channel)->GetOverview(0);
+  std::string pixels(size_t(level.GetXSize()) * size_t(rows), '\0');
+  level.FlushCache(false);  // also forgets what it has read
+  EXPECT_EQ(CE_None, level.RasterIO(GF_Read, 0, 0, level.GetXSize(), rows, pixels.data(),
+                                    level.GetXSize(), rows, GDT_Byte, 0, 0, nullptr));
+  return pixels;
+}
+
+TEST_F(HfaLevels, AreReadAsTheyWereByWhoHadTheFileOpen) {
+  for (const char* const compressed : {"COMPRESSED=NO", "COMPRESSED=YES"}) {
+    WritePicture(file_, "HFA",
+                 {.width = kWidth, .height = kHeight, .channels = 2, .options = {compressed}});
+    for (const unsigned level : {2u, 4u}) Build(*Open(file_, kUpdate), level, {1, 2});
+    const auto size = std::filesystem::file_size(file_);
+    {
+      const std::unique_ptr<GDALDataset> reader(GDALDataset::Open(file_.c_str()));
+      const std::string first = ShownBy(*reader, 1, 64);
+      const std::string all =
+          ShownBy(*std::unique_ptr<GDALDataset>(GDALDataset::Open(file_.c_str())), 1, 101);
+      for (const unsigned edition : {1u, 2u}) {
+        for (const unsigned level : {2u, 4u}) {
+          const auto dataset = Open(file_, kUpdate);
+          for (const unsigned channel : {1u, 2u}) Build(*dataset, level, {channel}, edition);
+        }
+        EXPECT_EQ("", WrongPixels(file_, edition));
+        EXPECT_TRUE(first == ShownBy(*reader, 1, 64));
+        EXPECT_TRUE(all == ShownBy(*reader, 1, 101));
+      }
+      EXPECT_LT(size, std::filesystem::file_size(file_));
+    }
+    for (const unsigned level : {2u, 4u}) Build(*Open(file_, kUpdate), level, {1, 2}, 3);
+    EXPECT_EQ("", WrongPixels(file_, 3));
+    EXPECT_EQ("11", Validity(file_, 2));
+    EXPECT_GE(size * 102 / 100, std::filesystem::file_size(file_));
+    std::filesystem::remove(file_);
+  }
+}
+
+TEST_F(HfaLevels, TakeTheSameRoomAfterManyRebuilds) {
+  for (const char* const compressed : {"COMPRESSED=NO", "COMPRESSED=YES"}) {
+    WritePicture(file_, "HFA",
+                 {.width = kWidth, .height = kHeight, .channels = 2, .options = {compressed}});
+    for (const unsigned level : {2u, 4u}) Build(*Open(file_, kUpdate), level, {1, 2});
+    const auto size = std::filesystem::file_size(file_);
+    for (unsigned edition = 1; edition <= 5; ++edition) {
+      {
+        const auto dataset = Open(file_, kUpdate);
+        for (const unsigned level : {2u, 4u})
+          for (const unsigned channel : {1u, 2u}) Build(*dataset, level, {channel}, edition);
+      }
+      EXPECT_EQ("", WrongPixels(file_, edition));
+      EXPECT_GE(size * 102 / 100, std::filesystem::file_size(file_)) << compressed << edition;
+    }
+    std::filesystem::remove(file_);
+  }
 }
 
 TEST_F(HfaLevels, ThatTheFormatCannotTellApartAreRefused) {
@@ -215,7 +288,7 @@ void AddLevel(const std::string& libraryName, int factor) {
 TEST_F(HfaLevels, AreWholeOrAbsentAfterEveryWriteOfACommit) {
   std::filesystem::create_directory(File("state"));
   for (const int factor : {2, 3, 5, 9, 17}) {
-    PatchedFile patched(file_, PatchedFile::Overwrites::kWait);
+    PatchedFile patched(file_);
     AddLevel(patched.LibraryName(), factor);
     const std::vector<FilePatch> patches = patched.Waiting();
     EXPECT_FALSE(patches.empty());
@@ -238,53 +311,62 @@ TEST_F(HfaLevels, AreWholeOrAbsentAfterEveryWriteOfACommit) {
   }
 }
 
-/// The same of a removal. What is left of the levels is theirs, or is none.
-TEST_F(HfaLevels, AreTheirOwnOrAbsentAfterEveryWriteOfARemoval) {
-  for (const unsigned level : {2u, 3u, 5u}) Build(*Open(file_, kUpdate), level, {1, 2});
-  std::filesystem::create_directory(File("state"));
-  std::filesystem::copy(file_, File("state/image.img"));
-  PatchedFile patched(file_, PatchedFile::Overwrites::kWait);
-  {
-    const drivers::GdalErrors errors;
-    const std::unique_ptr<GDALDataset> dataset(
-        GDALDataset::Open(patched.LibraryName().c_str(), GDAL_OF_UPDATE));
-    ASSERT_EQ(CE_None, dataset->BuildOverviews("NONE", 0, nullptr, 0, nullptr, nullptr, nullptr));
-  }
-  for (const unsigned level : {2u, 3u, 5u}) {
-    const auto item = drivers::FindHfaItem(patched.LibraryName(), drivers::HfaRecordKey(level));
-    ASSERT_TRUE(item);
-    for (const auto& pointer : drivers::PointersWithout(*item))
-      patched.Write(pointer.position, &pointer.value, sizeof pointer.value);
-  }
-  const std::vector<FilePatch> patches = patched.Waiting();
-  EXPECT_FALSE(patches.empty());
-  std::string state = BytesOf(file_);
-  for (const FilePatch& patch : patches) {
-    state.replace(patch.position, patch.bytes.size(), patch.bytes);
-    WriteBytes(File("state/image.img"), state);
-    EXPECT_EQ("", WrongPixels(File("state/image.img")));
-    EXPECT_EQ("", RefusalOf([&] { Open(File("state/image.img"), kUpdate); }));
-    Build(*Open(File("state/image.img"), kUpdate), 2, {1, 2});
-    EXPECT_EQ("", WrongPixels(File("state/image.img")));
-  }
-  const auto dataset = Open(file_, kUpdate);
-  dataset->GetSource()->Levels()->Remove({2, 3, 5});
-  EXPECT_TRUE(dataset->GetSource()->Levels()->List().empty());
-  EXPECT_EQ(state.size(), BytesOf(file_).size());
-  EXPECT_EQ(0,
-            GDALGetOverviewCount(
-                std::unique_ptr<GDALDataset>(GDALDataset::Open(file_.c_str()))->GetRasterBand(1)));
-  EXPECT_EQ("", WrongPixels(file_));
+uint64_t SizeWithLevels(const std::string& file, const std::vector<unsigned>& levels) {
+  WritePicture(file, "HFA", {.width = kWidth, .height = kHeight, .channels = 2});
+  for (const unsigned level : levels) Build(*Open(file, kUpdate), level, {1, 2});
+  return std::filesystem::file_size(file);
 }
 
-TEST_F(HfaLevels, AreRemovedAllTogether) {
+TEST_F(HfaLevels, AreRemovedWhileOthersStayAndMoveUp) {
+  constexpr uint64_t kLittle = 4 * 1024;  // parts of the tree that find no room in front
+  for (const std::vector<unsigned>& stays :
+       std::vector<std::vector<unsigned>>{{2}, {3}, {5}, {2, 3}, {2, 5}, {3, 5}, {}}) {
+    std::filesystem::create_directories(File("fresh"));
+    const uint64_t fresh = SizeWithLevels(File("fresh/image.img"), stays);
+    SizeWithLevels(file_, {2, 3, 5});
+    std::vector<unsigned> goes = {2, 3, 5};
+    for (const unsigned level : stays) std::erase(goes, level);
+    Open(file_, kUpdate)->GetSource()->Levels()->Remove(goes);
+    for (const unsigned level : {2u, 3u, 5u})
+      EXPECT_EQ(std::count(stays.begin(), stays.end(), level) ? "11" : "", Validity(file_, level));
+    EXPECT_EQ("", WrongPixels(file_));
+    EXPECT_GE(fresh + kLittle, std::filesystem::file_size(file_))
+        << ::testing::PrintToString(stays);
+    EXPECT_EQ(int(stays.size()), std::unique_ptr<GDALDataset>(GDALDataset::Open(file_.c_str()))
+                                     ->GetRasterBand(2)
+                                     ->GetOverviewCount());
+    for (const unsigned level : goes) Build(*Open(file_, kUpdate), level, {1, 2});
+    EXPECT_EQ("", WrongPixels(file_));
+    std::filesystem::remove(file_);
+  }
+}
+
+TEST_F(HfaLevels, ThatAreNotThereAreNoneToRemove) {
   for (const unsigned level : {2u, 3u}) Build(*Open(file_, kUpdate), level, {1, 2});
   const std::string before = BytesOf(file_);
-  const auto dataset = Open(file_, kUpdate);
-  EXPECT_THAT(RefusalOf([&] { dataset->GetSource()->Levels()->Remove({2}); }),
-              HasSubstr("removed all together, and level 3 is to stay"));
-  dataset->GetSource()->Levels()->Remove({7});
+  Open(file_, kUpdate)->GetSource()->Levels()->Remove({7});
   EXPECT_EQ(before, BytesOf(file_));
+}
+
+/// A removal that ends between its two steps leaves levels that no list names.
+TEST_F(HfaLevels, ThatARemovalLeftInTheTreeAreMadeAnewAllTheSame) {
+  for (const unsigned level : {2u, 3u}) Build(*Open(file_, kUpdate), level, {1, 2});
+  {
+    PatchedFile file(file_);
+    drivers::HfaTree tree(file.LibraryName());
+    for (const auto& layer : drivers::HfaLayersOf(tree))
+      for (const auto& part : layer.parts) {
+        if (!drivers::IsHfaNameList(part)) continue;
+        const auto list = drivers::NamesWithout(tree.DataOf(part), {2});
+        const std::string data = drivers::PlaceHfaNameList(list.data, part.data);
+        file.Write(part.data, data.data(), data.size());
+      }
+    file.Commit();
+  }
+  EXPECT_EQ("", Validity(file_, 2));
+  Build(*Open(file_, kUpdate), 2, {1, 2});
+  EXPECT_EQ("11", Validity(file_, 2));
+  EXPECT_EQ("", WrongPixels(file_));
 }
 
 }  // namespace

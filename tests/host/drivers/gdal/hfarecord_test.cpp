@@ -14,7 +14,7 @@ constexpr char kNoImage[] =
 
 TEST(HfaRecord, IsReadBackAsItWasWritten) {
   HfaRecord record{"NEAREST", 2, "Orin Overviews 1.2.3", "1-0"};
-  EXPECT_EQ(std::string("NEAREST;2;Orin Overviews 1.2.3;1-0;") + kNoImage,
+  EXPECT_EQ(std::string("NEAREST ;2    ;Orin Overviews 1.2.3;1-0;") + kNoImage,
             ComposeHfaRecord(record));
   const size_t length = ComposeHfaRecord(record).size();
   record.image = {"0123456789abcdef0123456789abcdef", {5, -6, 7}};
@@ -26,6 +26,18 @@ TEST(HfaRecord, IsReadBackAsItWasWritten) {
   EXPECT_EQ(record.program, read->program);
   EXPECT_EQ(record.validity, read->validity);
   EXPECT_EQ(record.image, read->image);
+}
+
+TEST(HfaRecord, HasTheSameLengthForEveryMethodAndSource) {
+  const size_t length = ComposeHfaRecord({"MODE", 1, "program", "11"}).size();
+  EXPECT_EQ(length, ComposeHfaRecord({"BILINEAR", 16384, "program", "00"}).size());
+}
+
+TEST(HfaRecord, WithoutPaddingIsReadAsWell) {
+  const auto read = ParseHfaRecord(std::string("MODE;2;program;11;") + kNoImage, 2);
+  ASSERT_TRUE(read);
+  EXPECT_EQ("MODE", read->method);
+  EXPECT_EQ(2u, read->sourceLevel);
 }
 
 TEST(HfaRecord, WhoseImageIsDamagedRemembersNone) {

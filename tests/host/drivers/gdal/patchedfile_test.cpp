@@ -10,7 +10,6 @@ namespace {
 
 using drivers::FilePatch;
 using drivers::PatchedFile;
-using Overwrites = PatchedFile::Overwrites;
 
 class Patched : public GdalFiles {
  protected:
@@ -38,7 +37,7 @@ void PutAt(const PatchedFile& file, uint64_t position, const std::string& bytes)
 }
 
 TEST_F(Patched, ShowsTheLibraryWhatItWroteAndKeepsItFromTheFile) {
-  PatchedFile file(path_, Overwrites::kWait);
+  PatchedFile file(path_);
   PutAt(file, 4090, "0123456789");
   std::string expected = before_;
   expected.replace(4090, 10, "0123456789");
@@ -47,7 +46,7 @@ TEST_F(Patched, ShowsTheLibraryWhatItWroteAndKeepsItFromTheFile) {
 }
 
 TEST_F(Patched, AppendsAtOnceAndOverwritesWhenCommitted) {
-  PatchedFile file(path_, Overwrites::kWait);
+  PatchedFile file(path_);
   PutAt(file, 9998, "0123");
   EXPECT_TRUE(before_ + "23" == BytesOf(path_));
   const std::string after = before_.substr(0, 9998) + "0123";
@@ -58,7 +57,7 @@ TEST_F(Patched, AppendsAtOnceAndOverwritesWhenCommitted) {
 
 TEST_F(Patched, IsAsItWasWithoutACommit) {
   {
-    PatchedFile file(path_, Overwrites::kWait);
+    PatchedFile file(path_);
     PutAt(file, 10, "x");
     PutAt(file, 10000, std::string(5000, 'z'));
   }
@@ -66,7 +65,7 @@ TEST_F(Patched, IsAsItWasWithoutACommit) {
 }
 
 TEST_F(Patched, WaitsOnlyWithWhatChangesSomethingInOneWriteEach) {
-  PatchedFile file(path_, Overwrites::kWait);
+  PatchedFile file(path_);
   PutAt(file, 9000, "x");
   PutAt(file, 100, "aaaa");  // what is there already
   PutAt(file, 500, "yaay");
@@ -79,7 +78,7 @@ TEST_F(Patched, WaitsOnlyWithWhatChangesSomethingInOneWriteEach) {
 }
 
 TEST_F(Patched, NeverCutsANumberThatLiesAcrossTwoPages) {
-  PatchedFile file(path_, Overwrites::kWait);
+  PatchedFile file(path_);
   PutAt(file, 4094, "1234");
   const std::vector<FilePatch> waiting = file.Waiting();
   ASSERT_EQ(1u, waiting.size());
@@ -88,7 +87,7 @@ TEST_F(Patched, NeverCutsANumberThatLiesAcrossTwoPages) {
 }
 
 TEST_F(Patched, JoinsChangesOfNeighbouringPagesWithWhatLiesBetween) {
-  PatchedFile file(path_, Overwrites::kWait);
+  PatchedFile file(path_);
   PutAt(file, 4000, "x");
   PutAt(file, 4200, "y");
   const std::vector<FilePatch> waiting = file.Waiting();
@@ -96,14 +95,25 @@ TEST_F(Patched, JoinsChangesOfNeighbouringPagesWithWhatLiesBetween) {
   EXPECT_EQ("x" + std::string(199, 'a') + "y", waiting[0].bytes);
 }
 
-TEST_F(Patched, OverwritesAtOnceWhenThatIsAskedFor) {
-  PatchedFile file(path_, Overwrites::kDirect);
-  PutAt(file, 10, "x");
+TEST_F(Patched, OverwritesAtOnceWhatNobodyCountsOn) {
+  PatchedFile file(path_);
+  PutAt(file, 20, "y");  // of the same page
+  file.WriteNow(10, "x", 1);
+  EXPECT_EQ('x', BytesOf(path_)[10]);
+  EXPECT_EQ('x', Seen(file)[10]);
+  const std::vector<FilePatch> waiting = file.Waiting();
+  ASSERT_EQ(1u, waiting.size());
+  EXPECT_EQ(20u, waiting[0].position);
+  EXPECT_EQ("y", waiting[0].bytes);
+}
+
+TEST_F(Patched, KeepsWhatWasWrittenAtOnceWithoutACommit) {
+  { PatchedFile(path_).WriteNow(10, "x", 1); }
   EXPECT_EQ('x', BytesOf(path_)[10]);
 }
 
 TEST_F(Patched, LetsTheLibraryMakeNoOtherFile) {
-  PatchedFile file(path_, Overwrites::kWait);
+  PatchedFile file(path_);
   const std::string folder = file.LibraryName().substr(0, file.LibraryName().rfind('/') + 1);
   EXPECT_EQ("file.bin", file.LibraryName().substr(folder.size()));
   EXPECT_EQ(nullptr, VSIFOpenL((folder + "file.ige").c_str(), "wb"));
@@ -112,7 +122,7 @@ TEST_F(Patched, LetsTheLibraryMakeNoOtherFile) {
 
 TEST_F(Patched, ThatCannotBeOpenedIsRefusedByName) {
   EXPECT_EQ(File("none") + ": cannot be opened for writing: No such file or directory.",
-            RefusalOf([&] { PatchedFile(File("none"), Overwrites::kWait); }));
+            RefusalOf([&] { PatchedFile(File("none")); }));
 }
 
 }  // namespace

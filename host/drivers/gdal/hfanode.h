@@ -1,0 +1,77 @@
+/// The nodes of an ERDAS Imagine file (.img), as they stand in the file.
+// SPDX-License-Identifier: MIT
+#pragma once
+
+#include <cstdint>
+#include <functional>
+#include <memory>
+#include <string>
+#include <string_view>
+#include <vector>
+
+#include <cpl_vsi.h>
+
+namespace orin::drivers {
+
+// Positions within a node, bytes; all numbers of the format are little-endian.
+inline constexpr uint32_t kHfaNextAt = 0, kHfaPreviousAt = 4, kHfaParentAt = 8, kHfaChildAt = 12;
+inline constexpr uint32_t kHfaDataAt = 16;
+inline constexpr uint32_t kHfaNodeBytes = 128;  ///< the last four mean nothing
+
+/// A pointer of the tree that gets another value.
+struct HfaPointer {
+  uint32_t position;
+  uint32_t value;
+};
+
+/// Positions are those in the file; 0: there is none.
+struct HfaNode {
+  uint32_t position = 0;
+  uint32_t pointer = 0;  ///< where the number stands that leads to it; 0 for the root
+  uint32_t previous = 0;
+  uint32_t next = 0;
+  uint32_t parent = 0;
+  uint32_t child = 0;
+  uint32_t data = 0;
+  uint32_t dataBytes = 0;
+  std::string name = {}, type = {};
+};
+
+/// The 4-byte number at `at`; what lies behind the end counts as zeros.
+uint32_t HfaNumberAt(std::string_view bytes, size_t at);
+/// Puts it there. \pre at + 4 <= bytes.size()
+void PutHfaNumber(std::string& bytes, size_t at, uint32_t number);
+
+/// What takes nodes out of the list of children that they stand in.
+/// \param children  all nodes of the list, in its order
+std::vector<HfaPointer> PointersWithout(const std::vector<HfaNode>& children,
+                                        const std::function<bool(const HfaNode&)>& goes);
+
+/// Reads the tree. Operations throw orin::Exception when it is damaged.
+class HfaTree {
+ public:
+  /// \param path  also a name of the library: "/vsizip/..."
+  explicit HfaTree(const std::string& path);
+
+  HfaNode Root();
+  std::vector<HfaNode> ChildrenOf(const HfaNode& parent);
+  std::string DataOf(const HfaNode& node) { return Bytes(node.data, node.dataBytes); }
+  std::string Bytes(uint64_t position, uint32_t count);
+
+  struct Header {
+    uint32_t position, freeList, dictionary;
+  };
+  Header FileHeader();
+  /// Of the file, bytes.
+  uint64_t Size();
+  [[noreturn]] void Fail() const;
+
+ private:
+  HfaNode NodeAt(uint32_t position, uint32_t pointer);
+
+  std::string path_;
+  std::unique_ptr<VSILFILE, void (*)(VSILFILE*)> file_;
+  unsigned nodesRead_ = 0;
+};
+
+}  // namespace orin::drivers
