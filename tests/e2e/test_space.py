@@ -207,6 +207,23 @@ class Rebuilt(Case):
                                    entry["method"].lower()))
             self.assertLessEqual(os.path.getsize(file), 1.1 * os.path.getsize(copy), levels)
 
+    def test_round_a_level_of_another_program_takes_no_more_room_each_time(self):
+        file = self.path("between.tif")
+        write_tiff(file, smooth_pixels((1, 210, 260)), "Byte", ["COMPRESS=DEFLATE"])
+        build = ("build", file, "--levels", "2,8", "--force", "--method")
+        self.assertRan(run(*build, "average"))
+        made = subprocess.run(["gdaladdo", "-q", file, "4"], check=False)
+        self.assertEqual(0, made.returncode)
+        other = content_of(file)[65]
+        sizes = {}
+        for number in range(9):
+            method = ("nearest", "bicubic", "average")[number % 3]
+            self.assertRan(run(*build, method))
+            size = sizes.setdefault(method, os.path.getsize(file))
+            self.assertLessEqual(os.path.getsize(file), 1.02 * size, (number, method))
+            self.assertEqual(other, content_of(file)[65])
+        self.assertLessEqual(max(sizes.values()), 1.1 * min(sizes.values()))
+
     def test_readers_see_the_old_levels_or_the_new_ones(self):
         file, pixels = self.picture(TILED="YES", BLOCKXSIZE=64, BLOCKYSIZE=64)
         self.assertRan(run("build", file, *self.LEVELS, "--method", "nearest"))

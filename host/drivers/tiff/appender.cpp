@@ -100,11 +100,14 @@ void Appender::RequireRoom(uint64_t position, uint64_t bytes) const {
       "host/drivers/tiff/appender", "Appender::Reserve(uint64_t)", 0);
 }
 
+bool Appender::HasOpenStretch() const {
+  return !space_.stretches.empty() && space_.stretches.back().end == 0;
+}
+
 void Appender::EndStretch() {
-  std::vector<Stretch>& stretches = space_.stretches;
-  if (stretches.empty() || stretches.back().end != 0) return;
-  stretches.back().end = end_;
-  space_.unclosed.push_back(stretches.back());
+  if (!HasOpenStretch()) return;
+  space_.stretches.back().end = end_;
+  space_.unclosed.push_back(space_.stretches.back());
 }
 
 /// Bytes of another program end the stretch.
@@ -116,8 +119,8 @@ void Appender::NoticeOthers() {
 }
 
 void Appender::BeginStretch(uint64_t bytes) {
+  if (HasOpenStretch()) return;
   std::vector<Stretch>& stretches = space_.stretches;
-  if (!stretches.empty() && stretches.back().end == 0) return;
   const Stretch stretch = StretchAt(end_, stretches.empty() ? 0 : stretches.back().marker);
   RequireRoom(stretch.Body(), bytes);
   stretches.push_back(stretch);
@@ -128,7 +131,7 @@ void Appender::BeginStretch(uint64_t bytes) {
 uint64_t Appender::Reserve(uint64_t bytes, Taking take) {
   const std::lock_guard lock(mutex_);
   NoticeOthers();
-  if (const auto position = (space_.free.*take)(bytes)) {
+  if (const auto position = take ? (space_.free.*take)(bytes) : std::nullopt) {
     taken_.Add({*position, *position + bytes});
     return *position;
   }
@@ -157,9 +160,14 @@ uint64_t Appender::SizeOfDirectory(const std::vector<NewEntry>& entries) const {
   return kPointerBytes + Layout(isBig_, byteOrder_).SizeOf(entries);
 }
 
-/// In the shortest gap: a longer one may hold a tile.
+/// Behind what was appended for it, since the stretch is found by a directory in it. Else in the
+/// shortest gap: a longer one may hold a tile.
 uint64_t Appender::ReserveDirectory(const std::vector<NewEntry>& entries) {
-  return Reserve(SizeOfDirectory(entries), &ExtentSet::TakeFromShortest);
+  const bool goesBehind = [this] {
+    const std::lock_guard lock(mutex_);
+    return HasOpenStretch();
+  }();
+  return Reserve(SizeOfDirectory(entries), goesBehind ? nullptr : &ExtentSet::TakeFromShortest);
 }
 
 uint64_t Appender::WriteDirectory(std::vector<NewEntry> entries, uint64_t next, uint64_t reserved) {
@@ -180,8 +188,7 @@ uint64_t Appender::AppendDirectory(std::vector<NewEntry> entries, uint64_t next)
 
 /// What is appended begins at even positions: so a stretch has room for the same in any order.
 void Appender::PadStretch() {
-  const bool isOpen = !space_.stretches.empty() && space_.stretches.back().end == 0;
-  if (!isOpen || end_ == EvenFrom(end_) || file_.Size() > end_) return;
+  if (!HasOpenStretch() || end_ == EvenFrom(end_) || file_.Size() > end_) return;
   const uint8_t padding = 0;
   file_.Write(end_++, &padding, 1);
 }

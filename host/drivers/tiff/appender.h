@@ -64,8 +64,10 @@ class Appender {
  private:
   using Taking = std::optional<uint64_t> (ExtentSet::*)(uint64_t bytes);
 
+  /// \param take  null: nothing is taken from the free space
   uint64_t Reserve(uint64_t bytes, Taking take);
   void NoticeOthers();
+  bool HasOpenStretch() const;
   void EndStretch();
   void PadStretch();
   void BeginStretch(uint64_t bytes);

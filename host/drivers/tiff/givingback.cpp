@@ -63,9 +63,11 @@ bool LevelFile::PackOnce(uint64_t& evacuated) {
 
 /// Closes the gaps between levels. What cannot be moved, for want of room on the disk, stays.
 void LevelFile::Pack() {
+  constexpr int kMostSteps =
+      1000;  // a few for each level; a forged file may ask for no end of them
   uint64_t evacuated = 0;
   try {
-    while (PackOnce(evacuated)) {
+    for (int step = 0; step < kMostSteps && PackOnce(evacuated); ++step) {
     }
   } catch (const std::exception&) {
     // deliberate: no level is harmed, and the next change tries again

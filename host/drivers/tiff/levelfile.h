@@ -65,7 +65,7 @@ class LevelFile {
   /// Moves levels of this program into its free space and shortens the file by what is free at its
   /// end; not while others have the file open, which may still read levels that were replaced.
   void GiveBackSpace();
-  /// The same whoever has it open, and by `given` as well, which nothing refers to any more.
+  /// Shortens it, whoever has it open, by `given` as well, which nothing refers to any more.
   void GiveBackSpace(const ExtentSet& given);
   /// Takes the file away; it counts as not yet made afterwards.
   void Delete();
