@@ -403,7 +403,8 @@ class Survives(Hfa):
             answer = run("build", self.file, *self.arguments)
             holder.stdin.close()
         self.assertNotEqual(0, answer.returncode)
-        self.assertIn("another build is writing", answer.stderr)
+        self.assertIn("scene.img: another build is writing levels into it: ", answer.stderr)
+        self.assertIn(f"(process {holder.pid})", answer.stderr)
         self.assertRan(run("build", self.file, *self.arguments))
 
 

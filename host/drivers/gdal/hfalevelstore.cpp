@@ -14,6 +14,7 @@
 #include "host/drivers/gdal/gdalerrors.h"
 #include "host/drivers/gdal/hfalevelwriter.h"
 #include "host/services/exception.h"
+#include "host/services/lockholder.h"
 #include "host/services/text.h"
 
 namespace orin::drivers {
@@ -113,11 +114,11 @@ void HfaLevelStore::LockFile() {
   lock_ = open(path_.c_str(), O_RDWR | O_CLOEXEC);
   // A file system without locks is none to refuse work on.
   if (lock_ < 0 || flock(lock_, LOCK_EX | LOCK_NB) == 0 || errno != EWOULDBLOCK) return;
+  const std::string text = LockedText(path_, lock_);
   close(lock_);
   lock_ = -1;
-  Refuse(_("%s: another build is writing levels into it. Wait until it is finished, then run "
-           "again."),
-         path_);
+  throw Exception(text, "host/drivers/gdal/hfalevelstore", "orin::drivers::HfaLevelStore::LockFile",
+                  0);
 }
 
 /// The format rounds up; what we make ends where it should.
