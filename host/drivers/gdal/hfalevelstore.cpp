@@ -22,8 +22,6 @@ namespace {
 
 using datasources::LevelDescription;
 
-constexpr double kMostBytes = 2e9;  // a file that grows beyond it would go on in a second one
-
 double SampleBytes(const gobs::DataType& type) {
   return double(BytesPerComponent(type)) * ComponentsPerSample(type);
 }
@@ -39,7 +37,7 @@ bool HasRoom(const std::string& path, const datasources::IRasterSource& image) {
   double bytes = 0;
   for (unsigned channel = 1; channel <= image.ChannelCount(); ++channel)
     bytes += double(image.Width()) * image.Height() * SampleBytes(image.TypeOf(channel));
-  return double(FileBytes(path)) + bytes * 0.35 < kMostBytes;
+  return double(FileBytes(path)) + bytes * 0.35 < double(kMostHfaBytes);
 }
 
 [[noreturn]] void Refuse(const char* format, const std::string& name) {
