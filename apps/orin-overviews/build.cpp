@@ -2,7 +2,9 @@
 #include "apps/orin-overviews/build.h"
 
 #include <algorithm>
+#include <filesystem>
 #include <memory>
+#include <system_error>
 
 #include "apps/orin-overviews/buildplan.h"
 #include "apps/orin-overviews/buildreport.h"
@@ -118,14 +120,27 @@ ExitCode ReportFailure(const Outcome& outcome, const BuildPlan& plan, const Buil
   return CodeOfWarning(line);
 }
 
+/// An image beside which the levels go is not opened for writing.
+void RefuseUpdatesFor(const BuildOptions& options) {
+  datasources::DatasetManager::GetInstance()->RefuseUpdates(options.placement ==
+                                                            Placement::kExternal);
+}
+
+/// True also for two names of one file.
+bool IsSameFile(const std::string& one, const std::string& other) {
+  std::error_code unknown;
+  return one == other || (std::filesystem::equivalent(one, other, unknown) && !unknown);
+}
+
 /// The plan where its levels fit: beside a file that could not hold them, if the user leaves the
 /// choice. \throws orin::Exception  they fit nowhere, or not where the user wants them
 BuildPlan PlanWithRoom(BuildOptions& options, const std::string& file, Console& console) {
   BuildPlan plan = PlanBuild(options, file);
   if (!plan.room.obstacle.empty() && options.placement == Placement::kAutomatic &&
-      plan.room.file == file) {
+      IsSameFile(plan.room.file, file)) {
     const std::string reason = plan.room.obstacle;
     options.placement = Placement::kExternal;
+    RefuseUpdatesFor(options);
     plan = PlanBuild(options, file);
     if (!plan.building.empty())
       console.Notice(AfterFileName(file, reason + " " + _("They go to a file beside it instead.")));
@@ -196,6 +211,7 @@ void RequireFile(const BuildOptions& options, const std::string& file, ExitCode&
 ExitCode TryFile(const BuildOptions& options, const std::string& file,
                  const Interruption& interruption, Console& console) {
   ExitCode code = kCannotBuild;
+  RefuseUpdatesFor(options);
   try {
     RequireFile(options, file, code);
     return BuildFile(options, file, interruption, console);
@@ -215,8 +231,6 @@ ExitCode TryFile(const BuildOptions& options, const std::string& file,
 ExitCode RunBuild(const BuildOptions& options, Console& console) {
   const Interruption interruption;
   datasources::SetLevelOptions(options.storing);
-  datasources::DatasetManager::GetInstance()->RefuseUpdates(options.placement ==
-                                                            Placement::kExternal);
   ExitCode result = kDone;
   for (size_t i = 0; i < options.files.size(); ++i) {
     if (interruption.Requested()) return kInterrupted;

@@ -331,6 +331,30 @@ class Beside(Hfa):
         self.assertRan(run("clean", self.file))
         self.assertEqual([], info(self.file)["levels"])
 
+    def test_levels_that_pass_the_limit_together_go_beside_the_file(self):
+        write(self.file, self.pixels, "Byte")
+        size = 2000000000 - 60000  # level 2 fits in front of the limit, 4 does not
+        os.truncate(self.file, size)
+        link = self.path("link.img")
+        os.symlink("scene.img", link)
+        answer = run("build", link, "--levels", "2,4", "--internal")
+        self.assertRan(answer, 5)
+        self.assertIn("scene.img: would grow beyond the 2 GB", answer.stderr)
+        self.assertIn("Use --external", answer.stderr)
+        other = self.path("other.img")  # one that has room enough
+        write(other, self.pixels, "Byte")
+        answer = run("build", link, other, "--levels", "2,4", "--method", "nearest")
+        self.assertRan(answer)
+        self.check_levels(other, self.pixels)
+        self.assertIn("would grow beyond the 2 GB", answer.stderr)
+        self.assertIn("beside it instead", answer.stderr)
+        self.assertEqual(size, os.path.getsize(self.file))
+        self.assertEqual(["link.img", "link.img.ovr", "other.img", "scene.img"],
+                         sorted(os.listdir(self.folder)))
+        self.assertEqual([(2, "side-car"), (4, "side-car")],
+                         [(level["level"], level["place"]) for level in info(link)["levels"]])
+        self.assertSamePixels(nearest(self.pixels, 1, 2, (333, 205)), read_pixels(link + ".ovr"))
+
     def test_a_link_leads_to_the_file(self):
         write(self.file, self.pixels, "Byte")
         link = self.path("link.img")
@@ -403,7 +427,8 @@ class Survives(Hfa):
             answer = run("build", self.file, *self.arguments)
             holder.stdin.close()
         self.assertNotEqual(0, answer.returncode)
-        self.assertIn("another build is writing", answer.stderr)
+        self.assertIn("scene.img: another build is writing levels into it: ", answer.stderr)
+        self.assertIn(f"(process {holder.pid})", answer.stderr)
         self.assertRan(run("build", self.file, *self.arguments))
 
 

@@ -138,7 +138,8 @@ class FreeSpace(Case):
             self.assertEqual(size, os.path.getsize(file))
             self.assertEqual(["huge.tif"], os.listdir(self.folder))
 
-    def test_a_small_disk_is_found_too_small_before_the_first_byte(self):
+    def small_disk(self):
+        """The folder of a disk of 3 MiB."""
         disk = self.path("disk")
         os.mkdir(disk)
         mounted = subprocess.run(["mount", "-t", "tmpfs", "-o", "size=3m", "tmpfs", disk],
@@ -146,6 +147,10 @@ class FreeSpace(Case):
         if mounted.returncode != 0:
             self.skipTest("file systems cannot be mounted here")
         self.addCleanup(subprocess.run, ["umount", disk], check=True)
+        return disk
+
+    def test_a_small_disk_is_found_too_small_before_the_first_byte(self):
+        disk = self.small_disk()
         file = os.path.join(disk, "scene.tif")
         pixels = random_pixels((1, 1400, 1500), numpy.uint8, 2)
         write_tiff(file, pixels, "Byte", ["TILED=YES"])
@@ -162,6 +167,36 @@ class FreeSpace(Case):
             self.assertEqual(["other", "scene.tif"], sorted(os.listdir(disk)))
         self.assertRan(run("build", file, "--levels", "4"))  # that much is free
         self.assertSamePixels(nearest(pixels, 1, 4, (1500, 1400)), read_pixels(file, 0))
+
+    def test_a_small_disk_is_found_too_small_for_levels_of_an_erdas_imagine_file(self):
+        disk = self.small_disk()
+        pixels = random_pixels((1, 1400, 1200), numpy.uint8, 2)
+        for options in ([], ["COMPRESSED=YES"]):
+            with self.subTest(options):
+                file = os.path.join(disk, "scene.img")
+                dataset = gdal.GetDriverByName("HFA").Create(file, 1200, 1400, 1, gdal.GDT_Byte,
+                                                             options)
+                dataset.GetRasterBand(1).WriteArray(pixels[0])
+                del dataset
+                self.assertRan(run("build", file, "--levels", "4", "--method", "nearest"))
+                with open(os.path.join(disk, "other"), "wb") as other:
+                    free = os.statvfs(disk)
+                    other.write(bytes(free.f_bavail * free.f_bsize - 200_000))
+                with open(file, "rb") as opened:
+                    before = opened.read()
+                for levels in (["2"], ["2,4", "--force"]):
+                    answer = run("build", file, "--levels", *levels, "--method", "nearest")
+                    self.assertRan(answer, 5)
+                    self.assertRegex(answer.stderr,
+                                     r"scene.img: the levels need about \d{6} bytes .* are free")
+                    with open(file, "rb") as opened:
+                        self.assertEqual(before, opened.read())
+                    self.assertEqual(["other", "scene.img"], sorted(os.listdir(disk)))
+                self.assertRan(run("build", file, "--levels", "4", "--method", "nearest",
+                                   "--force"))  # that much is free
+                self.assertSamePixels(nearest(pixels, 1, 4, (1200, 1400)), read_pixels(file, 0))
+                os.remove(file)
+                os.remove(os.path.join(disk, "other"))
 
 
 if __name__ == "__main__":

@@ -52,6 +52,7 @@ std::optional<HfaBlockMap> FindHfaBlockMap(const std::string& path, unsigned cha
   const std::vector<HfaLayer> layers = HfaLayersOf(tree);
   if (channel < 1 || channel > layers.size()) return std::nullopt;
   for (const HfaNode& part : layers[channel - 1].parts) {
+    if (factor == 1 && IsHfaBlockMap(part)) return ReadHfaBlockMap(tree, part);
     if (FactorOfHfaPart(part) != factor) continue;
     for (const HfaNode& node : tree.ChildrenOf(part))
       if (IsHfaBlockMap(node)) return ReadHfaBlockMap(tree, node);

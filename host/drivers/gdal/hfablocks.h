@@ -33,7 +33,8 @@ struct HfaBlockMap {
 bool IsHfaBlockMap(const HfaNode& node);
 /// \throws orin::Exception  the list is damaged
 HfaBlockMap ReadHfaBlockMap(HfaTree& tree, const HfaNode& node);
-/// Of a stored level of a channel (1-based); none where there is no such level in the file.
+/// Of a stored level of a channel (1-based), or for factor 1 of the image; none where the file has
+/// no such level, or keeps its blocks elsewhere.
 /// \throws orin::Exception  the tree or the list is damaged
 std::optional<HfaBlockMap> FindHfaBlockMap(const std::string& path, unsigned channel,
                                            unsigned factor);

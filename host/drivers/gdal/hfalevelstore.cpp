@@ -14,14 +14,13 @@
 #include "host/drivers/gdal/gdalerrors.h"
 #include "host/drivers/gdal/hfalevelwriter.h"
 #include "host/services/exception.h"
+#include "host/services/lockholder.h"
 #include "host/services/text.h"
 
 namespace orin::drivers {
 namespace {
 
 using datasources::LevelDescription;
-
-constexpr double kMostBytes = 2e9;  // a file that grows beyond it would go on in a second one
 
 double SampleBytes(const gobs::DataType& type) {
   return double(BytesPerComponent(type)) * ComponentsPerSample(type);
@@ -38,7 +37,7 @@ bool HasRoom(const std::string& path, const datasources::IRasterSource& image) {
   double bytes = 0;
   for (unsigned channel = 1; channel <= image.ChannelCount(); ++channel)
     bytes += double(image.Width()) * image.Height() * SampleBytes(image.TypeOf(channel));
-  return double(FileBytes(path)) + bytes * 0.35 < kMostBytes;
+  return double(FileBytes(path)) + bytes * 0.35 < double(kMostHfaBytes);
 }
 
 [[noreturn]] void Refuse(const char* format, const std::string& name) {
@@ -113,11 +112,11 @@ void HfaLevelStore::LockFile() {
   lock_ = open(path_.c_str(), O_RDWR | O_CLOEXEC);
   // A file system without locks is none to refuse work on.
   if (lock_ < 0 || flock(lock_, LOCK_EX | LOCK_NB) == 0 || errno != EWOULDBLOCK) return;
+  const std::string text = LockedText(path_, lock_);
   close(lock_);
   lock_ = -1;
-  Refuse(_("%s: another build is writing levels into it. Wait until it is finished, then run "
-           "again."),
-         path_);
+  throw Exception(text, "host/drivers/gdal/hfalevelstore", "orin::drivers::HfaLevelStore::LockFile",
+                  0);
 }
 
 /// The format rounds up; what we make ends where it should.

@@ -2,6 +2,7 @@
 // SPDX-License-Identifier: MIT
 #pragma once
 
+#include <cstdint>
 #include <map>
 #include <memory>
 #include <mutex>
@@ -19,6 +20,9 @@
 #include "host/drivers/gdal/sourceuse.h"
 
 namespace orin::drivers {
+
+/// A file that grows beyond it would go on in a second one; bytes.
+inline constexpr uint64_t kMostHfaBytes = 2'000'000'000;
 
 /// The levels inside `name`, or null when it holds none that are its own and cannot take any.
 /// \param image  its full resolution; outlives the store
@@ -60,6 +64,8 @@ class HfaLevelStore final : public datasources::ILevelStore {
       unsigned level, const std::vector<unsigned>& channels) override;
   void SetValid(unsigned level, const std::vector<unsigned>& channels, bool valid) override;
   void KeepAnswers() override;
+  datasources::LevelRoom RoomFor(const std::vector<unsigned>& levels,
+                                 const std::vector<unsigned>& channels) const override;
   void Remove(const std::vector<unsigned>& levels) override;
 
   // For the level writers.
@@ -82,7 +88,12 @@ class HfaLevelStore final : public datasources::ILevelStore {
   void Reload();
   void LockFile();
   datasources::LevelDescription Describe(unsigned level, const std::string& fingerprint) const;
-  void RequireRoom(unsigned level, const std::vector<unsigned>& channels) const;
+  uint64_t MostBytesOf(unsigned level, unsigned channel) const;
+  uint64_t ExpectedBytesOf(unsigned level, unsigned channel) const;
+  uint64_t TreeBytesOf(const std::vector<unsigned>& levels,
+                       const std::vector<unsigned>& channels) const;
+  datasources::LevelRoom RoomOf(const std::vector<unsigned>& levels,
+                                const std::vector<unsigned>& channels) const;
   HfaRecord RecordToWrite(unsigned level, const std::vector<unsigned>& channels);
   void Record(unsigned level, const HfaRecord& record);
   std::optional<datasources::ImageRecord> SourceImage() const;

@@ -1,7 +1,6 @@
 /// How a level gets into an ERDAS Imagine file: its pixels, then not valid, then valid.
 // SPDX-License-Identifier: MIT
 #include <algorithm>
-#include <filesystem>
 
 #include "host/drivers/gdal/hfalevelstore.h"
 #include "host/drivers/gdal/hfaremoval.h"
@@ -11,23 +10,6 @@
 #include "host/services/text.h"
 
 namespace orin::drivers {
-
-/// The format would go on in a second file.
-void HfaLevelStore::RequireRoom(unsigned level, const std::vector<unsigned>& channels) const {
-  constexpr double kMostBytes = 2e9;
-  double bytes = 0;
-  for (const unsigned channel : channels) {
-    const gobs::DataType type = image_.TypeOf(channel);
-    bytes += double(WidthOf(level, false)) * HeightOf(level, false) * BytesPerComponent(type) *
-             ComponentsPerSample(type);
-  }
-  std::error_code ignored;
-  const auto size = std::filesystem::file_size(path_, ignored);
-  if (!ignored && double(size) + bytes > kMostBytes)
-    Fail(_("%s: level %u would make the file larger than the 2 GB that the format keeps in one "
-           "file. Build with --external."),
-         level);
-}
 
 /// The level's record with `channels` not valid.
 HfaRecord HfaLevelStore::RecordToWrite(unsigned level, const std::vector<unsigned>& channels) {
@@ -105,7 +87,7 @@ std::shared_ptr<HfaBuild> HfaLevelStore::BeginWriting(unsigned level,
   std::vector<unsigned> missing;
   for (const unsigned channel : channels)
     if (pyramid_.Find(channel, level) < 0) missing.push_back(channel);
-  RequireRoom(level, channels);
+  datasources::RequireRoom(RoomOf({level}, channels));
   BeginChange();
   isChanged_ = true;
   auto build = std::make_shared<HfaBuild>();

@@ -12,8 +12,8 @@
 #include <sys/stat.h>
 #include <unistd.h>
 
-#include "host/drivers/tiff/lockholder.h"
 #include "host/services/exception.h"
+#include "host/services/lockholder.h"
 #include "host/services/text.h"
 
 namespace orin::drivers {
@@ -92,16 +92,8 @@ void PositionedFile::Lock() {
   if (Repeated(lock) != 0 && !HasNoLocks(errno)) {  // no locks are no reason to refuse work
     if (errno != EWOULDBLOCK)
       Fail(_("%s: cannot be locked: %s."), path_, std::strerror(errno), kFunction);
-    const std::string holder = fstat(descriptor_, &own) == 0 ? LockHolderOf(own) : std::string();
-    throw Exception(
-        holder.empty()
-            ? FormatString(_("%s: another build is writing levels into it. Wait until it is "
-                             "finished, then run again."),
-                           path_.c_str())
-            : FormatString(_("%s: another build is writing levels into it: %s. Wait until it is "
-                             "finished, then run again."),
-                           path_.c_str(), holder.c_str()),
-        "host/drivers/tiff/positionedfile", kFunction, 0);
+    throw Exception(LockedText(path_, descriptor_), "host/drivers/tiff/positionedfile", kFunction,
+                    0);
   }
   const bool isNamed = fstat(descriptor_, &own) == 0 && stat(path_.c_str(), &named) == 0 &&
                        own.st_dev == named.st_dev && own.st_ino == named.st_ino;

@@ -1,5 +1,5 @@
 // SPDX-License-Identifier: MIT
-#include "host/drivers/tiff/lockholder.h"
+#include "host/services/lockholder.h"
 
 #include <cstdio>
 #include <fstream>
@@ -9,7 +9,7 @@
 
 #include "host/services/text.h"
 
-namespace orin::drivers {
+namespace orin {
 namespace {
 
 /// The line's process when it tells of a lock of that file in force; else 0. Such a line reads
@@ -47,4 +47,16 @@ std::string LockHolderOf(const struct stat& file) {
   return "";
 }
 
-}  // namespace orin::drivers
+std::string LockedText(const std::string& path, int descriptor) {
+  struct stat own {};
+  const std::string holder = fstat(descriptor, &own) == 0 ? LockHolderOf(own) : std::string();
+  return holder.empty()
+             ? FormatString(_("%s: another build is writing levels into it. Wait until it is "
+                              "finished, then run again."),
+                            path.c_str())
+             : FormatString(_("%s: another build is writing levels into it: %s. Wait until it is "
+                              "finished, then run again."),
+                            path.c_str(), holder.c_str());
+}
+
+}  // namespace orin
