@@ -84,7 +84,7 @@ LevelRoom HfaLevelStore::RoomOf(const std::vector<unsigned>& levels,
   LevelRoom room;
   std::vector<unsigned> made = levels;
   std::erase_if(made, [&](unsigned level) {
-    return image_.Width() / level == 0 || image_.Height() / level == 0;
+    return !datasources::LevelHasPixels(image_.Width(), image_.Height(), level);
   });
   if (made.empty() || channels.empty()) return room;
   room.bytes = TreeBytesOf(made, channels);

@@ -7,6 +7,7 @@
 #include <tuple>
 #include <utility>
 
+#include "host/datasources/levelroom.h"
 #include "host/drivers/tiff/codingoptions.h"
 #include "host/drivers/tiff/jpegquality.h"
 #include "host/services/exception.h"
@@ -182,7 +183,7 @@ LevelCoding CodingOfLevel(const LevelCoding& image, unsigned level, const std::s
   };
   LevelCoding coding = image;
   PixelFormat& format = coding.format;
-  if (level == 0 || image.format.width / level == 0 || image.format.height / level == 0)
+  if (!datasources::LevelHasPixels(image.format.width, image.format.height, level))
     refuse(_("%s: level %u would have no pixel."));
   format.width = image.format.width / level;
   format.height = image.format.height / level;

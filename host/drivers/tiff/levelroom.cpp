@@ -11,6 +11,7 @@
 namespace orin::drivers {
 
 using datasources::BigTiff;
+using datasources::LevelHasPixels;
 using datasources::LevelRoom;
 
 /// What a level of `planes` planes takes, with its mask where it gets one.
@@ -79,7 +80,7 @@ LevelRoom TiffLevelStore::RoomOf(const std::vector<unsigned>& levels,
   StoredSize size;
   const TiffStructure& structure = file_->Structure();
   for (const unsigned level : levels) {
-    if (settings_.image.width / level == 0 || settings_.image.height / level == 0) continue;
+    if (!LevelHasPixels(settings_.image.width, settings_.image.height, level)) continue;
     const LevelCoding coding = PendingFor(level).coding;
     room.blursAlpha = room.blursAlpha || BlursAlpha(coding.format);
     const auto planes = static_cast<uint32_t>(PlanesOf(coding, channels).size());

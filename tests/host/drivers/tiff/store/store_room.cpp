@@ -97,6 +97,7 @@ TEST_F(TiffStore, RoomOfOneChannelBesideTheFileIsItsPlanes) {
   EXPECT_NEAR(4 * 512 * 512, double(all), kDirectories);
   EXPECT_EQ(file + ".ovr", levels->RoomFor({2}, {1}).file);
   EXPECT_EQ("", levels->RoomFor({5000}, {1}).file);  // nothing would be made
+  EXPECT_EQ("", levels->RoomFor({0}, {1}).file);
 }
 
 TEST_F(TiffStore, LevelsThatCouldPassFourGiBAreAnObstacleInAClassicFileOnly) {
