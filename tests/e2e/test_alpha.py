@@ -11,7 +11,7 @@ from osgeo import gdal
 
 from mask_case import HEIGHT, MaskCase, SIZE, TILED, WIDTH, write_mask_beside
 from mask_twin import METHODS, disc, level_validity, masks_of_levels
-from orin_e2e import info, nearest, read_pixels, run, write_tiff
+from orin_e2e import READS_ALL_FORMATS, info, nearest, read_pixels, run, write_tiff
 
 JPEG = ("COMPRESS=JPEG", "JPEG_QUALITY=75")
 
@@ -203,7 +203,7 @@ class BesideOtherFormats(AlphaCase):
                 file = self.path(name)
                 gdal.Translate(file, self.path("scene.tif"), format=driver,
                                creationOptions=list(options))
-                if run("info", file).returncode != 0:
+                if not READS_ALL_FORMATS:
                     self.skipTest("this build reads no other formats")
                 self.build(file, "--levels", "2,4", "--method", "nearest")
                 self.assertTrue(os.path.exists(file + ".ovr"))

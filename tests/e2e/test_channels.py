@@ -16,7 +16,8 @@ from osgeo import gdal
 
 from mask_case import write_mask, write_mask_beside
 from mask_twin import disc, level_validity, masks_of_levels
-from orin_e2e import TOOL, info, overview_sizes, random_pixels, read_pixels, run, write_tiff
+from orin_e2e import (READS_ALL_FORMATS, TOOL, info, overview_sizes, random_pixels, read_pixels,
+                      run, write_tiff)
 from test_replay import Replayed
 
 WIDTH, HEIGHT = 75, 61
@@ -44,7 +45,7 @@ class Between(Replayed):
             gdal.Translate(file, plain, format=driver)
             if os.path.exists(file + ".aux.xml"):
                 os.remove(file + ".aux.xml")
-            if run("info", file).returncode != 0:
+            if not READS_ALL_FORMATS:
                 self.skipTest("this build reads no other formats")
         if kind == "mask":
             write_mask(file, self.valid, True)

@@ -14,7 +14,7 @@ import rasterio
 from mask_case import (HEIGHT, MaskCase, SIZE, TILED, WIDTH, directories_of, picture, write_mask,
                        write_mask_beside)
 from mask_twin import METHODS, disc, level_validity, masks_of_levels
-from orin_e2e import overview_sizes, read_pixels, run, write_tiff
+from orin_e2e import READS_ALL_FORMATS, overview_sizes, read_pixels, run, write_tiff
 
 class EveryMethod(MaskCase):
     def test_the_mask_of_a_level_is_where_the_method_filled(self):
@@ -143,7 +143,7 @@ class Layouts(MaskCase):
         write_tiff(self.path("scene.tif"), picture(valid), "Byte")
         file = self.path("scene.png")
         gdal.Translate(file, self.path("scene.tif"), format="PNG")
-        if run("info", file).returncode != 0:
+        if not READS_ALL_FORMATS:
             self.skipTest("this build reads no PNG")
         write_mask_beside(file, valid)
         self.build(file, "--levels", "2,3,4", "--method", "bilinear")
@@ -154,7 +154,7 @@ class Layouts(MaskCase):
         for driver, name in (("VRT", "scene.vrt"), ("JPEG", "scene.jpg")):
             file = self.path(name)
             gdal.Translate(file, image, format=driver)
-            if run("info", file).returncode != 0:
+            if not READS_ALL_FORMATS:
                 self.skipTest("this build reads no other formats")
             self.build(file, "--levels", "2,4", "--method", "bilinear")
             two = level_validity(valid, 1, 2, SIZE, "bilinear", 1)
