@@ -6,9 +6,6 @@
 #include <vector>
 
 #include "host/datasources/dataset.h"
-#include "host/datasources/levelstore.h"
-#include "processes/overviews/resampletype.h"
-#include "processes/qrtfilters/resamplers/parallelio/filteriodriver.h"
 #include "processes/qrtfilters/resamplers/resamplerfactory.h"
 
 /// What a run builds, and with which method.
@@ -40,8 +37,6 @@ class LevelRun {
 
   bool BuildLevel(unsigned level);
   bool BuildPass(unsigned level, const std::vector<unsigned>& channels, const Range& range);
-  unsigned SourceLevelOf(unsigned level, const std::vector<unsigned>& present) const;
-  void Configure(orin::parallelio::LevelDriver& driver, double scale, const Range& range) const;
 
   const LevelRequest& request_;
   double totalCost_ = 0;  ///< of all levels, in units of one full-resolution pass
