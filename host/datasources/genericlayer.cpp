@@ -60,6 +60,7 @@ class BothPlaces final : public ILevelStore {
     sideCar_->KeepAnswers();
     if (internal_) internal_->KeepAnswers();
   }
+  void SetOptions(const LevelOptions& options) override { sideCar_->SetOptions(options); }
   LevelRoom RoomFor(const std::vector<unsigned>& levels,
                     const std::vector<unsigned>& channels) const override {
     return sideCar_->RoomFor(levels, channels);

@@ -9,6 +9,7 @@
 #include "basic/gobs/datatype.h"
 #include "host/datasources/auxiliarydata.h"
 #include "host/datasources/imagewatch.h"
+#include "host/datasources/leveloptions.h"
 #include "host/datasources/levelroom.h"
 #include "host/datasources/overviewinfo.h"
 #include "host/datasources/rasterreader.h"
@@ -53,6 +54,9 @@ class ILevelStore {
   /// Where `List` had to read the whole image to tell what is up to date, keeps the answer with the
   /// levels, if their file may be written, so that the next one comes at once. Never fails.
   virtual void KeepAnswers() {}
+
+  /// How levels are stored from now on; a format that leaves no choice takes no notice.
+  virtual void SetOptions(const LevelOptions& /*options*/) {}
 
   /// What it takes to make all of `levels` for `channels`, the ones that exist anew; those larger
   /// than the image are left out. `Create` checks the same for its own level.

@@ -50,9 +50,8 @@ LevelCoding PlainCoding(uint32_t width, uint32_t height, uint32_t channels,
 /// what `options` say; else the image's compression if that can be written here without more loss.
 /// \throws orin::Exception  the level has no pixel, or too many tiles, or an option does not suit
 ///                          the image; the text names `file`
-LevelCoding CodingOfLevel(
-    const LevelCoding& image, unsigned level, const std::string& file,
-    const datasources::LevelOptions& options = datasources::CurrentLevelOptions());
+LevelCoding CodingOfLevel(const LevelCoding& image, unsigned level, const std::string& file,
+                          const datasources::LevelOptions& options = {});
 
 /// The same in planes of their own, one a channel.
 LevelCoding InPlanes(LevelCoding coding);

@@ -24,7 +24,7 @@ StoredSize TiffLevelStore::SizeOf(const LevelCoding& level, uint32_t planes, boo
 /// What the user wishes, else whether the usual pyramids and this level could pass the limit.
 bool TiffLevelStore::BecomesBig(const LevelCoding& level) const {
   constexpr uint64_t kSaferBytes = uint64_t{1} << 31;
-  const BigTiff wish = datasources::CurrentLevelOptions().bigTiff;
+  const BigTiff wish = options_.bigTiff;
   if (wish == BigTiff::kYes || wish == BigTiff::kNo) return wish == BigTiff::kYes;
   const ImageShape& image = settings_.image;
   uint64_t most = MostBytesOfPyramids(image.width, image.height, level) +
@@ -38,14 +38,13 @@ bool TiffLevelStore::BecomesBig(const LevelCoding& level) const {
 TiffLevelStore::Pending TiffLevelStore::PendingFor(unsigned level) const {
   Pending pending;
   pending.channels.resize(settings_.image.samples);
-  const datasources::LevelOptions& options = datasources::CurrentLevelOptions();
   const StoredLevel* ours = FindOurs(level);
-  if (!ours || options.SayCoding())
-    pending.coding = CodingOfLevel(settings_.coding, level, file_->Path());
+  if (!ours || options_.SayCoding())
+    pending.coding = CodingOfLevel(settings_.coding, level, file_->Path(), options_);
   if (!ours) return pending;
   LevelCoding stored = CodingOfStored(*ours);
   const bool isOther = !HaveSameForm(stored, pending.coding);
-  pending.isRecoded = isOther && options.restores && options.SayCoding();
+  pending.isRecoded = isOther && options_.restores && options_.SayCoding();
   if (isOther && !pending.isRecoded) pending.coding = std::move(stored);
   return pending;
 }
@@ -66,6 +65,11 @@ void TiffLevelStore::ExplainLimit(LevelRoom& room) const {
     room.obstacle = FormatString(_("%s: could pass 4 GiB, the limit that BIGTIFF=NO sets."), name);
     room.advice = _("Leave that option out.");
   }
+}
+
+void TiffLevelStore::SetOptions(const datasources::LevelOptions& options) {
+  const std::lock_guard lock(mutex_);
+  options_ = options;
 }
 
 LevelRoom TiffLevelStore::RoomFor(const std::vector<unsigned>& levels,
@@ -89,8 +93,7 @@ LevelRoom TiffLevelStore::RoomOf(const std::vector<unsigned>& levels,
   if (size.most == 0) return room;
   room.file = file_->Path();
   room.bytes = size.expected;
-  const bool mayBecomeBig =
-      !file_->Exists() && datasources::CurrentLevelOptions().bigTiff != BigTiff::kNo;
+  const bool mayBecomeBig = !file_->Exists() && options_.bigTiff != BigTiff::kNo;
   const uint64_t end = file_->Exists() ? file_->File().Size() : structure.HeaderBytes();
   if (!structure.isBig && !mayBecomeBig && end + size.most > kClassicBytes) ExplainLimit(room);
   return room;

@@ -60,6 +60,7 @@ class TiffLevelStore final : public datasources::ILevelStore {
   void SetValid(unsigned level, const std::vector<unsigned>& channels, bool valid) override;
   void SetSource(const datasources::LevelDescription& source) override;
   void KeepAnswers() override;
+  void SetOptions(const datasources::LevelOptions& options) override;
   datasources::LevelRoom RoomFor(const std::vector<unsigned>& levels,
                                  const std::vector<unsigned>& channels) const override;
   void Remove(const std::vector<unsigned>& levels) override;
@@ -159,6 +160,7 @@ class TiffLevelStore final : public datasources::ILevelStore {
   mutable std::mutex mutex_;
   std::unique_ptr<LevelFile> file_;
   Settings settings_;
+  datasources::LevelOptions options_ = datasources::CurrentLevelOptions();
   mutable LevelFreshness freshness_;
   mutable std::optional<datasources::ImageStamp> kept_;  ///< of the last answer that was kept
   std::vector<StoredLevel> levels_;

@@ -18,9 +18,9 @@ class InForce {
     LevelOptions options;
     options.restores = restores;
     for (const char* text : texts) EXPECT_EQ("", ReadLevelOption(text, options));
-    SetLevelOptions(options);
+    OptionsOfStores() = options;
   }
-  ~InForce() { datasources::SetLevelOptions({}); }
+  ~InForce() { OptionsOfStores() = {}; }
 };
 
 /// A level of `image` made with `options`, as libtiff sees it.

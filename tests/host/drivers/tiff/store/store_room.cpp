@@ -77,9 +77,9 @@ TEST_F(TiffStore, RoomOfALevelThatIsNoJpegAlthoughItsImageIsOneIsThatOfItsOwnCod
   EXPECT_FALSE(room.blursAlpha);
   datasources::LevelOptions options;
   EXPECT_EQ("", datasources::ReadLevelOption("COMPRESS=JPEG", options));
-  datasources::SetLevelOptions(options);
-  const LevelRoom blurred = RoomFor(*Open(file, datasources::kReadOnly), {2});
-  datasources::SetLevelOptions({});
+  const auto dataset = Open(file, datasources::kReadOnly);
+  dataset->GetSource()->Levels()->SetOptions(options);
+  const LevelRoom blurred = RoomFor(*dataset, {2});
   EXPECT_TRUE(blurred.blursAlpha);
   const double maskBytes = 512 * 512 / 8 / 2.0;  // half of its bits
   EXPECT_NEAR(double(asJpeg) + maskBytes, double(blurred.bytes), kDirectories);

@@ -39,8 +39,16 @@ class TiffStore : public ::testing::Test {
   ScratchFolder folder_;
 };
 
+/// How the datasets that are opened from now on store their levels.
+inline datasources::LevelOptions& OptionsOfStores() {
+  static datasources::LevelOptions options;
+  return options;
+}
+
 inline std::unique_ptr<IRasterDataset> Opened(datasources::IDataset* dataset) {
-  return std::unique_ptr<IRasterDataset>(dynamic_cast<IRasterDataset*>(dataset));
+  std::unique_ptr<IRasterDataset> raster(dynamic_cast<IRasterDataset*>(dataset));
+  raster->GetSource()->Levels()->SetOptions(OptionsOfStores());
+  return raster;
 }
 inline std::unique_ptr<IRasterDataset> Open(const std::string& file, datasources::AccessMode mode) {
   return Opened(datasources::DatasetManager::GetInstance()->Open(file, mode));
