@@ -36,9 +36,11 @@ foreach(library ${orin_libraries})
     string(PREPEND ORIN_PC_LIBRARIES "-l${library} ")
   endif()
 endforeach()
-set(ORIN_PC_GDAL "")
-if(GDAL_FOUND)
-  set(ORIN_PC_GDAL " gdal")
+set(ORIN_PC_MODULES "")   # where they are, and what they need from the program
+if(TARGET orin_gdal_module)
+  set(modules "\${libdir}/orin-overviews")
+  string(CONCAT ORIN_PC_MODULES
+    " -Wl,--export-dynamic-symbol-list=${modules}/shared-symbols.txt -Wl,-rpath,${modules}")
 endif()
 file(RELATIVE_PATH ORIN_PC_PREFIX   # ends with a slash
   /prefix/${CMAKE_INSTALL_LIBDIR}/pkgconfig /prefix)

@@ -23,6 +23,7 @@ namespace {
 
 /// Why no driver took the file: it is not there, or it is nothing that a driver knows.
 std::string UnrecognisedText(const std::string& file) {
+  if (std::string why = FormatRegistry::Instance().WhyUnrecognised(file); !why.empty()) return why;
   struct stat status;
   if (stat(file.c_str(), &status) != 0)
     return FormatString(_("%s: cannot be opened: %s."), file.c_str(), std::strerror(errno));

@@ -78,4 +78,10 @@ IFormatDriver* FormatRegistry::DriverOf(const std::string& file, ZMBFormatType& 
   return nullptr;
 }
 
+std::string FormatRegistry::WhyUnrecognised(const std::string& file) const {
+  for (const auto& driver : drivers_)
+    if (std::string why = driver->WhyUnrecognised(file); !why.empty()) return why;
+  return {};
+}
+
 }  // namespace orin::datasources

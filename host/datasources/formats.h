@@ -46,6 +46,8 @@ class IFormatDriver {
   virtual std::vector<ZMBInfo_s> Formats() const = 0;
   /// Code of the file's format, 0 when it is none of this driver's. Reads a few bytes at most.
   virtual ZMBFormatType Identify(const std::string& file) const = 0;
+  /// Why `Identify` knows no format of the file, for users; empty where there is no more to say.
+  virtual std::string WhyUnrecognised(const std::string& /*file*/) const { return {}; }
   /// \throws orin::Exception  the file cannot be opened in that mode; the text says why
   virtual std::unique_ptr<IRasterSource> Open(const std::string& file, AccessMode access) = 0;
   /// The same as `Open` for kUpdate, but for files too that can lose levels and take none.
@@ -88,6 +90,9 @@ class FormatRegistry {
 
   /// The driver that recognises the file, or null; `code` receives the format's code, else 0.
   IFormatDriver* DriverOf(const std::string& file, ZMBFormatType& code) const;
+  /// What the first driver that can say more than "unknown" says of a file that none recognises;
+  /// empty when none can.
+  std::string WhyUnrecognised(const std::string& file) const;
   /// Null when none is registered.
   ISideCarFormat* SideCarFormat() const { return sideCar_.get(); }
 

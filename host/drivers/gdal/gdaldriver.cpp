@@ -1,80 +1,75 @@
 // SPDX-License-Identifier: MIT
 #include "host/drivers/gdal/gdaldriver.h"
 
-#include <cpl_conv.h>
-#include <gdal.h>
-
 #include <memory>
 #include <mutex>
 
-#include "host/drivers/gdal/gdalerrors.h"
-#include "host/drivers/gdal/gdalformats.h"
-#include "host/drivers/gdal/gdalsource.h"
+#include "host/drivers/gdal/drivermodule.h"
+#include "host/drivers/gdal/formattable.h"
+#include "host/drivers/gdal/rasternames.h"
 #include "host/services/exception.h"
 #include "host/services/text.h"
 
 namespace orin::drivers {
 namespace {
 
-constexpr GIntBig kCacheBytes = GIntBig{64} << 20;  // more slows down what is read only once
-
-/// A setting of the library, and what it is here.
-struct Setting {
-  const char* key;
-  const char* value;
-};
-
-constexpr Setting kSettings[] = {
-    {"VRT_SHARED_SOURCE", "0"},  // a virtual raster's sources are its own, for its thread alone
-    {"CPL_VSIL_GZIP_WRITE_PROPERTIES", "NO"},  // reading makes no file
-};
-
+/// Stands for the driver in the module, which it loads for the first name that may be a raster.
 class GdalDriver final : public datasources::IFormatDriver {
  public:
   std::vector<ZMBInfo_s> Formats() const override { return GdalFormatRecords(); }
 
   ZMBFormatType Identify(const std::string& file) const override {
-    const GdalFormat* format = IdentifyGdalFormat(file);
-    return format ? format->code : kFormatUnknown;
+    if (!MayBeRaster(file)) return kFormatUnknown;
+    const LoadedDriver& loaded = Loaded();
+    return loaded.driver ? loaded.driver->Identify(file) : kFormatUnknown;
+  }
+
+  std::string WhyUnrecognised(const std::string& file) const override {
+    if (!MayBeRaster(file)) return "";
+    const LoadedDriver& loaded = Loaded();
+    if (loaded.driver) return loaded.driver->WhyUnrecognised(file);
+    return FormatString(
+        _("%s: is no TIFF file, and what reads other formats cannot be loaded: %s. Install Orin "
+          "Overviews again with its folder lib/orin-overviews, and the GDAL library."),
+        file.c_str(), loaded.problem.c_str());
   }
 
   std::unique_ptr<datasources::IRasterSource> Open(const std::string& file,
                                                    datasources::AccessMode access) override {
-    return OpenFor(file, access == datasources::kUpdate ? SourceUse::kUpdate : SourceUse::kRead);
+    return Required(file).Open(file, access);
   }
 
   std::unique_ptr<datasources::IRasterSource> OpenToRemoveLevels(const std::string& file) override {
-    return OpenFor(file, SourceUse::kRemoveLevels);
+    return Required(file).OpenToRemoveLevels(file);
   }
 
   bool IsPath(const std::string& file) const override { return IsRegularFile(file); }
 
  private:
-  static std::unique_ptr<datasources::IRasterSource> OpenFor(const std::string& file,
-                                                             SourceUse use) {
-    const GdalFormat* format = IdentifyGdalFormat(file);
-    if (!format)
-      throw Exception(FormatString(_("%s: is not a raster file of a known format."), file.c_str()),
-                      "host/drivers/gdal/gdaldriver", "GdalDriver::Open", 0);
-    return std::make_unique<GdalSource>(file, *format, use);
+  static bool MayBeRaster(const std::string& file) {
+    return IsRegularFile(file) || IsLibraryName(file);
   }
-};
 
-void SetUpLibrary() {
-  static std::once_flag once;
-  std::call_once(once, [] {
-    SilenceGdal();
-    RegisterGdalFormats();
-    if (!CPLGetConfigOption("GDAL_CACHEMAX", nullptr)) GDALSetCacheMax64(kCacheBytes);
-    for (const Setting& setting : kSettings)
-      if (!CPLGetConfigOption(setting.key, nullptr)) CPLSetConfigOption(setting.key, setting.value);
-  });
-}
+  const LoadedDriver& Loaded() const {
+    std::call_once(once_, [this] { loaded_ = LoadDriver(ORIN_GDAL_MODULE); });
+    return loaded_;
+  }
+
+  datasources::IFormatDriver& Required(const std::string& file) const {
+    const LoadedDriver& loaded = Loaded();
+    if (!loaded.driver)
+      throw Exception(WhyUnrecognised(file), "host/drivers/gdal/gdaldriver", "GdalDriver::Required",
+                      0);
+    return *loaded.driver;
+  }
+
+  mutable std::once_flag once_;
+  mutable LoadedDriver loaded_;
+};
 
 }  // namespace
 
 void RegisterGdalDriver() {
-  SetUpLibrary();
   datasources::FormatRegistry::Instance().Register(std::make_shared<GdalDriver>());
 }
 

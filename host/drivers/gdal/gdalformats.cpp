@@ -3,64 +3,31 @@
 
 #include <dlfcn.h>
 #include <gdal.h>
-#include <sys/stat.h>
 
 #include <algorithm>
-#include <cctype>
 #include <mutex>
+#include <vector>
 
 #include "host/drivers/gdal/gdalerrors.h"
+#include "host/drivers/gdal/rasternames.h"
 
 namespace orin::drivers {
 namespace {
 
-// Most specific first: a file is the first one's that knows it. No name may hold "TIFF", nor "ZMB"
-// but for the one format that keeps levels inside.
-constexpr GdalFormat kFormats[] = {
-    {"HFA", "GDALRegister_HFA", kFormatErdas, "ZMBERDAS", "ERDAS Imagine", 1, Decoding::kBlocks},
-    {"VRT", "GDALRegister_VRT", 300, "VRT", "virtual raster (VRT)", 0,
-     Decoding::kRowsOfAllChannels},
-    {"GTiff", "GDALRegister_GTiff", 301, "GTIF-REMOTE", "GeoTIFF in an archive or on a server", 0,
-     Decoding::kBlocks},
-    {"COG", "GDALRegister_COG", 0, "", "", 0, Decoding::kBlocks},
-    {"NITF", "GDALRegister_NITF", 302, "NITF", "NITF", 0, Decoding::kBlocks},
-    {"AAIGrid", "GDALRegister_AAIGrid", 303, "AAIGRID", "Arc/Info ASCII grid", 0, Decoding::kRows},
-    {"PNG", "GDALRegister_PNG", 304, "PNG", "PNG", 0, Decoding::kRowsOfAllChannels},
-    {"JPEG", "GDALRegister_JPEG", 305, "JPEG", "JPEG", 0, Decoding::kRowsOfAllChannels},
-    {"MEM", "GDALRegister_MEM", 0, "", "", 0, Decoding::kBlocks},
-    {"GIF", "GDALRegister_GIF", 306, "GIF", "GIF", 0, Decoding::kRows},
-    {"BMP", "GDALRegister_BMP", 307, "BMP", "BMP", 0, Decoding::kRows},
-    {"WEBP", "GDALRegister_WEBP", 308, "WEBP", "WebP", 0, Decoding::kRowsOfAllChannels},
-    {"JP2OpenJPEG", "GDALRegister_JP2OpenJPEG", 309, "JP2", "JPEG 2000", 0,
-     Decoding::kRowsOfAllChannels},
-    {"netCDF", "GDALRegister_netCDF", 310, "NETCDF", "netCDF", 0, Decoding::kRows},
-    {"HDF5", "GDALRegister_HDF5", 311, "HDF5", "HDF5", 0, Decoding::kRows},
-    {"HDF5Image", "GDALRegister_HDF5Image", 311, "HDF5", "HDF5", 0, Decoding::kRows},
-    {"GRIB", "GDALRegister_GRIB", 312, "GRIB", "GRIB", 0, Decoding::kRows},
-    {"ENVI", "GDALRegister_ENVI", 313, "ENVI", "ENVI", 0, Decoding::kRows},
-    {"EHdr", "GDALRegister_EHdr", 314, "EHDR", "ESRI .hdr labelled", 0, Decoding::kRows},
-    {"RRASTER", "GDALRegister_RRASTER", 315, "RRASTER", "R raster", 0, Decoding::kRows},
-    {"MRF", "GDALRegister_mrf", 316, "MRF", "meta raster format (MRF)", 0, Decoding::kBlocks},
-};
-
-bool IsInstalled(const GdalFormat& format) { return GDALGetDriverByName(format.driver) != nullptr; }
+/// The library in the process, wherever it came from; null when it is part of the program.
+void* LibraryInProcess() {
+  Dl_info place;
+  if (dladdr(reinterpret_cast<void*>(&GDALGetDriverByName), &place) == 0) return nullptr;
+  return dlopen(place.dli_fname, RTLD_LAZY | RTLD_NOLOAD);
+}
 
 /// The drivers that may open a name, for the library's functions.
 std::vector<const char*> OpeningDrivers() {
   std::vector<const char*> names;
-  for (const GdalFormat& format : kFormats)
+  for (const GdalFormat& format : GdalFormats())
     if (format.code != 0) names.push_back(format.driver);
   names.push_back(nullptr);
   return names;
-}
-
-/// A name that only the library understands: "/vsizip/...", "NETCDF:..."
-bool IsLibraryName(const std::string& name) {
-  if (name.starts_with("/vsi")) return true;
-  const size_t colon = name.find(':');
-  return colon != name.npos && colon > 1 &&
-         std::all_of(name.begin(), name.begin() + static_cast<std::ptrdiff_t>(colon),
-                     [](unsigned char c) { return std::isalnum(c) || c == '_'; });
 }
 
 }  // namespace
@@ -68,23 +35,11 @@ bool IsLibraryName(const std::string& name) {
 void RegisterGdalFormats() {
   static std::once_flag once;
   std::call_once(once, [] {
-    for (const GdalFormat& format : kFormats)
-      if (void* function = dlsym(RTLD_DEFAULT, format.registration))
+    void* library = LibraryInProcess();
+    for (const GdalFormat& format : GdalFormats())
+      if (void* function = dlsym(library ? library : RTLD_DEFAULT, format.registration))
         reinterpret_cast<void (*)()>(function)();
   });
-}
-
-std::vector<ZMBInfo_s> GdalFormatRecords() {
-  std::vector<ZMBInfo_s> records;
-  for (const GdalFormat& format : kFormats)
-    if (format.code != 0 && IsInstalled(format))
-      records.push_back({format.name, format.description, format.code, format.nativeOverviews});
-  return records;
-}
-
-bool IsRegularFile(const std::string& name) {
-  struct stat status;
-  return stat(name.c_str(), &status) == 0 && S_ISREG(status.st_mode);
 }
 
 const GdalFormat* IdentifyGdalFormat(const std::string& name) {
@@ -94,9 +49,10 @@ const GdalFormat* IdentifyGdalFormat(const std::string& name) {
   GDALDriverH driver = GDALIdentifyDriverEx(name.c_str(), GDAL_OF_RASTER, allowed.data(), nullptr);
   if (!driver) return nullptr;
   const std::string found = GDALGetDriverShortName(driver);
-  const auto format = std::find_if(std::begin(kFormats), std::end(kFormats),
+  const std::span<const GdalFormat> formats = GdalFormats();
+  const auto format = std::find_if(formats.begin(), formats.end(),
                                    [&](const GdalFormat& f) { return f.driver == found; });
-  return format == std::end(kFormats) ? nullptr : &*format;
+  return format == formats.end() ? nullptr : &*format;
 }
 
 }  // namespace orin::drivers

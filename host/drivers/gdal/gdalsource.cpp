@@ -14,6 +14,7 @@
 #include "host/drivers/gdal/gdalreader.h"
 #include "host/drivers/gdal/gdalwatch.h"
 #include "host/drivers/gdal/hfalevelstore.h"
+#include "host/drivers/gdal/rasternames.h"
 #include "host/drivers/gdal/subdatasets.h"
 #include "host/services/exception.h"
 #include "host/services/text.h"

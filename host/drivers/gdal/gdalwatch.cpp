@@ -11,6 +11,7 @@
 #include "host/datasources/fingerprint.h"
 #include "host/datasources/vrtsources.h"
 #include "host/drivers/gdal/gdalreader.h"
+#include "host/drivers/gdal/rasternames.h"
 
 namespace orin::drivers {
 namespace {

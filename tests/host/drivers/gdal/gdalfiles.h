@@ -16,8 +16,8 @@
 
 #include "host/datasources/datasetmanager.h"
 #include "host/datasources/formats.h"
-#include "host/drivers/gdal/gdaldriver.h"
 #include "host/drivers/gdal/gdalerrors.h"
+#include "host/drivers/gdal/readingdriver.h"
 #include "host/drivers/tiff/tiffdriver.h"
 #include "host/services/exception.h"
 
@@ -32,7 +32,7 @@ class GdalFiles : public ::testing::Test {
     folder_ = name;
     datasources::FormatRegistry::Instance().Clear();
     drivers::RegisterTiffDriver();
-    drivers::RegisterGdalDriver();
+    datasources::FormatRegistry::Instance().Register(drivers::MakeReadingDriver());
   }
   ~GdalFiles() override {
     datasources::FormatRegistry::Instance().Clear();
