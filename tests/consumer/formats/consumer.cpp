@@ -30,7 +30,9 @@ void TellOf(const char* file) {
     std::printf("%s: %u x %u, %s\n", file, raster->GetWidth(), raster->GetHeight(),
                 orin::datasources::FormatNameOf(*dataset).c_str());
   } catch (const orin::Exception& error) {
-    std::printf("%s\n", error.GetMessage().c_str());
+    const std::string text = error.GetMessage();
+    const size_t reason = text.rfind(": ");  // the library's words
+    std::printf("%s\n", text.substr(0, reason).c_str());
   }
 }
 
@@ -47,7 +49,7 @@ int main() {
   std::ofstream("image.vrt") << "<VRTDataset rasterXSize='4' rasterYSize='3'>"
                                 "<VRTRasterBand dataType='Byte' band='1'/></VRTDataset>";
   TellOf("image.vrt");
-  std::ofstream("damaged.vrt") << "<VRTDataset";
+  std::ofstream("damaged.vrt") << "<VRTDataset rasterXSize='4' rasterYSize='3'><VRTRasterBand";
   TellOf("damaged.vrt");
   std::printf("loaded: %s\n", IsGdalLoaded() ? "yes" : "no");
 }
