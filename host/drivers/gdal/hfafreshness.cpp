@@ -1,9 +1,5 @@
 /// How levels in an ERDAS Imagine file stand to its image, which other programs may have changed.
 // SPDX-License-Identifier: MIT
-#include <fcntl.h>
-#include <sys/stat.h>
-#include <unistd.h>
-
 #include <algorithm>
 #include <chrono>
 #include <exception>
@@ -17,22 +13,6 @@ namespace orin::drivers {
 using datasources::ImageRecord;
 using datasources::ImageStamp;
 using datasources::LevelStatus;
-
-namespace {
-
-timespec TimeOf(int64_t nanoseconds) {
-  constexpr int64_t kSecond = 1000000000;
-  const int64_t part = (nanoseconds % kSecond + kSecond) % kSecond;
-  return {static_cast<time_t>((nanoseconds - part) / kSecond), static_cast<long>(part)};
-}
-
-void SetModified(const std::string& path, int64_t nanoseconds) {
-  const timespec times[] = {{0, UTIME_OMIT}, TimeOf(nanoseconds)};
-  // A file that is not ours keeps its time; then the next answer reads the image.
-  utimensat(AT_FDCWD, path.c_str(), times, 0);
-}
-
-}  // namespace
 
 /// What the image shows now; while levels are written into its file, what it showed before.
 std::optional<ImageStamp> HfaLevelStore::Now() const {
@@ -121,14 +101,14 @@ void HfaLevelStore::Restamp(const std::string& fingerprint, const ImageStamp& st
 void HfaLevelStore::Settle() {
   const bool wasChanging = isChanging_;
   isChanging_ = false;
-  if (!wasChanging || !before_) return;
+  if (!wasChanging || !before_ || !lock_) return;
   const std::string fingerprint = watch_->Known(*before_).value_or("");
   const auto now = std::chrono::system_clock::now().time_since_epoch();
-  SetModified(path_, std::chrono::nanoseconds(now).count());
+  lock_->SetModified(std::chrono::nanoseconds(now).count());
   const auto stamp = watch_->Stamp();  // with the time as the file system keeps it
   if (fingerprint.empty() || !stamp) return;
   Restamp(fingerprint, *stamp);
-  SetModified(path_, stamp->modified);
+  lock_->SetModified(stamp->modified);
   watch_->Learn(*stamp, fingerprint);
   Reload();
 }
@@ -142,16 +122,16 @@ void HfaLevelStore::KeepAnswers() {
     return !fingerprint.empty() && image.fingerprint == fingerprint && image.stamp != now;
   });
   if (!isOutdated || !now) return;
-  const bool wasLocked = lock_ >= 0;
+  const bool wasLocked = lock_ != nullptr;
   try {
     LockFile();
     Restamp(fingerprint, *now);
-    SetModified(path_, now->modified);
+    lock_->SetModified(now->modified);
     Reload();
   } catch (const std::exception&) {
     // deliberate: a file that cannot be written, or is being written, is no failure of a question
   }
-  if (!wasLocked && lock_ >= 0) close(std::exchange(lock_, -1));
+  if (!wasLocked) lock_.reset();
 }
 
 }  // namespace orin::drivers

@@ -1,12 +1,7 @@
 // SPDX-License-Identifier: MIT
 #include "host/drivers/gdal/hfalevelstore.h"
 
-#include <fcntl.h>
-#include <sys/file.h>
-#include <unistd.h>
-
 #include <algorithm>
-#include <cerrno>
 #include <filesystem>
 #include <set>
 #include <utility>
@@ -14,7 +9,6 @@
 #include "host/drivers/gdal/gdalerrors.h"
 #include "host/drivers/gdal/hfalevelwriter.h"
 #include "host/services/exception.h"
-#include "host/services/lockholder.h"
 #include "host/services/text.h"
 
 namespace orin::drivers {
@@ -85,7 +79,6 @@ HfaLevelStore::~HfaLevelStore() {
   } catch (const std::exception&) {
     // deliberate: nothing is lost but space, which the next change finds again
   }
-  if (lock_ >= 0) close(lock_);
 }
 
 void HfaLevelStore::Fail(const char* format, unsigned level) const {
@@ -108,15 +101,10 @@ void HfaLevelStore::Reload() {
 
 /// Keeps other builds away until the store goes.
 void HfaLevelStore::LockFile() {
-  if (lock_ >= 0) return;
-  lock_ = open(path_.c_str(), O_RDWR | O_CLOEXEC);
-  // A file system without locks is none to refuse work on.
-  if (lock_ < 0 || flock(lock_, LOCK_EX | LOCK_NB) == 0 || errno != EWOULDBLOCK) return;
-  const std::string text = LockedText(path_, lock_);
-  close(lock_);
-  lock_ = -1;
-  throw Exception(text, "host/drivers/gdal/hfalevelstore", "orin::drivers::HfaLevelStore::LockFile",
-                  0);
+  if (lock_) return;
+  auto file = std::make_unique<PositionedFile>(path_, PositionedFile::Mode::kUpdate);
+  file->Lock();
+  lock_ = std::move(file);
 }
 
 /// The format rounds up; what we make ends where it should.

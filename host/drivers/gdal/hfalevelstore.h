@@ -12,7 +12,8 @@
 
 #include "host/datasources/imagewatch.h"
 #include "host/datasources/levelstore.h"
-#include "host/drivers/gdal/byteranges.h"
+#include "host/drivers/common/byteranges.h"
+#include "host/drivers/common/positionedfile.h"
 #include "host/drivers/gdal/gdalformats.h"
 #include "host/drivers/gdal/hfarecord.h"
 #include "host/drivers/gdal/hfatree.h"
@@ -118,7 +119,7 @@ class HfaLevelStore final : public datasources::ILevelStore {
   const GdalFormat& format_;
   datasources::IRasterSource& image_;
   bool mayChange_;
-  int lock_ = -1;  ///< descriptor that holds the lock, from the first change on
+  std::unique_ptr<PositionedFile> lock_;  ///< holds the lock, from the first change on
   HfaPyramid pyramid_;
   std::map<unsigned, HfaRecord> records_;
   std::map<unsigned, Pending> pending_;

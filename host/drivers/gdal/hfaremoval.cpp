@@ -33,8 +33,8 @@ ByteRanges ShortenLists(const std::string& path, const std::vector<unsigned>& fa
       const std::string data = PlaceHfaNameList(list.data, position);
       file.Write(position, data.data(), data.size());
       Point(file, {part.position + kHfaDataAt, position});
-      bytes.Add(part.data, uint64_t{part.data} + part.dataBytes);
-      bytes.Add(position, position + data.size());
+      bytes.Add({part.data, uint64_t{part.data} + part.dataBytes});
+      bytes.Add({position, position + data.size()});
     }
   file.RequireWritten();
   file.Commit();

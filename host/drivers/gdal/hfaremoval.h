@@ -5,7 +5,7 @@
 #include <string>
 #include <vector>
 
-#include "host/drivers/gdal/byteranges.h"
+#include "host/drivers/common/byteranges.h"
 
 namespace orin::drivers {
 

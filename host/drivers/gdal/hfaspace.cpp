@@ -42,9 +42,9 @@ class SpaceFinder {
     Walk(tree_.Root(), false, 0);
     if (!isKnown_) return {space_.size, space_.size, {}, {}, {}};
     space_.end = std::max(levels_.End(), others_.End());
-    space_.free.Add(others_.End(), space_.size);
+    space_.free.Add({others_.End(), space_.size});
     space_.free.Add(given);
-    space_.free.Remove(space_.size, UINT64_MAX);
+    space_.free.Remove({space_.size, UINT64_MAX});
     space_.free.Remove(levels_);
     space_.free.Remove(others_);
     KeepMovablesApart();
@@ -70,7 +70,7 @@ class SpaceFinder {
 
   void Use(uint32_t start, uint64_t bytes) {
     if (bytes == 0) return;
-    (isLevel_ ? levels_ : others_).Add(start, start + bytes);
+    (isLevel_ ? levels_ : others_).Add({start, start + bytes});
     if (isLevel_) space_.movables.push_back({start, static_cast<uint32_t>(bytes)});
   }
 
@@ -159,7 +159,7 @@ class SpaceFinder {
       const uint64_t itsEnd = uint64_t{all[i].position} + all[i].bytes;
       const bool overlaps = all[i].position < end ||
                             (i + 1 < all.size() && all[i + 1].position < itsEnd) ||
-                            others_.Touches(all[i].position, itsEnd);
+                            others_.Touches({all[i].position, itsEnd});
       if (!overlaps) apart.push_back(all[i]);
       end = std::max(end, itsEnd);
     }
@@ -225,7 +225,8 @@ class Moves {
       (fits(middle) ? count : tooMany) = middle;
     }
     for (size_t i = 0; i < count; ++i) moves_[alike.last(count)[i].position] = {bytes, places[i]};
-    for (size_t i = count; i < places.size(); ++i) free.Add(places[i], uint64_t{places[i]} + bytes);
+    for (size_t i = count; i < places.size(); ++i)
+      free.Add({places[i], uint64_t{places[i]} + bytes});
   }
 
   std::map<uint32_t, Move> moves_;

@@ -6,7 +6,7 @@
 #include <string>
 #include <vector>
 
-#include "host/drivers/gdal/byteranges.h"
+#include "host/drivers/common/byteranges.h"
 #include "host/drivers/gdal/hfanode.h"
 
 namespace orin::drivers {

@@ -1,17 +1,13 @@
 /// How levels leave an ERDAS Imagine file, and how the space goes that replaced and removed levels
 /// had.
 // SPDX-License-Identifier: MIT
-#include <fcntl.h>
-#include <sys/stat.h>
-#include <unistd.h>
-
 #include <algorithm>
+#include <exception>
 #include <optional>
 
 #include "host/drivers/gdal/hfalevelstore.h"
 #include "host/drivers/gdal/hfaremoval.h"
 #include "host/drivers/gdal/hfaspace.h"
-#include "host/services/filealone.h"
 #include "host/services/text.h"
 
 namespace orin::drivers {
@@ -42,13 +38,17 @@ void HfaLevelStore::Shorten() {
   const HfaSpace space = FindHfaSpace(path_, freed_);
   if (space.end >= space.size) return;
   const auto cut = [&] {
-    struct stat now {};
-    const bool isSame = fstat(lock_, &now) == 0 && uint64_t(now.st_size) == space.size;
-    if (isSame && ftruncate(lock_, static_cast<off_t>(space.end)) == 0) fsync(lock_);
+    if (lock_->Size() != space.size) return;
+    lock_->Truncate(space.end);
+    lock_->Sync();
   };
   const bool isEmpty = std::all_of(pyramid_.channels.begin(), pyramid_.channels.end(),
                                    [](const auto& levels) { return levels.empty(); });
-  if (DoAlone(lock_, cut) != Alone::kDone && isEmpty) cut();
+  try {
+    if (lock_->DoAlone(cut) != PositionedFile::Alone::kDone && isEmpty) cut();
+  } catch (const std::exception&) {
+    // deliberate: nothing is lost but space, which the next change finds again
+  }
 }
 
 /// Moves levels into the space of those that they replaced, and makes the file shorter. While
@@ -57,10 +57,11 @@ void HfaLevelStore::GiveBackSpace() {
   constexpr int kMostPasses = 12;         // what one pass leaves room for, the next one moves
   constexpr uint64_t kWorthAPass = 4096;  // that the last one moved
   isChanged_ = false;
-  if (lock_ < 0 || pyramid_.isSpilled) return;
+  if (!lock_ || pyramid_.isSpilled) return;
   if (FindHfaSpace(path_, freed_).free.Size() == 0) return;
   BeginChange();
-  for (int pass = 0; pass < kMostPasses && DoAlone(lock_, [] {}) == Alone::kDone; ++pass)
+  const auto isAlone = [&] { return lock_->DoAlone([] {}) == PositionedFile::Alone::kDone; };
+  for (int pass = 0; pass < kMostPasses && isAlone(); ++pass)
     if (MoveHfaLevelsDown(path_, FindHfaSpace(path_, freed_)) < kWorthAPass) break;
   Shorten();
   freed_ = {};

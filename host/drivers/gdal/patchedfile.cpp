@@ -1,13 +1,9 @@
 // SPDX-License-Identifier: MIT
 #include "host/drivers/gdal/patchedfile.h"
 
-#include <fcntl.h>
-#include <sys/stat.h>
-#include <unistd.h>
-
 #include <algorithm>
-#include <cerrno>
 #include <cstring>
+#include <exception>
 #include <filesystem>
 #include <utility>
 
@@ -18,31 +14,23 @@
 namespace orin::drivers {
 
 PatchedFile::PatchedFile(std::string path)
-    : path_(std::move(path)), descriptor_(open(path_.c_str(), O_RDWR | O_CLOEXEC)) {
-  struct stat status {};
-  if (descriptor_ < 0 || fstat(descriptor_, &status) != 0) {
-    const int reason = errno;
-    if (descriptor_ >= 0) close(descriptor_);
-    throw Exception(FormatString(_("%s: cannot be opened for writing: %s."), path_.c_str(),
-                                 std::strerror(reason)),
-                    "host/drivers/gdal/patchedfile", "PatchedFile::PatchedFile", 0);
-  }
-  end_ = size_ = static_cast<uint64_t>(status.st_size);
-  libraryName_ = ShowToLibrary(*this, std::filesystem::path(path_).filename().string());
+    : file_(std::move(path), PositionedFile::Mode::kUpdate), end_(file_.Size()), size_(end_) {
+  libraryName_ = ShowToLibrary(*this, std::filesystem::path(file_.Path()).filename().string());
 }
 
 PatchedFile::~PatchedFile() {
   HideFromLibrary(libraryName_);
-  // What is left behind when this fails is at the file's end, and nothing refers to it.
-  if (!isCommitted_ && size_ > end_ && ftruncate(descriptor_, static_cast<off_t>(end_)) != 0)
-    error_ = errno;
-  close(descriptor_);
+  try {
+    if (!isCommitted_ && size_ > end_) file_.Truncate(end_);
+  } catch (const std::exception&) {
+    // deliberate: what is left behind is at the file's end, and nothing refers to it
+  }
 }
 
 void PatchedFile::FailToWrite() const {
   throw Exception(FormatString(_("%s: cannot be written: %s. Free space or change the permissions, "
                                  "then run again."),
-                               path_.c_str(), std::strerror(error_)),
+                               file_.Path().c_str(), std::strerror(error_)),
                   "host/drivers/gdal/patchedfile", "PatchedFile::Commit()", 0);
 }
 
@@ -50,26 +38,17 @@ PatchedFile::Page& PatchedFile::PageAt(uint64_t number) {
   const auto [entry, isNew] = pages_.try_emplace(number);
   if (isNew) {
     entry->second.fill(0);
-    const auto position = static_cast<off_t>(number * kPageBytes);
-    if (pread(descriptor_, entry->second.data(), kPageBytes, position) < 0) error_ = errno;
+    const Transfer done = file_.ReadUpTo(number * kPageBytes, entry->second.data(), kPageBytes);
+    if (done.error != 0) error_ = done.error;
   }
   return entry->second;
 }
 
 bool PatchedFile::PutThrough(uint64_t position, const char* bytes, size_t count) {
-  while (count > 0) {
-    const ssize_t put = pwrite(descriptor_, bytes, count, static_cast<off_t>(position));
-    if (put < 0 && errno == EINTR) continue;
-    if (put <= 0) {
-      if (error_ == 0) error_ = put < 0 ? errno : ENOSPC;
-      return false;
-    }
-    bytes += put;
-    position += static_cast<uint64_t>(put);
-    count -= static_cast<size_t>(put);
-    size_ = std::max(size_, position);
-  }
-  return true;
+  const Transfer done = file_.WriteUpTo(position, bytes, count);
+  if (done.bytes > 0) size_ = std::max(size_, position + done.bytes);
+  if (error_ == 0) error_ = done.error;
+  return done.error == 0;
 }
 
 size_t PatchedFile::Write(uint64_t position, const void* bytes, size_t count) {
@@ -99,21 +78,12 @@ void PatchedFile::WriteNow(uint64_t position, const void* bytes, size_t count) {
 
 void PatchedFile::Sync() {
   RequireWritten();
-  if (fsync(descriptor_) == 0) return;
-  error_ = errno;
-  FailToWrite();
+  file_.Sync();
 }
 
 size_t PatchedFile::Read(uint64_t position, void* bytes, size_t count) {
   auto* to = static_cast<char*>(bytes);
-  size_t got = 0;
-  while (got < count) {
-    const ssize_t part =
-        pread(descriptor_, to + got, count - got, static_cast<off_t>(position + got));
-    if (part < 0 && errno == EINTR) continue;
-    if (part <= 0) break;
-    got += static_cast<size_t>(part);
-  }
+  const size_t got = file_.ReadUpTo(position, bytes, count).bytes;
   for (auto page = pages_.lower_bound(position / kPageBytes);
        page != pages_.end() && page->first * kPageBytes < position + got; ++page) {
     const uint64_t first = std::max(position, page->first * kPageBytes);
@@ -131,7 +101,7 @@ std::vector<FilePatch> PatchedFile::Waiting() const {
     const uint64_t start = number * kPageBytes;
     const size_t length = std::min<uint64_t>(kPageBytes, end_ - start);
     Page stored{};
-    if (pread(descriptor_, stored.data(), length, static_cast<off_t>(start)) < 0) stored.fill(0);
+    if (file_.ReadUpTo(start, stored.data(), length).error != 0) stored.fill(0);
     const auto first = std::mismatch(page.begin(), page.begin() + length, stored.begin()).first;
     if (first == page.begin() + length) continue;
     auto last = page.begin() + length;

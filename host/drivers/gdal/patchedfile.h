@@ -9,6 +9,8 @@
 #include <string>
 #include <vector>
 
+#include "host/drivers/common/positionedfile.h"
+
 namespace orin::drivers {
 
 /// Bytes to be put over existing ones.
@@ -59,11 +61,10 @@ class PatchedFile {
   bool PutThrough(uint64_t position, const char* bytes, size_t count);
   [[noreturn]] void FailToWrite() const;
 
-  std::string path_;
+  PositionedFile file_;
   std::string libraryName_;
-  int descriptor_ = -1;
-  uint64_t end_ = 0;   ///< of what was there before; bytes
-  uint64_t size_ = 0;  ///< with what was appended
+  uint64_t end_;   ///< of what was there before; bytes
+  uint64_t size_;  ///< with what was appended
   std::map<uint64_t, Page> pages_;
   int error_ = 0;  ///< errno of the first write that failed
   bool isCommitted_ = false;

@@ -143,7 +143,7 @@ uint64_t Appender::Reserve(uint64_t bytes, Taking take) {
 }
 
 uint64_t Appender::Append(const std::vector<uint8_t>& bytes) {
-  const uint64_t position = Reserve(bytes.size(), &ExtentSet::Take);
+  const uint64_t position = Reserve(bytes.size(), &ByteRanges::Take);
   file_.Write(position, bytes.data(), bytes.size());
   return position;
 }
@@ -167,7 +167,7 @@ uint64_t Appender::ReserveDirectory(const std::vector<NewEntry>& entries) {
     const std::lock_guard lock(mutex_);
     return HasOpenStretch();
   }();
-  return Reserve(SizeOfDirectory(entries), goesBehind ? nullptr : &ExtentSet::TakeFromShortest);
+  return Reserve(SizeOfDirectory(entries), goesBehind ? nullptr : &ByteRanges::TakeFromShortest);
 }
 
 uint64_t Appender::WriteDirectory(std::vector<NewEntry> entries, uint64_t next, uint64_t reserved) {

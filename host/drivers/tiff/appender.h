@@ -7,8 +7,8 @@
 #include <optional>
 #include <vector>
 
+#include "host/drivers/common/positionedfile.h"
 #include "host/drivers/tiff/ownspace.h"
-#include "host/drivers/tiff/positionedfile.h"
 #include "host/drivers/tiff/structure.h"
 
 namespace orin::drivers {
@@ -62,7 +62,7 @@ class Appender {
   void CutBackTo(uint64_t end);
 
  private:
-  using Taking = std::optional<uint64_t> (ExtentSet::*)(uint64_t bytes);
+  using Taking = std::optional<uint64_t> (ByteRanges::*)(uint64_t bytes);
 
   /// \param take  null: nothing is taken from the free space
   uint64_t Reserve(uint64_t bytes, Taking take);
@@ -81,7 +81,7 @@ class Appender {
   uint64_t end_;
   uint64_t kept_ = 0;  ///< the file is never cut before this
   OwnSpace space_;     ///< `free`: what may be taken; the last stretch may be open
-  ExtentSet taken_;    ///< of the free space, since the last Keep
+  ByteRanges taken_;   ///< of the free space, since the last Keep
 };
 
 }  // namespace orin::drivers

@@ -96,7 +96,7 @@ void LevelFile::GiveBackSpace() {
   StartAppending();
 }
 
-void LevelFile::GiveBackSpace(const ExtentSet& given) {
+void LevelFile::GiveBackSpace(const ByteRanges& given) {
   OpenForChange();
   structure_ = ParseStructure(*file_);
   const OwnSpace space = FindOwnSpace(*file_, structure_);

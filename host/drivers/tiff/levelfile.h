@@ -7,10 +7,10 @@
 #include <string>
 #include <vector>
 
+#include "host/drivers/common/positionedfile.h"
 #include "host/drivers/tiff/appender.h"
 #include "host/drivers/tiff/leveldirectories.h"
 #include "host/drivers/tiff/packing.h"
-#include "host/drivers/tiff/positionedfile.h"
 #include "host/drivers/tiff/structure.h"
 
 namespace orin::drivers {
@@ -66,7 +66,7 @@ class LevelFile {
   /// end; not while others have the file open, which may still read levels that were replaced.
   void GiveBackSpace();
   /// Shortens it, whoever has it open, by `given` as well, which nothing refers to any more.
-  void GiveBackSpace(const ExtentSet& given);
+  void GiveBackSpace(const ByteRanges& given);
   /// Takes the file away; it counts as not yet made afterwards.
   void Delete();
   /// Takes away what a build that was killed left of a file that is not yet made.

@@ -64,7 +64,7 @@ void TiffLevelStore::RemoveStored(const std::vector<unsigned>& levels) {
     file_->Delete();
     return;
   }
-  ExtentSet given;
+  ByteRanges given;
   for (const size_t index : indices)
     for (const auto& [start, end] :
          ReferencesOf(file_->File(), structure, structure.directories[index]).extents)

@@ -216,14 +216,14 @@ Joining JoinStretches(const OwnSpace& space) {
   return joining;
 }
 
-uint64_t OwnSpace::ShortestEnd(uint64_t fileSize, const ExtentSet& given) const {
+uint64_t OwnSpace::ShortestEnd(uint64_t fileSize, const ByteRanges& given) const {
   constexpr uint64_t kPadding = 1;  // other programs begin at even positions
-  ExtentSet spare = given;
+  ByteRanges spare = given;
   for (const Stretch& stretch : stretches) spare.Add({stretch.start, stretch.end});
   uint64_t end = fileSize;
   while (!spare.IsEmpty() && spare.End() <= end && end - spare.End() <= kPadding &&
          used.End() < end) {
-    const Extent last = spare.Last();
+    const ByteRange last = spare.Last();
     const uint64_t needed = used.End() + used.End() % 2;  // a stretch ends at an even position
     end = used.End() <= last.start ? last.start : std::min(needed, end);
     if (end > last.start) break;

@@ -11,7 +11,7 @@
 #include <optional>
 #include <vector>
 
-#include "host/drivers/tiff/extents.h"
+#include "host/drivers/common/byteranges.h"
 #include "host/drivers/tiff/references.h"
 #include "host/drivers/tiff/structure.h"
 
@@ -42,13 +42,13 @@ std::vector<uint8_t> ComposePointer(uint64_t marker, uint64_t directory);
 
 struct OwnSpace {
   std::vector<Stretch> stretches;  ///< ascending; none is open
-  ExtentSet used;                  ///< what the file refers to, pointers included
-  ExtentSet free;                  ///< what it does not, within the stretches
+  ByteRanges used;                 ///< what the file refers to, pointers included
+  ByteRanges free;                 ///< what it does not, within the stretches
   std::vector<Stretch> unclosed;   ///< of `stretches`: those whose marker does not yet tell the end
   std::vector<uint64_t> directories;  ///< offsets of the chain's directories in the stretches
 
   /// How short the file can become without losing more than space of this program and `given`.
-  uint64_t ShortestEnd(uint64_t fileSize, const ExtentSet& given) const;
+  uint64_t ShortestEnd(uint64_t fileSize, const ByteRanges& given) const;
 };
 
 /// Markers that are to be written so that two stretches become one. A stretch that holds no

@@ -7,17 +7,17 @@ namespace orin::drivers {
 namespace {
 
 /// The part of a gap that can be taken: what is added begins at even positions.
-Extent RoomIn(Extent gap) {
+ByteRange RoomIn(ByteRange gap) {
   const uint64_t start = gap.start + gap.start % 2;
   return {std::min(start, gap.end), gap.end};
 }
 
-uint64_t SizeOf(Extent extent) { return extent.end - extent.start; }
+uint64_t SizeOf(ByteRange extent) { return extent.end - extent.start; }
 
-std::vector<Extent> GapsOf(const ExtentSet& free) {
-  std::vector<Extent> gaps;
+std::vector<ByteRange> GapsOf(const ByteRanges& free) {
+  std::vector<ByteRange> gaps;
   for (const auto& [start, end] : free)
-    if (const Extent room = RoomIn({start, end}); SizeOf(room) > 0) gaps.push_back(room);
+    if (const ByteRange room = RoomIn({start, end}); SizeOf(room) > 0) gaps.push_back(room);
   return gaps;
 }
 
@@ -32,7 +32,7 @@ Items LargestFirst(const std::vector<Movable>& items) {
 }
 
 /// What lies behind the gap and fits into it.
-std::vector<size_t> FittingInto(Extent gap, const Items& largestFirst) {
+std::vector<size_t> FittingInto(ByteRange gap, const Items& largestFirst) {
   std::vector<size_t> indices;
   uint64_t left = SizeOf(gap);
   for (const Movable* item : largestFirst) {
@@ -45,7 +45,8 @@ std::vector<size_t> FittingInto(Extent gap, const Items& largestFirst) {
 
 /// What makes the gap larger by leaving: the level behind it; where a stretch begins there, all of
 /// that stretch.
-std::vector<size_t> Behind(Extent gap, const OwnSpace& space, const std::vector<Movable>& items) {
+std::vector<size_t> Behind(ByteRange gap, const OwnSpace& space,
+                           const std::vector<Movable>& items) {
   const auto next = std::find_if(space.stretches.begin(), space.stretches.end(),
                                  [&](const Stretch& stretch) { return stretch.start == gap.end; });
   const auto isIn = [&](uint64_t directory) {
@@ -61,31 +62,31 @@ std::vector<size_t> Behind(Extent gap, const OwnSpace& space, const std::vector<
   return indices.size() == size_t(all) ? indices : std::vector<size_t>();
 }
 
-Move MoveOf(std::vector<size_t> indices, std::optional<Extent> room) {
+Move MoveOf(std::vector<size_t> indices, std::optional<ByteRange> room) {
   std::sort(indices.begin(), indices.end());
   return {std::move(indices), room};
 }
 
 }  // namespace
 
-uint64_t RoomBefore(const ExtentSet& free, uint64_t end) {
+uint64_t RoomBefore(const ByteRanges& free, uint64_t end) {
   uint64_t bytes = 0;
-  for (const Extent& gap : GapsOf(free))
+  for (const ByteRange& gap : GapsOf(free))
     if (gap.start < end) bytes += std::min(gap.end, end) - gap.start;
   return bytes;
 }
 
 std::optional<Move> NextMove(const OwnSpace& space, const std::vector<Movable>& items) {
   constexpr size_t kMostGaps = 64;  // that are tried: shorter ones do not count
-  std::vector<Extent> gaps = GapsOf(space.free);
+  std::vector<ByteRange> gaps = GapsOf(space.free);
   const Items largestFirst = LargestFirst(items);
-  for (const Extent& gap : gaps)
+  for (const ByteRange& gap : gaps)
     if (auto indices = FittingInto(gap, largestFirst); !indices.empty())
       return MoveOf(std::move(indices), gap);
   std::stable_sort(gaps.begin(), gaps.end(),
-                   [](Extent a, Extent b) { return SizeOf(a) > SizeOf(b); });
+                   [](ByteRange a, ByteRange b) { return SizeOf(a) > SizeOf(b); });
   gaps.resize(std::min(gaps.size(), kMostGaps));
-  for (const Extent& gap : gaps)
+  for (const ByteRange& gap : gaps)
     if (auto indices = Behind(gap, space, items); !indices.empty())
       return MoveOf(std::move(indices), std::nullopt);
   return std::nullopt;

@@ -7,7 +7,7 @@
 #include <optional>
 #include <vector>
 
-#include "host/drivers/tiff/extents.h"
+#include "host/drivers/common/byteranges.h"
 #include "host/drivers/tiff/ownspace.h"
 
 namespace orin::drivers {
@@ -17,12 +17,13 @@ struct Movable {
   size_t index = 0;        ///< in the chain
   uint64_t directory = 0;  ///< its offset
   uint64_t bytes = 0;      ///< that it takes in one piece, from an even position on
-  ExtentSet extents;       ///< that it takes now
+  ByteRanges extents;      ///< that it takes now
 };
 
 struct Move {
   std::vector<size_t> indices;  ///< in the chain, ascending
-  std::optional<Extent> room;   ///< free space that holds them all; none: they go to the file's end
+  std::optional<ByteRange>
+      room;  ///< free space that holds them all; none: they go to the file's end
 };
 
 /// So often all levels may go to the file's end before a packing is given up. None was seen to need
@@ -30,7 +31,7 @@ struct Move {
 inline constexpr uint64_t kMostRounds = 3;
 
 /// Bytes of free space before `end` that can be taken.
-uint64_t RoomBefore(const ExtentSet& free, uint64_t end);
+uint64_t RoomBefore(const ByteRanges& free, uint64_t end);
 
 /// The next one of the moves that close the gaps. What fits into a gap before it moves there, the
 /// largest first. Where nothing fits, what stands behind the largest gap goes to the file's end, by

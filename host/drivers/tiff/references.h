@@ -4,13 +4,13 @@
 
 #include <cstdint>
 
-#include "host/drivers/tiff/extents.h"
+#include "host/drivers/common/byteranges.h"
 #include "host/drivers/tiff/structure.h"
 
 namespace orin::drivers {
 
 struct References {
-  ExtentSet extents;
+  ByteRanges extents;
   bool areAllKnown = true;  ///< false: more may be referred to than was found
 };
 

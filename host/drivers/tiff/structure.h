@@ -11,7 +11,7 @@
 #include <string>
 #include <vector>
 
-#include "host/drivers/tiff/positionedfile.h"
+#include "host/drivers/common/positionedfile.h"
 
 namespace orin::drivers {
 

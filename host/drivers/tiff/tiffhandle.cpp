@@ -13,6 +13,7 @@
 #include <sys/stat.h>
 #include <unistd.h>
 
+#include "host/drivers/common/descriptor.h"
 #include "host/services/exception.h"
 #include "host/services/text.h"
 
@@ -44,9 +45,7 @@ struct OptionsDeleter {
 
 /// A descriptor of our own tells a file that cannot be opened from one that cannot be understood.
 int OpenToRead(const std::string& path) {
-  int descriptor = -1;
-  do descriptor = open(path.c_str(), O_RDONLY | O_CLOEXEC);
-  while (descriptor < 0 && errno == EINTR);
+  const int descriptor = OpenDescriptor(path, O_RDONLY);
   if (descriptor < 0)
     throw OpenFailure(
         FormatString(_("%s: cannot be opened: %s."), path.c_str(), std::strerror(errno)));

@@ -10,9 +10,9 @@
 
 #include <tiff.h>
 
+#include "host/drivers/common/positionedfile.h"
 #include "host/drivers/tiff/gdalmetadata.h"
 #include "host/drivers/tiff/pixelreader.h"
-#include "host/drivers/tiff/positionedfile.h"
 #include "host/drivers/tiff/tiffmagic.h"
 #include "host/services/exception.h"
 #include "host/services/text.h"

@@ -2,12 +2,10 @@
 #include "host/drivers/tiff/tiledecoder.h"
 
 #include <algorithm>
-#include <cerrno>
 #include <cstring>
 #include <utility>
 
-#include <unistd.h>
-
+#include "host/drivers/common/descriptor.h"
 #include "host/drivers/tiff/samplebits.h"
 #include "host/drivers/tiff/sparsesample.h"
 #include "host/drivers/tiff/structure.h"
@@ -114,13 +112,9 @@ void TileDecoder::ReadRaw(uint32_t tile, uint64_t from, uint64_t count, uint8_t*
     Fail(tile, _("it holds fewer bytes than its pixels take"));
   if (start > tiff_.FileSize() || from + count > tiff_.FileSize() - start)
     Fail(tile, _("the file ends before it does"));
-  while (count > 0) {
-    const ssize_t got = pread(tiff_.Descriptor(), bytes, count, static_cast<off_t>(start + from));
-    if (got < 0 && errno == EINTR) continue;
-    if (got < 0) Fail(tile, std::strerror(errno));
-    if (got == 0) Fail(tile, _("the file ends before it does"));
-    bytes += got, from += static_cast<uint64_t>(got), count -= static_cast<uint64_t>(got);
-  }
+  const Transfer done = ReadAt(tiff_.Descriptor(), start + from, bytes, count);
+  if (done.error != 0) Fail(tile, std::strerror(done.error));
+  if (done.bytes < count) Fail(tile, _("the file ends before it does"));
 }
 
 void TileDecoder::Decode(uint32_t tile, uint8_t* samples) {

@@ -13,41 +13,6 @@ using drivers::ByteRanges;
 using drivers::FindHfaSpace;
 using drivers::HfaSpace;
 
-TEST(FreeBytes, ThatTouchAreOneRange) {
-  ByteRanges bytes;
-  bytes.Add(10, 20);
-  bytes.Add(30, 40);
-  bytes.Add(20, 30);
-  bytes.Add(5, 5);
-  EXPECT_EQ((std::map<uint64_t, uint64_t>{{10, 40}}), bytes.All());
-  EXPECT_TRUE(bytes.Has(10, 40));
-  EXPECT_FALSE(bytes.Has(9, 11));
-  EXPECT_TRUE(bytes.Touches(39, 50));
-  EXPECT_FALSE(bytes.Touches(40, 50));
-  EXPECT_FALSE(bytes.Touches(0, 10));
-  EXPECT_EQ(40u, bytes.End());
-}
-
-TEST(FreeBytes, AreSplitByWhatIsRemovedFromTheirMiddle) {
-  ByteRanges bytes;
-  bytes.Add(10, 40);
-  bytes.Remove(20, 25);
-  EXPECT_EQ((std::map<uint64_t, uint64_t>{{10, 20}, {25, 40}}), bytes.All());
-  EXPECT_EQ(25u, bytes.Size());
-  bytes.Remove(0, 100);
-  EXPECT_EQ(0u, bytes.End());
-}
-
-TEST(FreeBytes, AreTakenFromTheLowestRangeThatIsLargeEnough) {
-  ByteRanges bytes;
-  bytes.Add(10, 14);
-  bytes.Add(20, 30);
-  EXPECT_EQ(20u, bytes.TakeBefore(100, 5));
-  EXPECT_EQ(10u, bytes.TakeBefore(100, 4));
-  EXPECT_EQ(std::nullopt, bytes.TakeBefore(25, 5));
-  EXPECT_EQ(25u, bytes.TakeBefore(26, 5));
-}
-
 class HfaBytes : public GdalFiles {
  protected:
   HfaBytes() : file_(File("image.img")) {}
@@ -95,7 +60,7 @@ TEST_F(HfaBytes, BehindWhatIsUsedAreFree) {
   std::filesystem::resize_file(file_, size + 5000);
   const HfaSpace space = FindHfaSpace(file_, {});
   EXPECT_EQ(size, space.end);
-  EXPECT_TRUE(space.free.Has(size, size + 5000));
+  EXPECT_TRUE(space.free.Holds({size, size + 5000}));
 }
 
 TEST_F(HfaBytes, AreNeverFreeWhereAnUnknownNodeMayReferToThem) {

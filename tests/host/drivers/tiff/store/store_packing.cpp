@@ -13,8 +13,8 @@
 namespace orin::tests {
 namespace {
 
-using drivers::Extent;
-using drivers::ExtentSet;
+using drivers::ByteRange;
+using drivers::ByteRanges;
 using drivers::Joining;
 using drivers::kMarkerBytes;
 using drivers::kPointerBytes;
@@ -123,7 +123,7 @@ class Drawing {
     if (!move.room) {
       std::vector<std::pair<char, uint64_t>> levels;
       for (const size_t index : move.indices) {
-        const Extent place = places_.at(char('a' + index));
+        const ByteRange place = places_.at(char('a' + index));
         levels.emplace_back(char('a' + index), place.end - place.start);
         evacuated_ += place.end - place.start;
       }
@@ -132,7 +132,7 @@ class Drawing {
     }
     uint64_t at = move.room->start;
     for (const size_t index : move.indices) {
-      Extent& place = places_.at(char('a' + index));
+      ByteRange& place = places_.at(char('a' + index));
       ASSERT_GT(place.start, at) << "levels move down only";
       place = {at, at + (place.end - place.start)};
       at = place.end;
@@ -149,9 +149,9 @@ class Drawing {
   uint64_t size_ = kImageEnd;
   uint64_t evacuated_ = 0;
   std::vector<Stretch> stretches_;
-  std::map<char, Extent> places_;
+  std::map<char, ByteRange> places_;
   std::string pinned_;
-  ExtentSet foreign_;
+  ByteRanges foreign_;
 };
 
 constexpr uint64_t kBody = 1024 + kMarkerBytes;  // of a first stretch behind kImageEnd

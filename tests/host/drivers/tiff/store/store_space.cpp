@@ -7,13 +7,13 @@
 
 #include "host/drivers/tiff/ownspace.h"
 #include "host/services/exception.h"
-#include "tests/host/drivers/tiff/store/extentstext.h"
+#include "tests/host/drivers/common/byterangestext.h"
 #include "tests/host/drivers/tiff/store/storesupport.h"
 
 namespace orin::tests {
 namespace {
 
-using drivers::ExtentSet;
+using drivers::ByteRanges;
 using drivers::PositionedFile;
 
 const Layout kImage{
@@ -65,7 +65,7 @@ TEST_F(Space, OfTenRebuildsIsThatOfOne) {
 TEST_F(Space, OfAReplacedLevelStaysAsItIsWhileAnotherProgramHasTheFileOpen) {
   BuildAll();
   const auto before = BytesOf(file_);
-  ExtentSet mayChange;  // the link, the old level's validity, what the others know of the file
+  ByteRanges mayChange;  // the link, the old level's validity, what the others know of the file
   const auto link = LinkOfFirst(file_);
   mayChange.Add({link, link + 4});
   const auto valid = PlacesOf("ORIN_VALID\">111<");

@@ -6,7 +6,7 @@
 
 #include <sys/stat.h>
 
-namespace orin {
+namespace orin::drivers {
 
 /// "name (process 1234)" of the process whose lock on the file is in force; empty where the system
 /// does not tell.
@@ -18,4 +18,4 @@ std::string LockHolderOf(const struct stat& file);
 /// \param descriptor  of the file, open
 std::string LockedText(const std::string& path, int descriptor);
 
-}  // namespace orin
+}  // namespace orin::drivers

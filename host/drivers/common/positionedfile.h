@@ -9,7 +9,7 @@
 #include <mutex>
 #include <string>
 
-#include "host/services/filealone.h"
+#include "host/drivers/common/descriptor.h"
 
 namespace orin::drivers {
 
@@ -33,8 +33,13 @@ class PositionedFile {
   uint64_t Size() const;
   /// \throws orin::Exception  the bytes cannot be read, or the file ends before them
   void Read(uint64_t position, void* bytes, size_t count) const;
+  /// The same where a part will do, or a failure must not throw.
+  Transfer ReadUpTo(uint64_t position, void* bytes, size_t count) const noexcept {
+    return ReadAt(descriptor_, position, bytes, count);
+  }
   /// \throws orin::Exception  not all bytes could be written
   void Write(uint64_t position, const void* bytes, size_t count);
+  Transfer WriteUpTo(uint64_t position, const void* bytes, size_t count) noexcept;
   /// Returns when everything written is on the storage device.
   void Sync();
   void Truncate(uint64_t size);
@@ -55,10 +60,11 @@ class PositionedFile {
   /// Removes the file's name, durably.
   void Remove();
 
-  using Alone = orin::Alone;
+  enum class Alone { kDone, kOthersHaveItOpen, kCannotTell };
   /// Does `action` while nothing else has the file open, in this process or another, and nobody can
-  /// open it. \returns whether it was done, or why not
-  Alone DoAlone(const std::function<void()>& action) { return orin::DoAlone(descriptor_, action); }
+  /// open it. File systems that know no leases, and files of other owners, do not tell.
+  /// \returns whether it was done, or why not
+  Alone DoAlone(const std::function<void()>& action);
 
  private:
   int64_t Modified() const;

@@ -1,5 +1,5 @@
 // SPDX-License-Identifier: MIT
-#include "host/services/lockholder.h"
+#include "host/drivers/common/lockholder.h"
 
 #include <cstdio>
 #include <fstream>
@@ -9,7 +9,7 @@
 
 #include "host/services/text.h"
 
-namespace orin {
+namespace orin::drivers {
 namespace {
 
 /// The line's process when it tells of a lock of that file in force; else 0. Such a line reads
@@ -59,4 +59,4 @@ std::string LockedText(const std::string& path, int descriptor) {
                             path.c_str(), holder.c_str());
 }
 
-}  // namespace orin
+}  // namespace orin::drivers

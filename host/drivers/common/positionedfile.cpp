@@ -1,7 +1,8 @@
 // SPDX-License-Identifier: MIT
-#include "host/drivers/tiff/positionedfile.h"
+#include "host/drivers/common/positionedfile.h"
 
 #include <cerrno>
+#include <csignal>
 #include <cstdio>
 #include <cstring>
 #include <filesystem>
@@ -12,8 +13,8 @@
 #include <sys/stat.h>
 #include <unistd.h>
 
+#include "host/drivers/common/lockholder.h"
 #include "host/services/exception.h"
-#include "host/services/lockholder.h"
 #include "host/services/text.h"
 
 namespace orin::drivers {
@@ -22,7 +23,7 @@ namespace {
 /// \param format  takes the file's name, then the reason
 [[noreturn]] void Fail(const char* format, const std::string& path, const char* reason,
                        const char* function) {
-  throw Exception(FormatString(format, path.c_str(), reason), "host/drivers/tiff/positionedfile",
+  throw Exception(FormatString(format, path.c_str(), reason), "host/drivers/common/positionedfile",
                   function, 0);
 }
 
@@ -44,20 +45,6 @@ int FlagsOf(PositionedFile::Mode mode) {
   return O_RDWR | O_CREAT;
 }
 
-/// The call's answer, once no signal interrupts it.
-int Repeated(const auto& call) {
-  int answer = call();
-  while (answer != 0 && errno == EINTR) answer = call();
-  return answer;
-}
-
-/// A descriptor, or -1.
-int Open(const std::string& path, int flags) {
-  int descriptor = open(path.c_str(), flags | O_CLOEXEC, 0666);
-  while (descriptor < 0 && errno == EINTR) descriptor = open(path.c_str(), flags | O_CLOEXEC, 0666);
-  return descriptor;
-}
-
 bool HasNoLocks(int error) {
   return error == ENOLCK || error == ENOSYS || error == EOPNOTSUPP || error == EINVAL;
 }
@@ -65,7 +52,7 @@ bool HasNoLocks(int error) {
 /// Makes the names in the folder durable; not every file system lets them be.
 void SyncFolderOf(const std::string& path) {
   const std::string folder = std::filesystem::path(path).parent_path().string();
-  const int directory = Open(folder.empty() ? "." : folder, O_RDONLY | O_DIRECTORY);
+  const int directory = OpenDescriptor(folder.empty() ? "." : folder, O_RDONLY | O_DIRECTORY);
   if (directory < 0) return;
   fsync(directory);
   close(directory);
@@ -74,7 +61,7 @@ void SyncFolderOf(const std::string& path) {
 }  // namespace
 
 PositionedFile::PositionedFile(std::string path, Mode mode)
-    : path_(std::move(path)), descriptor_(Open(path_, FlagsOf(mode))) {
+    : path_(std::move(path)), descriptor_(OpenDescriptor(path_, FlagsOf(mode))) {
   if (descriptor_ < 0)
     Fail(mode == Mode::kRead ? _("%s: cannot be opened: %s.")
                              : _("%s: cannot be opened for writing: %s."),
@@ -89,10 +76,10 @@ void PositionedFile::Lock() {
   const auto lock = [this] { return flock(descriptor_, LOCK_EX | LOCK_NB); };
   struct stat own {};
   struct stat named {};
-  if (Repeated(lock) != 0 && !HasNoLocks(errno)) {  // no locks are no reason to refuse work
+  if (Uninterrupted(lock) != 0 && !HasNoLocks(errno)) {  // no locks are no reason to refuse work
     if (errno != EWOULDBLOCK)
       Fail(_("%s: cannot be locked: %s."), path_, std::strerror(errno), kFunction);
-    throw Exception(LockedText(path_, descriptor_), "host/drivers/tiff/positionedfile", kFunction,
+    throw Exception(LockedText(path_, descriptor_), "host/drivers/common/positionedfile", kFunction,
                     0);
   }
   const bool isNamed = fstat(descriptor_, &own) == 0 && stat(path_.c_str(), &named) == 0 &&
@@ -100,7 +87,7 @@ void PositionedFile::Lock() {
   if (!isNamed)
     throw Exception(
         FormatString(_("%s: was replaced by another program just now. Run again."), path_.c_str()),
-        "host/drivers/tiff/positionedfile", kFunction, 0);
+        "host/drivers/common/positionedfile", kFunction, 0);
 }
 
 uint64_t PositionedFile::Size() const {
@@ -113,34 +100,26 @@ uint64_t PositionedFile::Size() const {
 
 void PositionedFile::Read(uint64_t position, void* bytes, size_t count) const {
   constexpr char kFunction[] = "PositionedFile::Read(uint64_t, void*, size_t) const";
-  auto* to = static_cast<uint8_t*>(bytes);
-  while (count > 0) {
-    const ssize_t got = pread(descriptor_, to, count, static_cast<off_t>(position));
-    if (got < 0 && errno == EINTR) continue;
-    if (got < 0) Fail(_("%s: cannot be read: %s."), path_, std::strerror(errno), kFunction);
-    if (got == 0)
-      Fail(_("%s: cannot be read: %s."), path_, _("the file ends too early"), kFunction);
-    to += got;
-    position += static_cast<uint64_t>(got);
-    count -= static_cast<size_t>(got);
-  }
+  const Transfer done = ReadUpTo(position, bytes, count);
+  if (done.error != 0)
+    Fail(_("%s: cannot be read: %s."), path_, std::strerror(done.error), kFunction);
+  if (done.bytes < count)
+    Fail(_("%s: cannot be read: %s."), path_, _("the file ends too early"), kFunction);
 }
 
 void PositionedFile::Write(uint64_t position, const void* bytes, size_t count) {
-  constexpr char kFunction[] = "PositionedFile::Write(uint64_t, const void*, size_t)";
+  const Transfer done = WriteUpTo(position, bytes, count);
+  if (done.error != 0)
+    Fail(_(kCannotWrite), path_, std::strerror(done.error),
+         "PositionedFile::Write(uint64_t, const void*, size_t)");
+}
+
+Transfer PositionedFile::WriteUpTo(uint64_t position, const void* bytes, size_t count) noexcept {
   const std::lock_guard lock(mutex_);
   NoteTouch();
-  const auto* from = static_cast<const uint8_t*>(bytes);
-  while (count > 0) {
-    const ssize_t put = pwrite(descriptor_, from, count, static_cast<off_t>(position));
-    if (put < 0 && errno == EINTR) continue;
-    if (put < 0) Fail(_(kCannotWrite), path_, std::strerror(errno), kFunction);
-    if (put == 0) Fail(_(kCannotWrite), path_, std::strerror(ENOSPC), kFunction);
-    from += put;
-    position += static_cast<uint64_t>(put);
-    count -= static_cast<size_t>(put);
-  }
+  const Transfer done = WriteAt(descriptor_, position, bytes, count);
   lastModified_ = Modified();
+  return done;
 }
 
 int64_t PositionedFile::Modified() const {
@@ -161,14 +140,14 @@ bool PositionedFile::TakeWasTouched() {
 }
 
 void PositionedFile::Sync() {
-  if (Repeated([this] { return fsync(descriptor_); }) != 0)
+  if (Uninterrupted([this] { return fsync(descriptor_); }) != 0)
     Fail(_(kCannotWrite), path_, std::strerror(errno), "PositionedFile::Sync()");
 }
 
 void PositionedFile::Truncate(uint64_t size) {
   const std::lock_guard lock(mutex_);
   NoteTouch();
-  if (Repeated([&] { return ftruncate(descriptor_, static_cast<off_t>(size)); }) != 0)
+  if (Uninterrupted([&] { return ftruncate(descriptor_, static_cast<off_t>(size)); }) != 0)
     Fail(_("%s: cannot be shortened: %s."), path_, std::strerror(errno),
          "PositionedFile::Truncate(uint64_t)");
   lastModified_ = Modified();
@@ -186,6 +165,20 @@ int64_t PositionedFile::SetModified(int64_t nanoseconds) {
   futimens(descriptor_, times);  // refused to those who do not own the file
   lastModified_ = Modified();
   return lastModified_;
+}
+
+PositionedFile::Alone PositionedFile::DoAlone(const std::function<void()>& action) {
+  // Who opens the file meanwhile waits, and the system announces it by a signal: by one that is
+  // ignored where nobody asked for it, not by the usual one, which ends the process.
+  if (fcntl(descriptor_, F_SETSIG, SIGURG) != 0) return Alone::kCannotTell;
+  if (fcntl(descriptor_, F_SETLEASE, F_WRLCK) != 0)
+    return errno == EAGAIN ? Alone::kOthersHaveItOpen : Alone::kCannotTell;
+  const struct Release {
+    int descriptor;
+    ~Release() { fcntl(descriptor, F_SETLEASE, F_UNLCK); }
+  } release{descriptor_};
+  action();
+  return Alone::kDone;
 }
 
 void PositionedFile::Rename(const std::string& path) {
