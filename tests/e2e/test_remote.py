@@ -77,6 +77,7 @@ class Remote(Case):
         gdal.Translate(virtual, self.url + "image.tif")
         self.assertRan(run("build", virtual, "--levels", "2", "--method", "nearest"))
         self.assertSamePixels(nearest(pixels, 1, 2, (400, 300)), read_pixels(virtual, 0))
+        self.assertEqual(["unverified"], [level["state"] for level in info(virtual)["levels"]])
 
     def test_what_is_not_there_is_refused(self):
         answer = run("info", self.url + "other.tif")

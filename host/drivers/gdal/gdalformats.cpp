@@ -10,6 +10,7 @@
 
 #include "host/drivers/gdal/gdalerrors.h"
 #include "host/drivers/gdal/rasternames.h"
+#include "host/drivers/gdal/specialfiles.h"
 
 namespace orin::drivers {
 namespace {
@@ -44,6 +45,7 @@ void RegisterGdalFormats() {
 
 const GdalFormat* IdentifyGdalFormat(const std::string& name) {
   if (!IsRegularFile(name) && !IsLibraryName(name)) return nullptr;
+  if (!SpecialFiles().Beside(name).empty()) return nullptr;
   const GdalErrors quiet;
   const auto allowed = OpeningDrivers();
   GDALDriverH driver = GDALIdentifyDriverEx(name.c_str(), GDAL_OF_RASTER, allowed.data(), nullptr);

@@ -1,7 +1,6 @@
 // SPDX-License-Identifier: MIT
 #include "host/drivers/gdal/gdalwatch.h"
 
-#include <filesystem>
 #include <stop_token>
 #include <string>
 #include <string_view>
@@ -9,9 +8,11 @@
 #include <vector>
 
 #include "host/datasources/fingerprint.h"
-#include "host/datasources/vrtsources.h"
 #include "host/drivers/gdal/gdalreader.h"
+#include "host/drivers/gdal/pixelfiles.h"
 #include "host/drivers/gdal/rasternames.h"
+#include "host/drivers/gdal/rawlayout.h"
+#include "host/drivers/gdal/vrtsources.h"
 
 namespace orin::drivers {
 namespace {
@@ -19,26 +20,19 @@ namespace {
 using datasources::Fingerprinter;
 using datasources::ImageWatch;
 
-/// Files of the same name with another extension that hold pixels, or where they are.
-constexpr std::pair<std::string_view, std::string_view> kPixelFiles[] = {
-    {"HFA", ".ige"}, {"RRASTER", ".gri"}, {"MRF", ".idx"}, {"MRF", ".ppg"}, {"MRF", ".pjg"},
-    {"MRF", ".pzp"}, {"MRF", ".lrc"},     {"MRF", ".pzs"}, {"MRF", ".til"}, {"MRF", ".ptf"}};
-
-std::vector<std::string> PixelFilesBeside(const std::string& name, std::string_view driver) {
-  std::vector<std::string> files;
-  for (const auto& [format, extension] : kPixelFiles) {
-    const auto file = std::filesystem::path(name).replace_extension(extension);
-    std::error_code none;
-    if (format == driver && file != name && std::filesystem::exists(file, none))
-      files.push_back(file.string());
-  }
-  return files;
-}
-
 std::string FingerprintOfFiles(const std::vector<std::string>& files, const std::stop_token& stop) {
   if (files.size() == 1) return datasources::FingerprintOfFile(files.front(), stop);
   Fingerprinter all;
   for (const std::string& file : files) all.AddText(datasources::FingerprintOfFile(file, stop));
+  return stop.stop_requested() ? "" : all.Text();
+}
+
+/// With the header that tells how they are to be read.
+std::string FingerprintOfRaw(const std::string& name, const GdalFormat& format,
+                             const std::vector<std::string>& files, const std::stop_token& stop) {
+  Fingerprinter all;
+  all.AddText(FingerprintOfFiles(files, stop));
+  all.AddText(RawLayoutOf(GdalHandle(name, format), format));
   return stop.stop_requested() ? "" : all.Text();
 }
 
@@ -60,10 +54,11 @@ std::shared_ptr<ImageWatch> WatchOf(const GdalHandle& handle, const GdalFormat& 
   const std::string name = handle.Name();
   if (!IsRegularFile(name)) return nullptr;
   const std::string_view driver = format.driver;
-  if (driver == "VRT")
+  if (driver == "VRT") {
     return std::make_shared<ImageWatch>(
-        name, [name](const std::stop_token&) { return datasources::FingerprintOfVrt(name); },
-        datasources::SourcesOfVrt(name));
+        name, [name, &format](const std::stop_token&) { return FingerprintOfVrt(name, format); },
+        SourcesOfVrt(handle).files);
+  }
   std::vector<std::string> others = PixelFilesBeside(name, driver);
   if (driver == "HFA") {
     const auto channels = static_cast<unsigned>(GDALGetRasterCount(handle.Get()));
@@ -76,8 +71,14 @@ std::shared_ptr<ImageWatch> WatchOf(const GdalHandle& handle, const GdalFormat& 
   }
   std::vector<std::string> all = {name};
   all.insert(all.end(), others.begin(), others.end());
+  const std::vector<std::string> headers = HeadersBeside(name, driver);
+  others.insert(others.end(), headers.begin(), headers.end());
+  const bool isRaw = !headers.empty();
   return std::make_shared<ImageWatch>(
-      name, [all](const std::stop_token& stop) { return FingerprintOfFiles(all, stop); },
+      name,
+      [name, all, isRaw, &format](const std::stop_token& stop) {
+        return isRaw ? FingerprintOfRaw(name, format, all, stop) : FingerprintOfFiles(all, stop);
+      },
       std::move(others));
 }
 

@@ -11,6 +11,7 @@
 #include "host/drivers/gdal/gdalformats.h"
 #include "host/drivers/gdal/gdalsource.h"
 #include "host/drivers/gdal/rasternames.h"
+#include "host/drivers/gdal/specialfiles.h"
 #include "host/services/exception.h"
 #include "host/services/text.h"
 
@@ -39,6 +40,11 @@ class ReadingDriver final : public datasources::IFormatDriver {
     return format ? format->code : kFormatUnknown;
   }
 
+  std::string WhyUnrecognised(const std::string& file) const override {
+    const std::string special = SpecialFiles().Beside(file);
+    return special.empty() ? "" : SpecialFileText(file, special);
+  }
+
   std::unique_ptr<datasources::IRasterSource> Open(const std::string& file,
                                                    datasources::AccessMode access) override {
     return OpenFor(file, access == datasources::kUpdate ? SourceUse::kUpdate : SourceUse::kRead);
@@ -57,6 +63,9 @@ class ReadingDriver final : public datasources::IFormatDriver {
     if (!format)
       throw Exception(FormatString(_("%s: is not a raster file of a known format."), file.c_str()),
                       "host/drivers/gdal/readingdriver", "ReadingDriver::Open", 0);
+    if (const std::string special = SpecialFileOf(file); !special.empty())
+      throw Exception(SpecialFileText(file, special), "host/drivers/gdal/readingdriver",
+                      "ReadingDriver::Open", 0);
     return std::make_unique<GdalSource>(file, *format, use);
   }
 };

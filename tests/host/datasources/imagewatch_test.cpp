@@ -14,7 +14,6 @@
 #include <thread>
 
 #include "host/datasources/fingerprint.h"
-#include "host/datasources/vrtsources.h"
 
 namespace orin::datasources {
 namespace {
@@ -172,27 +171,6 @@ TEST_F(Watched, ExternalMaskBelongsToTheImage) {
   SetTime("image.msk", 2000);
   EXPECT_NE(with, *watch.Stamp());
   EXPECT_NE(fingerprint, watch.Fingerprint(*watch.Stamp()));
-}
-
-TEST_F(Watched, VirtualRasterIsItsTextAndTheStateOfItsSources) {
-  Write("a.vrt", R"(<VRTDataset><SourceFilename relativeToVRT="1">b&amp;c.tif</SourceFilename>
-      <SourceFilename relativeToVRT="1" shared="0">inner.vrt</SourceFilename>
-      <SourceFilename relativeToVRT="0">/absent/d.tif</SourceFilename>
-      <SourceFilename relativeToVRT="1">b&amp;c.tif</SourceFilename></VRTDataset>)");
-  Write("inner.vrt", R"(<SourceFilename relativeToVRT="1">image</SourceFilename>
-      <SourceFilename relativeToVRT="1">a.vrt</SourceFilename>)");
-  Write("b&c.tif", "source");
-  EXPECT_EQ((std::vector<std::string>{Path("b&c.tif"), Path("inner.vrt"), "/absent/d.tif",
-                                      Path("image")}),
-            SourcesOfVrt(Path("a.vrt")));
-  const std::string before = FingerprintOfVrt(Path("a.vrt"));
-  SetTime("a.vrt", 1000);
-  EXPECT_EQ(before, FingerprintOfVrt(Path("a.vrt")));
-  SetTime("image", 1000);
-  const std::string after = FingerprintOfVrt(Path("a.vrt"));
-  EXPECT_NE(before, after);
-  Write("a.vrt", "<VRTDataset><SourceFilename>");
-  EXPECT_EQ(std::vector<std::string>(), SourcesOfVrt(Path("a.vrt")));
 }
 
 TEST_F(Watched, CompanionsBelongToWhatTheImageShows) {
