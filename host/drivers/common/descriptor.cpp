@@ -6,8 +6,8 @@
 
 namespace orin::drivers {
 
-int OpenDescriptor(const std::string& path, int flags) {
-  return Uninterrupted([&] { return open(path.c_str(), flags | O_CLOEXEC, 0666); });
+int OpenDescriptor(const std::string& path, int flags, unsigned mode) {
+  return Uninterrupted([&] { return open(path.c_str(), flags | O_CLOEXEC, mode_t(mode)); });
 }
 
 Transfer ReadAt(int descriptor, uint64_t position, void* bytes, size_t count) noexcept {

@@ -20,7 +20,8 @@ auto Uninterrupted(const Call& call) {
 
 /// A descriptor that programs started from this one do not inherit; -1, and `errno` says why.
 /// \param flags  of `open`
-int OpenDescriptor(const std::string& path, int flags);
+/// \param mode   of a file that is made
+int OpenDescriptor(const std::string& path, int flags, unsigned mode = 0);
 
 struct Transfer {
   size_t bytes = 0;  ///< that were read or written

@@ -29,6 +29,12 @@ namespace {
 
 constexpr int64_t kSecond = 1000000000;  // nanoseconds
 
+const char* IsLink() {
+  return _(
+      "%s: is a link, or no regular file; nothing is written through it. Delete it, or move it "
+      "away, and run again.");
+}
+
 constexpr char kCannotWrite[] =
     "%s: cannot be written: %s. Free space or change the permissions, "
     "then run again.";
@@ -39,10 +45,15 @@ int FlagsOf(PositionedFile::Mode mode) {
       return O_RDONLY | O_NONBLOCK;  // a pipe of that name must not keep its reader waiting
     case PositionedFile::Mode::kUpdate:
       return O_RDWR;
-    case PositionedFile::Mode::kCreate:
+    case PositionedFile::Mode::kUpdateUnlinked:
       break;
   }
-  return O_RDWR | O_CREAT;
+  return O_RDWR | O_NOFOLLOW | O_NONBLOCK;
+}
+
+const char* CannotOpen(PositionedFile::Mode mode) {
+  return mode == PositionedFile::Mode::kRead ? _("%s: cannot be opened: %s.")
+                                             : _("%s: cannot be opened for writing: %s.");
 }
 
 bool HasNoLocks(int error) {
@@ -60,16 +71,52 @@ void SyncFolderOf(const std::string& path) {
 
 }  // namespace
 
-PositionedFile::PositionedFile(std::string path, Mode mode)
-    : path_(std::move(path)), descriptor_(OpenDescriptor(path_, FlagsOf(mode))) {
-  if (descriptor_ < 0)
-    Fail(mode == Mode::kRead ? _("%s: cannot be opened: %s.")
-                             : _("%s: cannot be opened for writing: %s."),
-         path_, std::strerror(errno), "PositionedFile::PositionedFile(std::string, Mode)");
-  lastModified_ = Modified();
+PositionedFile::PositionedFile(std::string path, int descriptor)
+    : path_(std::move(path)), descriptor_(descriptor) {
+  if (descriptor_ >= 0) lastModified_ = Modified();
 }
 
-PositionedFile::~PositionedFile() { close(descriptor_); }
+PositionedFile::PositionedFile(std::string path, Mode mode)
+    : PositionedFile(path, OpenDescriptor(path, FlagsOf(mode))) {
+  constexpr char kFunction[] = "PositionedFile::PositionedFile(std::string, Mode)";
+  const bool isUnlinked = mode == Mode::kUpdateUnlinked;
+  if (descriptor_ < 0 && isUnlinked && (errno == ELOOP || errno == EISDIR))
+    Fail(IsLink(), path_, "", kFunction);
+  if (descriptor_ < 0) Fail(CannotOpen(mode), path_, std::strerror(errno), kFunction);
+  if (isUnlinked) RequireUnlinked();
+}
+
+std::unique_ptr<PositionedFile> PositionedFile::Make(const std::string& path,
+                                                     const FileAccess& access) {
+  const int descriptor =
+      OpenDescriptor(path, O_RDWR | O_CREAT | O_EXCL | O_NOFOLLOW, access.ModeToBeginWith());
+  if (descriptor < 0)
+    Fail(CannotOpen(Mode::kUpdate), path, std::strerror(errno),
+         "PositionedFile::Make(const std::string&, const FileAccess&)");
+  access.ApplyTo(descriptor);
+  return std::unique_ptr<PositionedFile>(new PositionedFile(path, descriptor));
+}
+
+PositionedFile::~PositionedFile() {
+  if (descriptor_ >= 0) close(descriptor_);
+}
+
+/// \pre the destructor runs when this throws
+void PositionedFile::RequireUnlinked() const {
+  struct stat status {};
+  if (fstat(descriptor_, &status) != 0 || !S_ISREG(status.st_mode) || status.st_nlink != 1)
+    Fail(IsLink(), path_, "", "PositionedFile::RequireUnlinked() const");
+}
+
+bool PositionedFile::IsOwn() const {
+  struct stat status {};
+  return fstat(descriptor_, &status) == 0 && status.st_uid == geteuid();
+}
+
+bool PositionedFile::IsReadableAs(const FileAccess& access) const {
+  struct stat status {};
+  return fstat(descriptor_, &status) == 0 && access.LetsRead(status.st_uid, status.st_gid);
+}
 
 void PositionedFile::Lock() {
   constexpr char kFunction[] = "PositionedFile::Lock()";

@@ -6,10 +6,12 @@
 #include <cstddef>
 #include <cstdint>
 #include <functional>
+#include <memory>
 #include <mutex>
 #include <string>
 
 #include "host/drivers/common/descriptor.h"
+#include "host/drivers/common/fileaccess.h"
 
 namespace orin::drivers {
 
@@ -19,11 +21,17 @@ class PositionedFile {
   enum class Mode {
     kRead,
     kUpdate,
-    kCreate  ///< made when it is not there
+    /// The same, but for a name that nobody gave to this program: a regular file that has no other
+    /// name. Somebody may have planted a link to a file that they cannot write.
+    kUpdateUnlinked
   };
 
   /// \throws orin::Exception  it cannot be opened in that mode
   PositionedFile(std::string path, Mode mode);
+  /// Makes a file, for update, where nothing bears the name, be it a link that leads nowhere.
+  /// Nobody has access to it who does not have `access`.
+  /// \throws orin::Exception  it cannot be made
+  static std::unique_ptr<PositionedFile> Make(const std::string& path, const FileAccess& access);
   ~PositionedFile();
   PositionedFile(const PositionedFile&) = delete;
   PositionedFile& operator=(const PositionedFile&) = delete;
@@ -31,6 +39,10 @@ class PositionedFile {
   const std::string& Path() const { return path_; }
   /// Bytes.
   uint64_t Size() const;
+  /// Whether the file belongs to the user of this process.
+  bool IsOwn() const;
+  /// Whether the file's owner may read, by what `access` says, all that is written to it.
+  bool IsReadableAs(const FileAccess& access) const;
   /// \throws orin::Exception  the bytes cannot be read, or the file ends before them
   void Read(uint64_t position, void* bytes, size_t count) const;
   /// The same where a part will do, or a failure must not throw.
@@ -67,6 +79,8 @@ class PositionedFile {
   Alone DoAlone(const std::function<void()>& action);
 
  private:
+  PositionedFile(std::string path, int descriptor);
+  void RequireUnlinked() const;
   int64_t Modified() const;
   void NoteTouch();
 

@@ -43,6 +43,23 @@ bool IsStartOfSideCar(const std::vector<uint8_t>& start) {
   return std::count(start.begin(), start.end(), 0) == std::ptrdiff_t(start.size());
 }
 
+/// Also for a link that leads nowhere.
+bool IsThere(const std::string& path) {
+  std::error_code ignored;
+  return std::filesystem::exists(std::filesystem::symlink_status(path, ignored));
+}
+
+[[noreturn]] void Refuse(const char* format, const std::string& path) {
+  throw Exception(FormatString(format, path.c_str()), "host/drivers/tiff/levelfile", "LevelFile",
+                  0);
+}
+
+[[noreturn]] void RefuseForeign(const std::string& path) {
+  Refuse(_("%s: belongs to another user, who could read what is written to it. Delete it, or move "
+           "it away, and run again."),
+         path);
+}
+
 }  // namespace
 
 LevelFile::LevelFile(std::string path, bool mayChange)
@@ -56,15 +73,26 @@ LevelFile::LevelFile(std::string path, bool mayChange)
   structure_ = ParseStructure(*file_);
 }
 
-std::unique_ptr<LevelFile> LevelFile::NotYetMade(std::string path) {
-  std::unique_ptr<LevelFile> file(new LevelFile());
+std::unique_ptr<LevelFile> LevelFile::Beside(const std::string& imageFile, std::string path) {
+  const bool isThere = IsThere(path);
+  std::unique_ptr<LevelFile> file(isThere ? new LevelFile(path, true) : new LevelFile());
   file->path_ = std::move(path);
+  file->access_ = FileAccess::Of(imageFile);
   file->mayChange_ = true;
   return file;
 }
 
 void LevelFile::Refresh() {
   if (isMade_) structure_ = ParseStructure(*file_);
+}
+
+std::unique_ptr<PositionedFile> LevelFile::OpenLocked() const {
+  using Mode = PositionedFile::Mode;
+  auto file =
+      std::make_unique<PositionedFile>(path_, access_ ? Mode::kUpdateUnlinked : Mode::kUpdate);
+  if (access_ && !file->IsReadableAs(*access_)) RefuseForeign(path_);
+  file->Lock();
+  return file;
 }
 
 void LevelFile::OpenForChange() {
@@ -74,9 +102,7 @@ void LevelFile::OpenForChange() {
         FormatString(_("%s: is open for reading only; no level can be written."), path_.c_str()),
         "host/drivers/tiff/levelfile", "LevelFile::OpenForChange()", 0);
   if (isMade_) {
-    auto changed = std::make_unique<PositionedFile>(path_, PositionedFile::Mode::kUpdate);
-    changed->Lock();
-    file_ = std::move(changed);
+    file_ = OpenLocked();
     const std::vector<uint64_t> known = OffsetsIn(structure_);
     Refresh();  // another program may have changed the chain before
     mayReuse_ = mayReuse_ && OffsetsIn(structure_) == known;
@@ -93,30 +119,36 @@ void LevelFile::StartAppending() {
       std::make_unique<Appender>(*file_, structure_.isBig, structure_.byteOrder, std::move(space));
 }
 
-/// What bears the name already was begun by this program: it has the first marker, or nothing but a
-/// header without a directory.
-void LevelFile::RequireOursOrNew(const PositionedFile& partial) const {
-  std::vector<uint8_t> start(std::min<uint64_t>(partial.Size(), 2 * kMarkerBytes));
-  partial.Read(0, start.data(), start.size());
+/// What bears the name of a file that is being made, locked; null when there is nothing. It was
+/// begun by this program for this user: it has the first marker, or nothing but a header without a
+/// directory.
+/// \throws orin::Exception  it is something else
+std::unique_ptr<PositionedFile> LevelFile::OpenUnfinished() const {
+  const std::string path = path_ + kPartial;
+  if (!IsThere(path)) return nullptr;
+  auto partial = std::make_unique<PositionedFile>(path, PositionedFile::Mode::kUpdateUnlinked);
+  if (!partial->IsOwn()) RefuseForeign(path);
+  partial->Lock();
+  std::vector<uint8_t> start(std::min<uint64_t>(partial->Size(), 2 * kMarkerBytes));
+  partial->Read(0, start.data(), start.size());
   start.resize(2 * kMarkerBytes);
-  if (!IsStartOfSideCar(start) && !ReadMarker(partial, kMarkerBytes))
-    throw Exception(FormatString(_("%s: is no side-car that a build left behind. Delete it, or "
-                                   "move it away, and run again."),
-                                 partial.Path().c_str()),
-                    "host/drivers/tiff/levelfile", "LevelFile::Make()", 0);
+  if (!IsStartOfSideCar(start) && !ReadMarker(*partial, kMarkerBytes))
+    Refuse(_("%s: is no side-car that a build left behind. Delete it, or move it away, and run "
+             "again."),
+           path);
+  return partial;
 }
 
+/// What a build that was killed left behind is not written over: others may have it open.
 void LevelFile::Make() {
-  auto made = std::make_unique<PositionedFile>(path_ + kPartial, PositionedFile::Mode::kCreate);
+  if (IsThere(path_)) Refuse(_("%s: was made by another program just now. Run again."), path_);
+  if (const auto unfinished = OpenUnfinished()) unfinished->Remove();
+  auto made = PositionedFile::Make(path_ + kPartial, *access_);
   made->Lock();
-  RequireOursOrNew(*made);
-  if (std::error_code ignored; std::filesystem::exists(path_, ignored)) {
+  if (IsThere(path_)) {
     made->Remove();
-    throw Exception(
-        FormatString(_("%s: was made by another program just now. Run again."), path_.c_str()),
-        "host/drivers/tiff/levelfile", "LevelFile::Make()", 0);
+    Refuse(_("%s: was made by another program just now. Run again."), path_);
   }
-  made->Truncate(0);  // what a build that was killed left behind
   file_ = std::move(made);
   const std::vector<uint8_t> header = EmptyHeader(structure_);
   file_->Write(0, header.data(), header.size());
@@ -201,12 +233,8 @@ void LevelFile::Delete() {
 }
 
 void LevelFile::DeleteUnfinished() {
-  std::error_code ignored;
-  if (isMade_ || file_ || !std::filesystem::exists(path_ + kPartial, ignored)) return;
-  PositionedFile partial(path_ + kPartial, PositionedFile::Mode::kUpdate);
-  partial.Lock();
-  RequireOursOrNew(partial);
-  partial.Remove();
+  if (isMade_ || file_) return;
+  if (const auto unfinished = OpenUnfinished()) unfinished->Remove();
 }
 
 void LevelFile::Relink(uint64_t position, uint64_t offset) {

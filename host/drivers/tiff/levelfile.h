@@ -4,6 +4,7 @@
 
 #include <cstdint>
 #include <memory>
+#include <optional>
 #include <string>
 #include <vector>
 
@@ -16,14 +17,17 @@
 namespace orin::drivers {
 
 /// Opened for writing by the first change only. A file that is made bears the name `PATH.partial`
-/// until its first directory is linked. What a build that was killed left of such a file is written
-/// over.
+/// until its first directory is linked. What a build that was killed left of such a file is
+/// deleted.
 class LevelFile {
  public:
-  /// A file that is there. \throws orin::Exception  it cannot be read as TIFF
+  /// A file that is there, and that somebody named to be changed.
+  /// \throws orin::Exception  it cannot be read as TIFF
   LevelFile(std::string path, bool mayChange);
-  /// A file to be made: a classic TIFF unless it becomes big.
-  static std::unique_ptr<LevelFile> NotYetMade(std::string path);
+  /// A file beside an image. Where it is not there it will be made with the image's access: a
+  /// classic TIFF unless it becomes big. A link in its place is read, but not written through.
+  /// \throws orin::Exception  it is there and cannot be read as TIFF
+  static std::unique_ptr<LevelFile> Beside(const std::string& imageFile, std::string path);
 
   /// The file's name, the final one.
   const std::string& Path() const { return path_; }
@@ -41,6 +45,10 @@ class LevelFile {
   }
   /// Reads the structure again.
   void Refresh();
+
+  /// The existing file once more, locked, to change it beside this object.
+  /// \throws orin::Exception  it cannot be opened for writing, or must not be written
+  std::unique_ptr<PositionedFile> OpenLocked() const;
 
   /// Ready to append. \throws orin::Exception  the file cannot be opened for writing, or not be
   /// made
@@ -94,9 +102,10 @@ class LevelFile {
   bool PackOnce(uint64_t& evacuated);
   void Pack();
   void Shorten(const OwnSpace& space, uint64_t end);
-  void RequireOursOrNew(const PositionedFile& partial) const;
+  std::unique_ptr<PositionedFile> OpenUnfinished() const;
 
   std::string path_;
+  std::optional<FileAccess> access_;  ///< of the image that the file stands beside
   bool mayChange_ = false;
   bool isMade_ = false;
   bool mayReuse_ = false;  ///< nobody reads what the file does not refer to

@@ -113,19 +113,18 @@ uint64_t StampPosition(const StoredLevel& level) {
   return level.imagePosition + datasources::kImageRecordLength - datasources::kImageStampLength;
 }
 
-void RestampLevels(const std::string& path, const std::vector<const StoredLevel*>& levels,
+void RestampLevels(const LevelFile& levelFile, const std::vector<const StoredLevel*>& levels,
                    const ImageStamp& stamp, bool isInImage) noexcept {
   try {
-    PositionedFile file(path, PositionedFile::Mode::kUpdate);
-    file.Lock();
+    const auto file = levelFile.OpenLocked();
     for (const StoredLevel* level : levels) {
       std::string there(datasources::kImageRecordLength, '\0');
-      file.Read(level->imagePosition, there.data(), there.size());
+      file->Read(level->imagePosition, there.data(), there.size());
       if (datasources::ParseImageRecord(there) != level->metadata.image) continue;
       const std::string text = TextOf(stamp);
-      file.Write(StampPosition(*level), text.data(), text.size());
+      file->Write(StampPosition(*level), text.data(), text.size());
     }
-    if (isInImage) file.SetModified(stamp.modified);
+    if (isInImage) file->SetModified(stamp.modified);
   } catch (const std::exception&) {
     // deliberate: a file that cannot be written, or is being written, is no failure of a question
   }

@@ -10,6 +10,7 @@
 #include "host/datasources/imagewatch.h"
 #include "host/datasources/overviewinfo.h"
 #include "host/drivers/tiff/leveldirectories.h"
+#include "host/drivers/tiff/levelfile.h"
 
 namespace orin::drivers {
 
@@ -70,7 +71,7 @@ class LevelFreshness {
 /// Writes `stamp` over what the levels remember, as long as they stand where they stood; the time
 /// of a file that is the image itself stays what it is. Fails quietly: then the next answer
 /// reads the image again.
-void RestampLevels(const std::string& path, const std::vector<const StoredLevel*>& levels,
+void RestampLevels(const LevelFile& levelFile, const std::vector<const StoredLevel*>& levels,
                    const datasources::ImageStamp& stamp, bool isInImage) noexcept;
 
 /// Where in the file the part of a level's record stands that is its stamp.

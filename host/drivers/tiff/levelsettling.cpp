@@ -77,7 +77,7 @@ void TiffLevelStore::Keep(const LevelFreshness::Judgement& judgement) const {
   kept_ = judgement.now;
   std::vector<const StoredLevel*> levels;
   for (const size_t index : judgement.outdated) levels.push_back(&levels_[index]);
-  RestampLevels(file_->Path(), levels, *judgement.now, freshness_.IsInImage());
+  RestampLevels(*file_, levels, *judgement.now, freshness_.IsInImage());
 }
 
 }  // namespace orin::drivers

@@ -2,7 +2,6 @@
 #include "host/drivers/tiff/sidecar.h"
 
 #include <algorithm>
-#include <filesystem>
 #include <utility>
 #include <vector>
 
@@ -74,13 +73,14 @@ LevelCoding CodingOfImage(const IRasterSource& image) {
   return InPlanes(std::move(coding));
 }
 
-std::unique_ptr<LevelFile> OpenExisting(const std::string& path) {
+std::unique_ptr<LevelFile> OpenLevels(const std::string& imageFile, const std::string& path) {
   try {
-    return std::make_unique<LevelFile>(path, true);
+    return LevelFile::Beside(imageFile, path);
   } catch (const Exception& reason) {
     throw Exception(FormatString(_("%s Delete the side-car, or move it away, and run again."),
                                  reason.GetMessage().c_str()),
-                    "host/drivers/tiff/sidecar", "OpenExisting(const std::string&)", 0);
+                    "host/drivers/tiff/sidecar",
+                    "OpenLevels(const std::string&, const std::string&)", 0);
   }
 }
 
@@ -121,9 +121,7 @@ std::unique_ptr<datasources::ILevelStore> TiffSideCar::Open(const std::string& i
   if (!settings.watch) settings.watch = std::make_shared<datasources::ImageWatch>(imageFile);
   settings.validity =
       image.DeliversValidity() ? ValidityOf(image) : ValidityBeside(imageFile, image);
-  std::error_code ignored;
-  auto file =
-      std::filesystem::exists(path, ignored) ? OpenExisting(path) : LevelFile::NotYetMade(path);
+  auto file = OpenLevels(imageFile, path);
   settings.coding.byteOrder = file->Structure().byteOrder;
   return std::make_unique<TiffLevelStore>(std::move(file), std::move(settings));
 }

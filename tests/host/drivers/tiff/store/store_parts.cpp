@@ -232,7 +232,8 @@ TEST_F(Parts, DirectoryTakesTheRoomReservedForItWhateverTheOrderOfItsEntries) {
   for (const bool isBig : {false, true})
     for (const auto& entries :
          {std::vector{bits, gap, software}, std::vector{software, gap, bits}}) {
-      PositionedFile file(folder_.File("room"), PositionedFile::Mode::kCreate);
+      const auto made = PositionedFile::Make(folder_.File("room"), {});
+      PositionedFile& file = *made;
       Appender appender(file, isBig, {});
       appender.AppendDirectory(entries, 0);
       EXPECT_EQ(appender.End(), file.Size());
@@ -243,7 +244,8 @@ TEST_F(Parts, DirectoryTakesTheRoomReservedForItWhateverTheOrderOfItsEntries) {
 
 TEST_F(Parts, AppenderStopsAtFourGiBOfAClassicFileOnly) {
   const std::string name = folder_.File("long.tif");
-  drivers::PositionedFile file(name, drivers::PositionedFile::Mode::kCreate);
+  const auto made = PositionedFile::Make(name, {});
+  PositionedFile& file = *made;
   const uint64_t limit = uint64_t{1} << 32;
   const auto expectRefusal = [&](drivers::Appender& appender, size_t bytes) {
     const uint64_t size = file.Size();
