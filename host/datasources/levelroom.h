@@ -8,8 +8,8 @@
 namespace orin::datasources {
 
 struct LevelRoom {
-  std::string file;    ///< that grows, or is made; empty: the levels take no room in a file
-  uint64_t bytes = 0;  ///< expected: exact without compression, else from how the image compresses
+  std::string file;         ///< that grows, or is made; empty: the levels take no room in a file
+  uint64_t bytes = 0;       ///< that they take at most; exact without compression
   std::string obstacle;     ///< why the file's format may not hold them, naming it; empty: it does
   std::string advice;       ///< what to do about the obstacle
   bool blursAlpha = false;  ///< opacity is stored with loss; masks say exactly what holds data

@@ -124,11 +124,7 @@ void Recompress(LevelCompression compression, LevelCoding& coding) {
   const uint16_t codec = CodecOf(compression);
   const uint16_t before = coding.format.compression;
   if (codec == before || (IsDeflate(codec) && IsDeflate(before))) return;
-  const bool wasLossless = before != COMPRESSION_JPEG && before != COMPRESSION_OJPEG &&
-                           before != COMPRESSION_WEBP && before != COMPRESSION_LERC;
-  const double part = coding.storedPart;
   FallBackToDeflate(coding);
-  if (wasLossless) coding.storedPart = part;
   coding.format.compression = codec;
   if (!TakesPredictor(codec)) coding.predictor = PREDICTOR_NONE;
   if (codec == COMPRESSION_JPEG) ChooseJpegColours(coding);
@@ -162,6 +158,7 @@ void ApplyPredictor(LevelPredictor predictor, const std::string& file, LevelCodi
     Refuse(file, option, _("the samples are no floating point numbers"));
   const uint16_t before = coding.predictor;
   coding.predictor = number;
+  if (number != before) coding.imageBytes.reset();
   if (number != PREDICTOR_NONE && number != before && !TileEncoder::CanEncode(coding))
     Refuse(file, option,
            FormatString(_("it does not take samples of %u bits"), coding.format.bitsPerSample));
@@ -177,11 +174,13 @@ void ApplyNumbers(const LevelOptions& options, const std::string& file, LevelCod
     if (IsDeflate(codec) && *options.effort > kMostDeflateEffort)
       Refuse(file, option, FormatString(_("DEFLATE goes from 1 to %d"), kMostDeflateEffort));
     coding.effort = *options.effort;
+    coding.imageBytes.reset();  // the image may have been coded with more
   }
   if (!options.quality) return;
   if (codec != COMPRESSION_JPEG && codec != COMPRESSION_WEBP)
     Refuse(file, FormatString("QUALITY=%d", *options.quality),
            _("the levels' compression is without loss; add COMPRESS=JPEG or WEBP"));
+  if (*options.quality > coding.jpegQuality) coding.imageBytes.reset();
   coding.jpegQuality = *options.quality;
 }
 

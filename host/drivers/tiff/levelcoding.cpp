@@ -21,7 +21,6 @@ constexpr uint64_t kMostTileBytes = 64 << 20;
 constexpr uint64_t kMostTiles = 1 << 26;
 constexpr uint64_t kMostTagBytes = 1 << 20;
 constexpr uint64_t kMostHeadBytes = 1 << 16;  // of a JPEG stream: its tables stand in front
-constexpr double kGuessedPart = 0.5;          // of a lossy image's samples, stored without loss
 
 constexpr std::array<uint16_t, 9> kInheritedTags = {TIFFTAG_COLORMAP,
                                                     TIFFTAG_INKSET,
@@ -46,8 +45,8 @@ void DropYCbCr(LevelCoding& coding) {
   });
 }
 
-/// Learns from the stored sizes of all tiles or strips: whether some are left out, and how well the
-/// samples compress.
+/// Learns from the stored sizes of all tiles or strips: whether some are left out, and how much
+/// they take together.
 void LookAtStoredSizes(const PositionedFile& file, const TiffStructure& structure,
                        const TiffDirectory& directory, LevelCoding& coding) {
   const TiffEntry* counts = directory.Find(TIFFTAG_TILEBYTECOUNTS);
@@ -58,9 +57,6 @@ void LookAtStoredSizes(const PositionedFile& file, const TiffStructure& structur
     stored += double(bytes);
     coding.mayBeSparse = coding.mayBeSparse || bytes == 0;
   });
-  const PixelFormat& format = coding.format;
-  const double samples = double(format.width) * format.height * format.samplesPerPixel;
-  coding.storedPart = std::min(1.0, stored / (samples * format.SampleBytes()));
   coding.imageBytes = static_cast<uint64_t>(std::min(double(file.Size()), stored));
 }
 
@@ -168,7 +164,6 @@ void FallBackToDeflate(LevelCoding& coding) {
   }
   coding.format.compression = COMPRESSION_ADOBE_DEFLATE;
   coding.predictor = UsualPredictor(coding.format);
-  coding.storedPart = std::max(coding.storedPart, kGuessedPart);
   coding.imageBytes.reset();
   DropInherited(coding, [](uint16_t tag) { return tag == TIFFTAG_LERC_PARAMETERS; });
 }
@@ -204,7 +199,9 @@ LevelCoding InPlanes(LevelCoding coding) {
   // Both need several channels in a tile, or lose more than they have to.
   const uint16_t codec = coding.format.compression;
   if (codec == COMPRESSION_JPEG || codec == COMPRESSION_WEBP) FallBackToDeflate(coding);
-  coding.format.planar = coding.format.samplesPerPixel > 1;
+  const bool getsPlanes = coding.format.samplesPerPixel > 1;
+  if (getsPlanes != coding.format.planar) coding.imageBytes.reset();
+  coding.format.planar = getsPlanes;
   return coding;
 }
 

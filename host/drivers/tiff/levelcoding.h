@@ -28,8 +28,7 @@ struct LevelCoding {
   uint32_t lercExtra = 0;              ///< compression on top of LERC
   bool mayBeSparse = false;            ///< tiles that hold nothing but no data need not be stored
   std::vector<NewEntry> inherited;     ///< tags that describe the samples, copied as they are
-  double storedPart = 0.5;             ///< stored bytes / bytes of the samples, as far as is known
-  std::optional<uint64_t> imageBytes;  ///< stored, of the image in this very codec
+  std::optional<uint64_t> imageBytes;  ///< stored, of the image coded in this very way
 
   /// JPEG takes and gives RGB for stored YCbCr.
   bool IsJpegYCbCr() const;

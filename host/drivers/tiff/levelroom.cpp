@@ -14,11 +14,12 @@ using datasources::BigTiff;
 using datasources::LevelHasPixels;
 using datasources::LevelRoom;
 
-/// What a level of `planes` planes takes, with its mask where it gets one.
-StoredSize TiffLevelStore::SizeOf(const LevelCoding& level, uint32_t planes, bool isBig) const {
-  StoredSize size = StoredSizeOf(level, planes, isBig);
-  if (GetsMask(level.format)) size += StoredSizeOf(MaskCodingOf(level), 1, isBig);
-  return size;
+/// The most that a level of `planes` planes takes, with its mask where it gets one.
+uint64_t TiffLevelStore::MostBytesWithMask(const LevelCoding& level, uint32_t planes,
+                                           bool isBig) const {
+  uint64_t bytes = MostBytesOf(level, planes, isBig);
+  if (GetsMask(level.format)) bytes += MostBytesOf(MaskCodingOf(level), 1, isBig);
+  return bytes;
 }
 
 /// What the user wishes, else whether the usual pyramids and this level could pass the limit.
@@ -28,7 +29,7 @@ bool TiffLevelStore::BecomesBig(const LevelCoding& level) const {
   if (wish == BigTiff::kYes || wish == BigTiff::kNo) return wish == BigTiff::kYes;
   const ImageShape& image = settings_.image;
   uint64_t most = MostBytesOfPyramids(image.width, image.height, level) +
-                  SizeOf(level, level.Planes(), true).most;
+                  MostBytesWithMask(level, level.Planes(), true);
   if (GetsMask(level.format))
     most += MostBytesOfPyramids(image.width, image.height, MaskCodingOf(level));
   return most > (wish == BigTiff::kIfSafer ? kSaferBytes : kClassicBytes);
@@ -81,21 +82,21 @@ LevelRoom TiffLevelStore::RoomFor(const std::vector<unsigned>& levels,
 LevelRoom TiffLevelStore::RoomOf(const std::vector<unsigned>& levels,
                                  const std::vector<unsigned>& channels) const {
   LevelRoom room;
-  StoredSize size;
+  uint64_t most = 0;
   const TiffStructure& structure = file_->Structure();
   for (const unsigned level : levels) {
     if (!LevelHasPixels(settings_.image.width, settings_.image.height, level)) continue;
     const LevelCoding coding = PendingFor(level).coding;
     room.blursAlpha = room.blursAlpha || BlursAlpha(coding.format);
     const auto planes = static_cast<uint32_t>(PlanesOf(coding, channels).size());
-    size += SizeOf(coding, planes, structure.isBig);
+    most += MostBytesWithMask(coding, planes, structure.isBig);
   }
-  if (size.most == 0) return room;
+  if (most == 0) return room;
   room.file = file_->Path();
-  room.bytes = size.expected;
+  room.bytes = most;
   const bool mayBecomeBig = !file_->Exists() && options_.bigTiff != BigTiff::kNo;
   const uint64_t end = file_->Exists() ? file_->File().Size() : structure.HeaderBytes();
-  if (!structure.isBig && !mayBecomeBig && end + size.most > kClassicBytes) ExplainLimit(room);
+  if (!structure.isBig && !mayBecomeBig && end + most > kClassicBytes) ExplainLimit(room);
   return room;
 }
 

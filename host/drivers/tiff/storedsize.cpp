@@ -2,6 +2,7 @@
 #include "host/drivers/tiff/storedsize.h"
 
 #include <algorithm>
+#include <optional>
 #include <set>
 
 #include "host/datasources/pyramidlevels.h"
@@ -9,7 +10,8 @@
 namespace orin::drivers {
 namespace {
 
-constexpr uint64_t kDirectoryBytes = 2048;  // of entries and texts, more than are ever written
+constexpr uint64_t kDirectoryBytes = 3072;  // of entries, texts and markers, more than are written
+constexpr uint64_t kSampleBytes = 16;       // of what a directory says of each sample
 constexpr uint64_t kTileHeadBytes = 1024;   // that a codec may put before a tile's data
 
 /// What a codec makes of samples that do not compress, relative to them.
@@ -18,8 +20,9 @@ double WorstGrowth(uint16_t compression) {
     case COMPRESSION_NONE:
       return 1.0;
     case COMPRESSION_LZW:
-    case COMPRESSION_JPEG:
       return 1.5;
+    case COMPRESSION_JPEG:
+      return 2.0;
     default:
       return 1.02;
   }
@@ -32,35 +35,46 @@ uint64_t PackedTileBytes(const PixelFormat& format) {
 }
 
 uint64_t DirectoryBytes(const LevelCoding& level, bool isBig) {
-  uint64_t bytes = kDirectoryBytes + (isBig ? 16 : 8) * level.format.TileCount();
+  uint64_t bytes = kDirectoryBytes + kSampleBytes * level.format.samplesPerPixel +
+                   (isBig ? 16 : 8) * level.format.TileCount();
   for (const NewEntry& entry : level.inherited) bytes += entry.bytes.size();
   return bytes;
 }
 
-}  // namespace
-
-StoredSize& StoredSize::operator+=(const StoredSize& other) {
-  expected += other.expected;
-  most += other.most;
-  return *this;
+/// How many times the bytes of its image a level may take in the same codec; none where the image
+/// says nothing of its levels: LERC and WebP levels are without loss whatever the image is, means
+/// of whole numbers fill floating point samples, runs end where means begin, and long windows find
+/// what tiles do not hold.
+std::optional<uint64_t> ShareOfImage(const LevelCoding& level) {
+  constexpr uint64_t kSpread = 4;  // level pixels into which a method carries one of the image
+  switch (level.format.compression) {
+    case COMPRESSION_JPEG:
+      return 2;
+    case COMPRESSION_DEFLATE:
+    case COMPRESSION_ADOBE_DEFLATE:
+    case COMPRESSION_LZW:
+      if (level.format.type.isFloat || level.format.bitsPerSample > 16) return std::nullopt;
+      return kSpread;
+    default:
+      return std::nullopt;
+  }
 }
 
-StoredSize StoredSizeOf(const LevelCoding& level, uint32_t planes, bool isBig) {
+}  // namespace
+
+uint64_t MostBytesOf(const LevelCoding& level, uint32_t planes, bool isBig) {
   const PixelFormat& format = level.format;
   const uint64_t tiles = format.TilesPerPlane() * planes;
   const uint64_t samples = PackedTileBytes(format) * tiles;
-  const bool isPlain = format.compression == COMPRESSION_NONE;
   const uint64_t directory = DirectoryBytes(level, isBig);
-  StoredSize size;
-  size.most = isPlain ? samples
-                      : static_cast<uint64_t>(double(samples) * WorstGrowth(format.compression)) +
-                            tiles * kTileHeadBytes;
-  if (level.imageBytes && !isPlain) size.most = std::min(size.most, *level.imageBytes);
-  const bool isExact = isPlain && !level.mayBeSparse;
-  size.expected = isExact ? samples : static_cast<uint64_t>(double(samples) * level.storedPart);
-  size.expected = std::min(size.expected, size.most) + directory;
-  size.most += directory;
-  return size;
+  if (format.compression == COMPRESSION_NONE) return samples + directory;
+  uint64_t bytes = static_cast<uint64_t>(double(samples) * WorstGrowth(format.compression));
+  const auto share = ShareOfImage(level);
+  if (level.imageBytes && share) {
+    constexpr uint64_t kPadding = 32;  // part of the samples that rows behind the image's edge take
+    bytes = std::min(bytes, *share * *level.imageBytes + samples / kPadding);
+  }
+  return bytes + tiles * kTileHeadBytes + directory;
 }
 
 uint64_t MostBytesOfPyramids(uint32_t imageWidth, uint32_t imageHeight, LevelCoding level) {
@@ -72,7 +86,7 @@ uint64_t MostBytesOfPyramids(uint32_t imageWidth, uint32_t imageHeight, LevelCod
   for (const unsigned factor : factors) {
     level.format.width = imageWidth / factor;
     level.format.height = imageHeight / factor;
-    bytes += StoredSizeOf(level, level.Planes(), true).most;
+    bytes += MostBytesOf(level, level.Planes(), true);
   }
   return bytes;
 }

@@ -1,4 +1,4 @@
-/// How many bytes a level takes in the file, before it is made.
+/// How many bytes a level takes in the file at most, before it is made.
 // SPDX-License-Identifier: MIT
 #pragma once
 
@@ -8,17 +8,12 @@
 
 namespace orin::drivers {
 
-struct StoredSize {
-  uint64_t expected = 0;  ///< bytes; exact without compression
-  uint64_t most = 0;      ///< bytes; as good as never exceeded
-
-  StoredSize& operator+=(const StoredSize& other);
-};
-
-/// The size of a level's tiles in `planes` of its planes, with its directory. No level is taken to
-/// need more bytes than its image does in the same codec.
+/// The most bytes that a level's tiles take in `planes` of its planes, with its directory; exact
+/// without compression. A level's samples may compress worse than its image's: one value in four of
+/// a smooth image is less smooth, a mean of whole numbers is none, and a level of an image with
+/// loss may be stored without.
 /// \param isBig  the file is a BigTIFF
-StoredSize StoredSizeOf(const LevelCoding& level, uint32_t planes, bool isBig);
+uint64_t MostBytesOf(const LevelCoding& level, uint32_t planes, bool isBig);
 
 /// The most bytes of all that is usually built of an image: the pyramids of factor 2 and of 3.
 /// \param level  the coding of one of the levels

@@ -155,9 +155,12 @@ LevelCoding TiffLevelStore::CodingOfStored(const StoredLevel& stored) const {
       CodingOf(file_->File(), structure, structure.directories[stored.index], stored.format);
   const LevelCoding& image = settings_.coding;
   coding.mayBeSparse = image.mayBeSparse;
-  coding.storedPart = std::max(coding.storedPart, image.storedPart);
+  const bool isCodedAlike = coding.format.compression == image.format.compression &&
+                            coding.predictor == image.predictor &&
+                            coding.format.planar == image.format.planar &&
+                            coding.jpegQuality <= image.jpegQuality;
   coding.imageBytes.reset();
-  if (coding.format.compression == image.format.compression) coding.imageBytes = image.imageBytes;
+  if (isCodedAlike) coding.imageBytes = image.imageBytes;
   return coding;
 }
 

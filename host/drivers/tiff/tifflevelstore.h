@@ -106,7 +106,7 @@ class TiffLevelStore final : public datasources::ILevelStore {
 
   bool BlursAlpha(const PixelFormat& level) const;
   bool GetsMask(const PixelFormat& level) const;
-  StoredSize SizeOf(const LevelCoding& level, uint32_t planes, bool isBig) const;
+  uint64_t MostBytesWithMask(const LevelCoding& level, uint32_t planes, bool isBig) const;
   bool BecomesBig(const LevelCoding& level) const;
   const StoredLevel* Find(unsigned level) const;
   const StoredLevel* FindOurs(unsigned level) const;
