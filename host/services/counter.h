@@ -7,7 +7,10 @@
 
 namespace orin::tarn {
 
-/// Receives the fraction done (0.0 to 1.0) and a status text, null when none is given.
+/// Receives the fraction done, from 0.0 to 1.0 whatever was reported, and a status text, null when
+/// none is given. It may report and call `SetSink`; no lock is held meanwhile. What it throws
+/// passes to the caller of `Update`, but for a fraction of 1.0: then all is done, and it is
+/// dropped.
 /// \returns false when the user asks to stop
 using ProgressSink = std::function<bool(float fraction, const std::string* message)>;
 

@@ -3,11 +3,13 @@
 #pragma once
 
 #include <exception>
+#include <memory>
 #include <string>
 
 namespace orin {
 
-/// Thrown by value, caught by reference. Copies share nothing.
+/// Thrown by value, caught by reference. Copying one allocates nothing and never fails, so that a
+/// failure for want of memory can be kept and thrown again.
 class Exception : public std::exception {
  public:
   /// \param message     what happened, for the user
@@ -17,22 +19,26 @@ class Exception : public std::exception {
   /// \param line        source line; 0 when none is given
   Exception(const std::string& message, const std::string& sourceFile, const std::string& function,
             unsigned int line);
-  Exception(const Exception&);
-  Exception& operator=(const Exception&);
+  Exception(const Exception&) noexcept;
+  Exception& operator=(const Exception&) noexcept;
   ~Exception() override;
 
-  const std::string& GetMessage() const noexcept { return message_; }
-  const std::string& GetSourceFile() const noexcept { return sourceFile_; }
-  const std::string& GetFunction() const noexcept { return function_; }
-  unsigned int GetLine() const noexcept { return line_; }
+  const std::string& GetMessage() const noexcept { return report_->message; }
+  const std::string& GetSourceFile() const noexcept { return report_->sourceFile; }
+  const std::string& GetFunction() const noexcept { return report_->function; }
+  unsigned int GetLine() const noexcept { return report_->line; }
   /// The message.
   const char* what() const noexcept override;
 
  private:
-  std::string message_;
-  std::string sourceFile_;
-  std::string function_;
-  unsigned int line_;
+  struct Report {
+    std::string message;
+    std::string sourceFile;
+    std::string function;
+    unsigned int line;
+  };
+
+  std::shared_ptr<const Report> report_;  ///< never null, never changed
 };
 
 /// Bad or unsupported data.
@@ -40,7 +46,7 @@ class DataException : public Exception {
  public:
   DataException(const std::string& message, const std::string& sourceFile,
                 const std::string& function, unsigned int line);
-  DataException(const DataException&);
+  DataException(const DataException&) noexcept;
   ~DataException() override;
 };
 

@@ -15,7 +15,8 @@ struct Report {
   unsigned int line;
 };
 
-/// Receives reports; what it throws is dropped. Empty: reports are dropped.
+/// Receives reports; what it throws is dropped. It may report and call `SetSink`; no lock is held
+/// meanwhile. Empty: reports are dropped.
 using ReportSink = std::function<void(const Report&)>;
 
 class Logger {

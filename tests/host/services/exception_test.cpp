@@ -55,6 +55,12 @@ TEST(Exception, DataExceptionIsCaughtAsExceptionAndKeepsItsType) {
   }
 }
 
+TEST(Exception, CopiesNeedNoMemory) {
+  EXPECT_TRUE(std::is_nothrow_copy_constructible_v<Exception>);
+  EXPECT_TRUE(std::is_nothrow_copy_assignable_v<Exception>);
+  EXPECT_TRUE(std::is_nothrow_copy_constructible_v<DataException>);
+}
+
 TEST(Exception, DestructorsAreVirtual) {
   EXPECT_TRUE(std::has_virtual_destructor_v<Exception>);
   EXPECT_TRUE(std::has_virtual_destructor_v<DataException>);

@@ -2,7 +2,10 @@
 // SPDX-License-Identifier: MIT
 #include <gtest/gtest.h>
 
+#include <memory>
 #include <stdexcept>
+#include <string>
+#include <utility>
 #include <vector>
 
 #include "host/services/counter.h"
@@ -70,6 +73,68 @@ TEST_F(Sinks, TheCounterPassesFractionTextAndAnswer) {
   EXPECT_TRUE(Counter::Update(0.25f));
   EXPECT_FALSE(Counter::Update(0.5f, "half", nullptr));
   EXPECT_EQ((std::vector<std::string>{"0.250000 no text", "0.500000 half"}), seen);
+}
+
+TEST_F(Sinks, FractionsBeyondTheEndsAreCut) {
+  std::vector<float> seen;
+  Counter::SetSink([&](float fraction, const std::string*) {
+    seen.push_back(fraction);
+    return true;
+  });
+  for (const float fraction : {1.0000002f, -0.1f, 0.5f}) Counter::Update(fraction);
+  EXPECT_EQ((std::vector<float>{1.0f, 0.0f, 0.5f}), seen);
+}
+
+TEST_F(Sinks, ASinkThatThrowsAtTheEndOfAllWorkIsIgnored) {
+  Counter::SetSink([](float, const std::string*) -> bool { throw std::runtime_error("gone"); });
+  EXPECT_THROW(Counter::Update(0.99f), std::runtime_error);
+  EXPECT_TRUE(Counter::Update(1.0f));
+  EXPECT_TRUE(Counter::Update(1.0f, "end", nullptr));
+}
+
+/// A sink whose state shows whether it is alive.
+struct Replacing {
+  std::shared_ptr<int> state = std::make_shared<int>(7);
+  std::vector<int>* seen;
+  void Run() const {
+    Logger::SetSink({});
+    Warning::SetSink({});
+    Counter::SetSink({});
+    seen->push_back(*state);
+  }
+};
+
+TEST_F(Sinks, ASinkThatIsReplacedWhileItRunsLivesUntilItReturns) {
+  std::vector<int> seen;
+  const auto watch = [&] {
+    Replacing sink{std::make_shared<int>(7), &seen};
+    std::weak_ptr<int> alive = sink.state;
+    return std::pair(sink, alive);
+  };
+  auto [warning, warned] = watch();
+  Warning::SetSink([sink = std::move(warning)](const Report&) { sink.Run(); });
+  Warning::Warn("warning", "file", 1);
+  EXPECT_TRUE(warned.expired());
+  auto [counter, counted] = watch();
+  Counter::SetSink([sink = std::move(counter)](float, const std::string*) {
+    sink.Run();
+    return true;
+  });
+  EXPECT_TRUE(Counter::Update(0.5f));
+  EXPECT_TRUE(counted.expired());
+  EXPECT_EQ((std::vector<int>{7, 7}), seen);
+}
+
+TEST_F(Sinks, ASinkMayReportItself) {
+  std::vector<std::string> events;
+  Logger::SetSink([&](const Report& report) { events.push_back(report.message); });
+  Warning::SetSink([](const Report& report) { Logger::LogEvent(report.message, "file", 1); });
+  Counter::SetSink([](float fraction, const std::string*) {
+    if (fraction < 0.5f) Warning::Warn("early", "file", 1);
+    return fraction >= 0.5f || Counter::Update(0.75f);
+  });
+  EXPECT_TRUE(Counter::Update(0.25f));
+  EXPECT_EQ(std::vector<std::string>{"early"}, events);
 }
 
 TEST_F(Sinks, SettingASinkReturnsTheOneReplaced) {
