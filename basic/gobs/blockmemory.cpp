@@ -4,10 +4,10 @@
 #include <sys/mman.h>
 
 #include <algorithm>
-#include <array>
 #include <atomic>
-#include <mutex>
 #include <new>
+
+#include "basic/gobs/outofmemory.h"
 
 namespace orin::gobs {
 namespace {
@@ -18,57 +18,30 @@ constexpr size_t kUnit = size_t{1} << 20;   // bytes; blocks of nearly one size 
 
 // Under a sanitizer every block comes from the heap, which is what it watches.
 #if defined(__SANITIZE_ADDRESS__) || defined(__SANITIZE_THREAD__)
-constexpr bool kKeepsBuffers = false;
+constexpr bool kMapsBlocks = false;
 #elif defined(__has_feature)
 #if __has_feature(address_sanitizer) || __has_feature(thread_sanitizer)
-constexpr bool kKeepsBuffers = false;
+constexpr bool kMapsBlocks = false;
 #else
-constexpr bool kKeepsBuffers = true;
+constexpr bool kMapsBlocks = true;
 #endif
 #else
-constexpr bool kKeepsBuffers = true;
+constexpr bool kMapsBlocks = true;
 #endif
 
 size_t CapacityFor(size_t bytes) { return (bytes + kUnit - 1) / kUnit * kUnit; }
 
-/// Released buffers, as many as one step of the block pipeline has alive.
-class FreeBuffers {
- public:
-  /// A buffer of exactly this capacity, or null.
-  void* Take(size_t capacity) {
-    const std::lock_guard lock(mutex_);
-    for (Buffer& buffer : buffers_)
-      if (buffer.memory && buffer.capacity == capacity) {
-        void* memory = buffer.memory;
-        buffer.memory = nullptr;
-        return memory;
-      }
-    return nullptr;
-  }
+thread_local BlockBuffers* used = nullptr;
 
-  /// Keeps a buffer, in place of the one that has waited longest.
-  void Put(void* memory, size_t capacity) {
-    const std::lock_guard lock(mutex_);
-    Buffer& place = buffers_[next_];
-    next_ = (next_ + 1) % buffers_.size();
-    if (place.memory) munmap(place.memory, place.capacity);
-    place = {memory, capacity};
-  }
+std::atomic<uint64_t> mappedBytes = 0;
+std::atomic<uint64_t> mappings = 0;
 
- private:
-  struct Buffer {
-    void* memory = nullptr;
-    size_t capacity = 0;
-  };
+/// A buffer that is kept holds its own capacity.
+size_t& CapacityIn(void* memory) { return *static_cast<size_t*>(memory); }
 
-  std::mutex mutex_;
-  std::array<Buffer, 4> buffers_;
-  size_t next_ = 0;
-};
-
-FreeBuffers& Free() {
-  static FreeBuffers buffers;
-  return buffers;
+void Unmap(void* memory, size_t capacity) {
+  munmap(memory, capacity);
+  mappedBytes -= capacity;
 }
 
 std::atomic<int> live = 0;
@@ -80,20 +53,27 @@ void CountOneMore() {
   }
 }
 
-void* Allocate(size_t bytes) {
-  if (!kKeepsBuffers || bytes < kLarge) return ::operator new(bytes, kAlignment);
-  const size_t capacity = CapacityFor(bytes);
-  if (void* kept = Free().Take(capacity)) return kept;
+void* AllocateSmall(size_t bytes) {
+  if (void* memory = ::operator new(bytes, kAlignment, std::nothrow)) return memory;
+  ThrowOutOfMemory();
+}
+
+void* AllocateLarge(size_t capacity) {
+  if (void* kept = used ? used->Take(capacity) : nullptr) return kept;
   void* memory =
       mmap(nullptr, capacity, PROT_READ | PROT_WRITE, MAP_PRIVATE | MAP_ANONYMOUS, -1, 0);
-  if (memory == MAP_FAILED) throw std::bad_alloc();
+  if (memory == MAP_FAILED) ThrowOutOfMemory();
+  mappedBytes += capacity;
+  ++mappings;
   return memory;
 }
+
+bool IsSmall(size_t bytes) { return !kMapsBlocks || bytes < kLarge; }
 
 }  // namespace
 
 void* AllocateBlock(size_t bytes) {
-  void* memory = Allocate(bytes);
+  void* memory = IsSmall(bytes) ? AllocateSmall(bytes) : AllocateLarge(CapacityFor(bytes));
   CountOneMore();
   return memory;
 }
@@ -101,12 +81,45 @@ void* AllocateBlock(size_t bytes) {
 void ReleaseBlock(void* memory, size_t bytes) noexcept {
   if (!memory) return;
   --live;
-  if (!kKeepsBuffers || bytes < kLarge) ::operator delete(memory, kAlignment);
-  else Free().Put(memory, CapacityFor(bytes));
+  if (IsSmall(bytes)) return ::operator delete(memory, kAlignment);
+  const size_t capacity = CapacityFor(bytes);
+  if (!used || !used->Keep(memory, capacity)) Unmap(memory, capacity);
+}
+
+BlockBuffers::Use::Use(BlockBuffers& buffers) : former_(used) { used = &buffers; }
+BlockBuffers::Use::~Use() { used = former_; }
+
+BlockBuffers::~BlockBuffers() {
+  for (std::atomic<void*>& place : free_)
+    if (void* memory = place.exchange(nullptr)) Unmap(memory, CapacityIn(memory));
+}
+
+void* BlockBuffers::Take(size_t capacity) {
+  for (std::atomic<void*>& place : free_) {
+    void* memory = place.exchange(nullptr);
+    if (!memory) continue;
+    const size_t found = CapacityIn(memory);
+    keptBytes_ -= found;
+    if (found == capacity) return memory;
+    if (!Keep(memory, found)) Unmap(memory, found);
+  }
+  return nullptr;
+}
+
+bool BlockBuffers::Keep(void* memory, size_t capacity) {
+  if (keptBytes_.fetch_add(capacity) + capacity <= kMaxBytes) {
+    CapacityIn(memory) = capacity;
+    for (std::atomic<void*>& place : free_)
+      if (void* none = nullptr; place.compare_exchange_strong(none, memory)) return true;
+  }
+  keptBytes_ -= capacity;
+  return false;
 }
 
 int LiveBlocks() { return live; }
 int MostLiveBlocks() { return most; }
 void ResetMostLiveBlocks() { most = live.load(); }
+
+BlockMappings MappingsOfBlocks() { return {mappedBytes, mappings}; }
 
 }  // namespace orin::gobs

@@ -18,11 +18,13 @@ RasterContext ContextOf(const RasterInfo& info, const parallelio::ProcessWindow&
   const bool fits = stride <= kLimit && lines <= kLimit &&
                     (stride == 0 || lines == 0 || pixelBytes <= kLimit / stride / lines);
   if (!fits)
-    throw DataException("A raster block of 4 GiB or more was asked for; ask for smaller blocks.",
-                        "basic/gobs/raster",
-                        "orin::gobs::Raster::Raster(const orin::gobs::RasterInfo&, "
-                        "const orin::parallelio::ProcessWindow&)",
-                        0);
+    throw DataException(
+        N_("A block of 4 GiB or more would be needed to compute this level at once. Request a "
+           "level between it and the one that it is computed from."),
+        "basic/gobs/raster",
+        "orin::gobs::Raster::Raster(const orin::gobs::RasterInfo&, "
+        "const orin::parallelio::ProcessWindow&)",
+        0);
   RasterContext context;
   context.marginX = window.marginX;
   context.marginY = window.marginY;

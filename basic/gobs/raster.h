@@ -7,6 +7,7 @@
 
 #include "basic/gobs/bufferlayout.h"
 #include "basic/gobs/datatype.h"
+#include "basic/gobs/outofmemory.h"
 #include "basic/gobs/processwindow.h"
 
 namespace orin::gobs {
@@ -44,10 +45,10 @@ struct RasterContext {
 
 /// A block with its pixels: channel-interleaved, native byte order, a complex sample's real
 /// component before its imaginary one.
-class Raster : public RasterInfo, public RasterContext {
+class Raster : public RasterInfo, public RasterContext, public ThrowsOutOfMemory {
  public:
   /// Allocates the buffer; its pixels are not initialised.
-  /// \throws std::bad_alloc      out of memory
+  /// \throws orin::OutOfMemory
   /// \throws orin::DataException  the block would take 4 GiB or more
   Raster(const RasterInfo& info, const parallelio::ProcessWindow& window);
   /// Looks at a buffer of the caller's, which must hold what the other constructor would allocate

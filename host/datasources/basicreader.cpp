@@ -36,8 +36,15 @@ std::unique_ptr<IRasterReader> Open(IRasterDataset& raster, const std::vector<un
 }  // namespace
 
 BasicReader::BasicReader(IDataset* dataset, const std::vector<unsigned>& channels, bool)
-    : noData_(&RasterOf(dataset).GetNoDataAnswers()), reader_(Open(RasterOf(dataset), channels)) {}
+    : file_(RasterOf(dataset).GetFileName()),
+      noData_(&RasterOf(dataset).GetNoDataAnswers()),
+      reader_(Open(RasterOf(dataset), channels)) {}
 BasicReader::~BasicReader() = default;
+
+void BasicReader::Read(gobs::Raster& block) {
+  ReadWithMemory(file_, "orin::datasources::BasicReader::Read(orin::gobs::Raster&)",
+                 [&] { reader_->Read(block); });
+}
 
 AuxiliaryData BasicReader::GetAuxiliaryData() const {
   return noData_->Answer(reader_->GetAuxiliaryData(), GetChannelsInfo(), GetDataType());

@@ -3,6 +3,7 @@
 #pragma once
 
 #include <memory>
+#include <string>
 #include <vector>
 
 #include "host/datasources/dataset.h"
@@ -34,13 +35,17 @@ class BasicReader : public IRasterReader {
     reader_->SetTileSize(width, height);
   }
   void SetOptimalTileSize() override { reader_->SetOptimalTileSize(); }
-  void Read(gobs::Raster& block) override { reader_->Read(block); }
+  /// \throws orin::OutOfMemory  whatever in the driver wanted memory
+  void Read(gobs::Raster& block) override;
   /// With no-data values as a run can take them; the first question may have the image searched for
-  /// a value that does not occur. \throws orin::Exception  the image cannot be opened for that
+  /// a value that does not occur.
+  /// \throws orin::Exception  the image cannot be opened for that
+  /// \throws orin::Cancelled  the user asked to stop the search
   AuxiliaryData GetAuxiliaryData() const override;
   std::vector<unsigned> GetChannelsInfo() const override { return reader_->GetChannelsInfo(); }
 
  private:
+  std::string file_;
   NoDataAnswers* noData_;
   std::unique_ptr<IRasterReader> reader_;
 };

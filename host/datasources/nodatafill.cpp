@@ -8,6 +8,7 @@
 
 #include "basic/core/typedispatch/pixeltypes.h"
 #include "basic/gobs/mask/mask.h"
+#include "host/datasources/forwardingwriter.h"
 #include "host/datasources/nodatavalue.h"
 
 namespace orin::datasources {
@@ -125,38 +126,22 @@ std::shared_ptr<const INoDataFill> MakeOf(const NoDataTexts& texts, uint32_t com
   return made->ChangesAnything() ? made : nullptr;
 }
 
-/// Forwards to a level and changes the blocks.
-class FilledLevel final : public IRasterWriter {
+/// Changes the blocks of a level.
+class FilledLevel final : public ForwardingWriter {
  public:
   FilledLevel(std::unique_ptr<IRasterWriter> level, std::shared_ptr<const INoDataFill> fill)
-      : level_(std::move(level)), fill_(std::move(fill)) {}
-
-  void SetMargin(unsigned x, unsigned y, int mode) override { level_->SetMargin(x, y, mode); }
-  unsigned GetMarginX() const override { return level_->GetMarginX(); }
-  unsigned GetMarginY() const override { return level_->GetMarginY(); }
-  unsigned GetWidth() const override { return level_->GetWidth(); }
-  unsigned GetHeight() const override { return level_->GetHeight(); }
-  unsigned GetChannelCount() const override { return level_->GetChannelCount(); }
-  const gobs::DataType& GetDataType() const override { return level_->GetDataType(); }
-  unsigned GetLevel() const override { return level_->GetLevel(); }
-  unsigned GetTileWidth() const override { return level_->GetTileWidth(); }
-  unsigned GetTileHeight() const override { return level_->GetTileHeight(); }
-  void SetTileSize(unsigned width, unsigned height) override { level_->SetTileSize(width, height); }
-  void SetOptimalTileSize() override { level_->SetOptimalTileSize(); }
-  AuxiliaryData GetAuxiliaryData() const override { return level_->GetAuxiliaryData(); }
-  std::vector<unsigned> GetChannelsInfo() const override { return level_->GetChannelsInfo(); }
+      : ForwardingWriter(std::move(level)), fill_(std::move(fill)) {}
 
   void Read(Raster& block) override {
-    level_->Read(block);
+    Level().Read(block);
     fill_->Recognise(block);
   }
   void Write(const Raster& block) override {
     const std::unique_ptr<Raster> changed = fill_->ToStore(block);
-    level_->Write(changed ? *changed : block);
+    Level().Write(changed ? *changed : block);
   }
 
  private:
-  std::unique_ptr<IRasterWriter> level_;
   std::shared_ptr<const INoDataFill> fill_;
 };
 

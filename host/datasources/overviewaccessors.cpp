@@ -2,8 +2,12 @@
 #include "host/datasources/overviewaccessors.h"
 
 #include <algorithm>
+#include <string>
+#include <utility>
 
+#include "host/datasources/forwardingwriter.h"
 #include "host/datasources/nodataanswers.h"
+#include "host/datasources/withmemory.h"
 #include "host/services/exception.h"
 #include "host/services/text.h"
 
@@ -21,6 +25,28 @@ std::vector<unsigned> LevelsOf(const ILevelStore* store, const std::vector<unsig
         levels.push_back(entry.level);
   return levels;
 }
+
+/// A level in whose reading and writing any want of memory is a failure like all others.
+class MemoryCheckedLevel final : public ForwardingWriter {
+ public:
+  MemoryCheckedLevel(std::unique_ptr<IRasterWriter> level, std::string file)
+      : ForwardingWriter(std::move(level)), file_(std::move(file)) {}
+
+  void Read(gobs::Raster& block) override {
+    ReadWithMemory(file_, "MemoryCheckedLevel::Read(orin::gobs::Raster&)",
+                   [&] { Level().Read(block); });
+  }
+  void Write(const gobs::Raster& block) override {
+    WithMemory(file_,
+               _("%s: its levels cannot be written: there is not enough memory. Free memory, then "
+                 "run the same command again to resume."),
+               "MemoryCheckedLevel::Write(const orin::gobs::Raster&)",
+               [&] { Level().Write(block); });
+  }
+
+ private:
+  std::string file_;
+};
 
 bool IsAny(const LevelDescription&) { return true; }
 bool MayBeSource(const LevelDescription& entry) { return entry.status != LevelStatus::kStale; }
@@ -63,7 +89,8 @@ void BasicOverviewWriterAccessor::CreateLevel(unsigned level) {
 }
 
 IRasterWriter* BasicOverviewWriterAccessor::CreateRasterWriter(unsigned level) {
-  return noData_.ForLevel(Store().OpenWriter(level, channels_), channels_).release();
+  auto writer = noData_.ForLevel(Store().OpenWriter(level, channels_), channels_);
+  return writer ? new MemoryCheckedLevel(std::move(writer), file_) : nullptr;
 }
 
 std::vector<unsigned> BasicOverviewWriterAccessor::GetLevels() const {

@@ -7,28 +7,28 @@
 #include <string>
 #include <utility>
 
-#include "host/services/exception.h"
+#include "basic/gobs/outofmemory.h"
 #include "host/services/text.h"
 
 namespace orin::datasources {
 
+/// \throws orin::OutOfMemory  with the text, or, where there is no memory even for that, without
+[[noreturn]] void RefuseForMemory(const std::string& file, const char* format,
+                                  const char* function);
+
 /// Calls `work` and returns what it returns.
 /// \param format    of the text, which takes the file's name
 /// \param function  signature of the caller, for the exception
-/// \throws orin::Exception  the text, when there is not enough memory; what else `work` throws
-///                          passes through
+/// \throws orin::OutOfMemory  the text, when there is not enough memory; what else `work` throws
+///                            passes through
 template <class Work>
 auto WithMemory(const std::string& file, const char* format, const char* function, Work&& work) {
-  const auto refuse = [&] {
-    return Exception(FormatString(format, file.c_str()), "host/datasources/withmemory", function,
-                     0);
-  };
   try {
     return work();
   } catch (const std::bad_alloc&) {
-    throw refuse();
+    RefuseForMemory(file, format, function);
   } catch (const std::length_error&) {  // a size that no memory has
-    throw refuse();
+    RefuseForMemory(file, format, function);
   }
 }
 

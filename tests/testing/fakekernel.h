@@ -24,7 +24,7 @@ class FakeKernel final : public resamplers::Resampler {
   explicit FakeKernel(FakeKernelFactory& factory);
   ~FakeKernel() override;
   void Resample(gobs::Raster* src, gobs::Mask* srcMask, gobs::Raster* dst) override;
-  uint32_t GetMargin() const override { return 0; }
+  uint32_t GetMargin() override { return 0; }
   void SetRatio(double ratioX, double ratioY) override;
   void SetNoDataValue(double value) override;
   void SetComplex(bool isComplex) override;
@@ -46,7 +46,7 @@ class FakeKernelFactory final : public resamplers::IResamplerFactory {
     calls.push_back(FormatString("Create(%u)", type.bits));
     return makesKernels ? new FakeKernel(*this) : nullptr;
   }
-  uint32_t GetMargin() const override { return 0; }
+  uint32_t GetMargin() override { return 0; }
 
   bool makesKernels = true;        ///< false: answers null
   Hook before;                     ///< called at the start of each `Resample`; may throw

@@ -3,6 +3,7 @@
 #pragma once
 
 #include "basic/core/typedispatch/pixeltypes.h"
+#include "basic/gobs/outofmemory.h"
 #include "host/services/exception.h"
 
 namespace orin::typedispatch {
@@ -25,7 +26,7 @@ struct DispatchType<TypeList<First, Rest...>, Factory> {
                       [&]<class T>(std::type_identity<T>) { product = Factory<T>::Create(); });
     if (!found)
       throw Exception(
-          "Invalid type to dispatch.", "basic/core/typedispatch/dispatchtype",
+          N_("Invalid type to dispatch."), "basic/core/typedispatch/dispatchtype",
           "static orin::typedispatch::DispatchType::Dispatch(const orin::gobs::DataType&)", 316);
     return product;
   }

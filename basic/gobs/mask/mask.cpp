@@ -3,6 +3,7 @@
 
 #include <algorithm>
 #include <cstring>
+#include <new>
 
 #include "host/services/exception.h"
 
@@ -24,7 +25,8 @@ Mask::Mask(uint32_t width_, uint32_t height_, const parallelio::ProcessWindow& w
       y(window.y),
       stride(width_ + 2 * window.marginX) {
   const uint64_t bytes = (BufferPixels(*this) + 7) / 8;
-  bits_ = std::make_unique<uint8_t[]>(bytes);
+  bits_.reset(new (std::nothrow) uint8_t[bytes]);
+  if (!bits_) ThrowOutOfMemory();
   begin = bits_.get();
   end = begin + bytes;
   std::fill(begin, end, uint8_t{0xFF});
@@ -72,7 +74,7 @@ void Mask::RetrieveRaster(Raster* out) const {
   } else if (out->dataType == eDT_8U) {
     RetrieveBytes(out);
   } else {
-    throw DataException("We can only rasterize into a eDT_BIT or eDT_8U Raster",
+    throw DataException(N_("We can only rasterize into a eDT_BIT or eDT_8U Raster"),
                         "basic/gobs/mask/mask",
                         "void orin::gobs::Mask::RetrieveRaster(orin::gobs::Raster*) const", 233);
   }

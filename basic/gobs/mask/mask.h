@@ -35,9 +35,10 @@ struct MaskBits {
 
 /// Validity of every buffer pixel of a block: 1 valid, 0 no data; most significant bit first. Lines
 /// are not padded: pixel n of the buffer is bit n of the mask.
-class Mask {
+class Mask : public ThrowsOutOfMemory {
  public:
   /// A mask for blocks of this geometry, every bit set.
+  /// \throws orin::OutOfMemory
   Mask(uint32_t width, uint32_t height, const parallelio::ProcessWindow& window);
   Mask(const Mask&) = delete;
   Mask& operator=(const Mask&) = delete;

@@ -10,7 +10,6 @@
 #include <utility>
 
 #include "basic/gobs/mask/mask.h"
-#include "host/datasources/withmemory.h"
 #include "host/drivers/tiff/sparsesample.h"
 #include "host/drivers/tiff/tiffhandle.h"
 #include "host/drivers/tiff/tifflevelstore.h"
@@ -65,11 +64,6 @@ void LevelWriter::Begin() {
 
 void LevelWriter::Write(const Raster& block) {
   RequireFittingBlock(block, *this, file_);
-  datasources::WithMemory(file_, _("%s: not enough memory to write its levels."),
-                          "LevelWriter::Write(const Raster&)", [&] { WriteBlock(block); });
-}
-
-void LevelWriter::WriteBlock(const Raster& block) {
   if (!build_ || build_->isClosed) Begin();
   if (block.validity) WriteMask(block);
   const uint32_t tileWidth = format_.tileWidth;

@@ -60,7 +60,6 @@ class LevelWriter final : public datasources::ReaderState<datasources::IRasterWr
   };
 
   void Begin();
-  void WriteBlock(const gobs::Raster& block);
   void WritePiece(const gobs::Raster& block, const Piece& piece);
   void WriteInto(const gobs::Raster& block, const Piece& piece, uint32_t plane,
                  const std::vector<unsigned>& positions);

@@ -5,8 +5,10 @@
 #include <cstdarg>
 #include <cstdio>
 #include <cstring>
+#include <new>
 #include <utility>
 
+#include "basic/gobs/outofmemory.h"
 #include "host/services/exception.h"
 #include "host/services/text.h"
 
@@ -26,7 +28,7 @@ MemoryTiff::MemoryTiff(std::endian order, std::string file)
 }
 
 std::vector<uint8_t> MemoryTiff::StoredTile(uint32_t tile) const {
-  if (!contents_->error.empty() || !TIFFFlushData(Get())) Fail();
+  if (contents_->wantsMemory || !contents_->error.empty() || !TIFFFlushData(Get())) Fail();
   const uint64_t offset = TIFFGetStrileOffset(Get(), tile);
   const uint64_t count = TIFFGetStrileByteCount(Get(), tile);
   const std::vector<uint8_t>& bytes = contents_->bytes;
@@ -36,6 +38,7 @@ std::vector<uint8_t> MemoryTiff::StoredTile(uint32_t tile) const {
 }
 
 void MemoryTiff::Fail() const {
+  if (contents_->wantsMemory) ThrowOutOfMemory();
   const std::string reason =
       contents_->error.empty() ? _("the codec gave no reason") : contents_->error;
   throw Exception(
@@ -56,7 +59,12 @@ tmsize_t MemoryTiff::Read(thandle_t handle, void* buffer, tmsize_t size) {
 tmsize_t MemoryTiff::Write(thandle_t handle, void* buffer, tmsize_t size) {
   auto& contents = *static_cast<Contents*>(handle);
   const uint64_t end = contents.position + static_cast<uint64_t>(size);
-  if (end > contents.bytes.size()) contents.bytes.resize(end);
+  try {
+    if (end > contents.bytes.size()) contents.bytes.resize(end);
+  } catch (const std::bad_alloc&) {
+    contents.wantsMemory = true;
+    return 0;
+  }
   if (size > 0) std::memcpy(&contents.bytes[contents.position], buffer, static_cast<size_t>(size));
   contents.position = end;
   return size;
@@ -76,9 +84,14 @@ int MemoryTiff::Close(thandle_t) { return 0; }
 
 int MemoryTiff::KeepError(TIFF*, void* contents, const char*, const char* format,
                           va_list arguments) {
-  auto& error = static_cast<Contents*>(contents)->error;
+  auto& [bytes, position, error, wantsMemory] = *static_cast<Contents*>(contents);
   char text[512];
-  if (error.empty() && std::vsnprintf(text, sizeof text, format, arguments) > 0) error = text;
+  if (!error.empty() || std::vsnprintf(text, sizeof text, format, arguments) <= 0) return 1;
+  try {
+    error = text;
+  } catch (const std::bad_alloc&) {
+    wantsMemory = true;
+  }
   while (!error.empty() && error.back() == '.') error.pop_back();
   return 1;
 }

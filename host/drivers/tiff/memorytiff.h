@@ -34,6 +34,7 @@ class MemoryTiff {
     std::vector<uint8_t> bytes;
     uint64_t position = 0;
     std::string error;
+    bool wantsMemory = false;  ///< no exception may pass through libtiff
   };
 
   static tmsize_t Read(thandle_t handle, void* buffer, tmsize_t size);

@@ -6,7 +6,6 @@
 #include <numeric>
 #include <utility>
 
-#include "host/datasources/withmemory.h"
 #include "host/services/exception.h"
 #include "host/services/text.h"
 
@@ -82,11 +81,6 @@ TileDecoder& PixelReader::DecoderOf(size_t plane) {
 }
 
 void PixelReader::Read(gobs::Raster& block) {
-  datasources::WithMemory(decoder_.Path(), _("%s: not enough memory to read its pixels."),
-                          "PixelReader::Read(gobs::Raster&)", [&] { ReadBlock(block); });
-}
-
-void PixelReader::ReadBlock(gobs::Raster& block) {
   gobs::Raster target(ByteInfo(block), block.Window(), block.data);
   const datasources::InsideWindow window =
       datasources::InsideOf(target, Format().width, Format().height);

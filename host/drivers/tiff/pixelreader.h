@@ -65,7 +65,6 @@ class PixelReader {
     uint64_t bytes;  ///< from row to row
   };
 
-  void ReadBlock(gobs::Raster& block);
   Unit UnitAt(int64_t x, int64_t y) const;
   TileDecoder& DecoderOf(size_t plane);
   void LimitCache(const datasources::InsideWindow& window);

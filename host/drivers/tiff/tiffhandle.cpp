@@ -6,6 +6,7 @@
 #include <cstdarg>
 #include <cstdio>
 #include <cstring>
+#include <new>
 #include <string_view>
 #include <utility>
 
@@ -27,7 +28,12 @@ constexpr char kOpenMode[] = "rmc";
 int KeepFirst(TIFF*, void* errors, const char*, const char* format, va_list arguments) {
   auto& kept = *static_cast<std::string*>(errors);
   char text[512];
-  if (kept.empty() && std::vsnprintf(text, sizeof text, format, arguments) > 0) kept = text;
+  if (!kept.empty() || std::vsnprintf(text, sizeof text, format, arguments) <= 0) return 1;
+  try {
+    kept = text;
+  } catch (const std::bad_alloc&) {  // which may not pass through libtiff
+    kept = "out of memory";          // fits without an allocation
+  }
   return 1;  // handled: libtiff prints nothing
 }
 

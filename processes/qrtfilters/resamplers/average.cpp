@@ -41,7 +41,7 @@ void Average<T>::ResampleGeneral(gobs::Raster* src, gobs::Mask* srcMask, gobs::R
                                  double ratioX, double ratioY, double offsetX, double offsetY) {
   if (src->marginX < 1 || src->marginY < 1)
     throw Exception(
-        "You need a 1 pixel margin to process average resampling.",
+        N_("You need a 1 pixel margin to process average resampling."),
         "processes/qrtfilters/resamplers/average",
         detail::SignatureOf<T>("Average",
                                "ResampleGeneral(orin::gobs::Raster*, orin::gobs::Mask*, "

@@ -27,7 +27,7 @@ class Average final : public Resampler {
   void ResampleGeneral(gobs::Raster* src, gobs::Mask* srcMask, gobs::Raster* dst, double ratioX,
                        double ratioY, double offsetX, double offsetY);
 
-  uint32_t GetMargin() const override { return 1; }
+  uint32_t GetMargin() override { return 1; }
 };
 
 }  // namespace orin::resamplers

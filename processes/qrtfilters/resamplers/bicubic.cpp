@@ -50,7 +50,8 @@ struct BicubicMethod {
 
 template <class T>
 void Bicubic<T>::Resample(gobs::Raster* src, gobs::Mask* srcMask, gobs::Raster* dst) {
-  detail::RequireMargin(*src, GetMargin(), "Input rasters must have at least a 3 pixels margin.");
+  detail::RequireMargin(*src, GetMargin(),
+                        N_("Input rasters must have at least a 3 pixels margin."));
   detail::RequireSameChannels(*src, *dst);
   detail::ResampleNeighbourhoods<BicubicMethod<T>, T>(state_, *src, srcMask, *dst);
 }
@@ -58,7 +59,7 @@ void Bicubic<T>::Resample(gobs::Raster* src, gobs::Mask* srcMask, gobs::Raster* 
 template <class T>
 void Bicubic<T>::SetComplex(bool isComplex) {
   if (isComplex)
-    throw Exception("complex data not supported for this resampling method.",
+    throw Exception(N_("complex data not supported for this resampling method."),
                     "processes/qrtfilters/resamplers/bicubic",
                     detail::SignatureOf<T>("Bicubic", "SetComplex(bool)"), 238);
 }

@@ -15,7 +15,7 @@ class Bicubic final : public Resampler {
   /// value; for another one that is clear, that pixel stands in.
   /// \throws orin::Exception  a margin of `src` is below 3, then the channel counts differ
   void Resample(gobs::Raster* src, gobs::Mask* srcMask, gobs::Raster* dst) override;
-  uint32_t GetMargin() const override { return 3; }
+  uint32_t GetMargin() override { return 3; }
   /// \throws orin::Exception  `isComplex` is true; the state is unchanged
   void SetComplex(bool isComplex) override;
 };

@@ -36,7 +36,7 @@ struct BilinearMethod {
 
 template <class T>
 void Bilinear<T>::Resample(gobs::Raster* src, gobs::Mask* srcMask, gobs::Raster* dst) {
-  detail::RequireMargin(*src, 1, "Input rasters must have at least a one pixel margin.");
+  detail::RequireMargin(*src, 1, N_("Input rasters must have at least a one pixel margin."));
   detail::RequireSameChannels(*src, *dst);
   detail::ResampleNeighbourhoods<BilinearMethod<T>, T>(state_, *src, srcMask, *dst);
 }
@@ -44,7 +44,7 @@ void Bilinear<T>::Resample(gobs::Raster* src, gobs::Mask* srcMask, gobs::Raster*
 template <class T>
 void Bilinear<T>::SetComplex(bool isComplex) {
   if (isComplex)  // deliberate: the wording is this method's own
-    throw Exception("Complex data is not supported for this resampling method",
+    throw Exception(N_("Complex data is not supported for this resampling method"),
                     "processes/qrtfilters/resamplers/bilinear",
                     detail::SignatureOf<T>("Bilinear", "SetComplex(bool)"), 208);
 }

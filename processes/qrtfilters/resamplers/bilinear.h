@@ -14,7 +14,7 @@ class Bilinear final : public Resampler {
   /// for another one that is clear, the upper left stands in.
   /// \throws orin::Exception  a margin of `src` is below 1, then the channel counts differ
   void Resample(gobs::Raster* src, gobs::Mask* srcMask, gobs::Raster* dst) override;
-  uint32_t GetMargin() const override { return 1; }
+  uint32_t GetMargin() override { return 1; }
   /// \throws orin::Exception  `isComplex` is true; the state is unchanged
   void SetComplex(bool isComplex) override;
 };

@@ -55,7 +55,8 @@ struct ModeMethod {
 
 template <class T>
 void Mode<T>::Resample(gobs::Raster* src, gobs::Mask* srcMask, gobs::Raster* dst) {
-  detail::RequireMargin(*src, GetMargin(), "Input rasters must have at least a one pixel margin.");
+  detail::RequireMargin(*src, GetMargin(),
+                        N_("Input rasters must have at least a one pixel margin."));
   detail::RequireSameChannels(*src, *dst);
   detail::ResampleNeighbourhoods<ModeMethod<T>, T>(state_, *src, srcMask, *dst);
 }
@@ -63,7 +64,7 @@ void Mode<T>::Resample(gobs::Raster* src, gobs::Mask* srcMask, gobs::Raster* dst
 template <class T>
 void Mode<T>::SetComplex(bool isComplex) {
   if (isComplex)
-    throw Exception("complex data not supported for this resampling method.",
+    throw Exception(N_("complex data not supported for this resampling method."),
                     "processes/qrtfilters/resamplers/mode",
                     detail::SignatureOf<T>("Mode", "SetComplex(bool)"), 218);
 }

@@ -1,8 +1,6 @@
 // SPDX-License-Identifier: MIT
 #include "processes/qrtfilters/resamplers/nearestneighbour.h"
 
-#include <vector>
-
 #include "processes/qrtfilters/resamplers/detail/axismapping.h"
 #include "processes/qrtfilters/resamplers/detail/checks.h"
 #include "processes/qrtfilters/resamplers/detail/copypixels.h"
@@ -23,9 +21,9 @@ uint32_t SourceIndex(double coordinate, uint32_t size) {
   return index < size ? index : size - 1;
 }
 
-std::vector<uint32_t> SourceIndices(const detail::AxisMapping& mapping, uint32_t dstSize,
-                                    uint32_t srcSize) {
-  std::vector<uint32_t> indices(dstSize);
+Scratch<uint32_t> SourceIndices(const detail::AxisMapping& mapping, uint32_t dstSize,
+                                uint32_t srcSize) {
+  Scratch<uint32_t> indices(dstSize);
   for (uint32_t i = 0; i < dstSize; ++i) indices[i] = SourceIndex(mapping.Anchor(i), srcSize);
   return indices;
 }
@@ -36,7 +34,7 @@ template <class T>
 void NearestNeighbour<T>::Resample(gobs::Raster* src, gobs::Mask* srcMask, gobs::Raster* dst) {
   detail::RequireSameChannels(*src, *dst);
   const uint64_t components = uint64_t{src->channelCount} * (state_.isComplex ? 2 : 1);
-  const std::vector<T> noData(components, detail::Saturate<T>(state_.noDataValue));
+  const Scratch<T> noData(components, detail::Saturate<T>(state_.noDataValue));
   if (!detail::HasData(*src, srcMask))
     return detail::FillBlock(*dst, gobs::ViewOf<T>(*dst, state_.isComplex ? 2 : 1), noData);
   const detail::SourceMapping mapping = detail::MappingOf(state_, *src, *dst);

@@ -13,7 +13,7 @@ class NearestNeighbour final : public Resampler {
   /// A source pixel that `srcMask` has clear gives the no-data value in every component.
   /// \throws orin::Exception  the channel counts differ
   void Resample(gobs::Raster* src, gobs::Mask* srcMask, gobs::Raster* dst) override;
-  uint32_t GetMargin() const override { return 0; }
+  uint32_t GetMargin() override { return 0; }
 };
 
 }  // namespace orin::resamplers

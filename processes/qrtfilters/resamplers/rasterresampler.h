@@ -19,7 +19,7 @@ class IRasterResampler {
   /// \throws orin::Exception  what the method cannot take; `dst` is untouched
   virtual void Resample(gobs::Raster* src, gobs::Mask* srcMask, gobs::Raster* dst) = 0;
   /// Pixels that the method reads around the source block, on every side.
-  virtual uint32_t GetMargin() const = 0;
+  virtual uint32_t GetMargin() = 0;
   /// Scale factors, destination size over source size; kept until `ClearRatio`.
   virtual void SetRatio(double ratioX, double ratioY) = 0;
   /// Whether every sample has two components. \throws orin::Exception  the method refuses complex

@@ -16,7 +16,7 @@ class IResamplerFactory {
   /// \throws orin::Exception  the method serves no such type
   virtual IRasterResampler* CreateResampler(const gobs::DataType& type) = 0;
   /// The margin of the method, as its resamplers report it.
-  virtual uint32_t GetMargin() const = 0;
+  virtual uint32_t GetMargin() = 0;
   virtual ~IResamplerFactory() = default;
 };
 

@@ -22,11 +22,10 @@ ResamplerManager::~ResamplerManager() { delete resampler; }
 
 void ResamplerManager::ProcessBlock(gobs::Raster* in, gobs::Raster* out) {
   if (!factory)
-    throw Exception(
-        "The ResamplerManager has not been setup correctly. Ensure the IResamplerFactory has been "
-        "set "
-        "for the ResamplerManager before proceeding.",
-        kSource, kProcessBlock, 37);
+    throw Exception(N_("The ResamplerManager has not been setup correctly. Ensure the "
+                       "IResamplerFactory has been "
+                       "set for the ResamplerManager before proceeding."),
+                    kSource, kProcessBlock, 37);
   if (!resampler || !(in->dataType == dataType)) RenewKernel(in->dataType);
   const std::unique_ptr<gobs::Mask> mask(maskBuilder ? maskBuilder->BuildMask(*in) : nullptr);
   resampler->Resample(in, mask.get(), out);

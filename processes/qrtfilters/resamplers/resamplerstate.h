@@ -2,6 +2,7 @@
 // SPDX-License-Identifier: MIT
 #pragma once
 
+#include "basic/gobs/outofmemory.h"
 #include "processes/qrtfilters/resamplers/rasterresampler.h"
 
 namespace orin::resamplers {
@@ -25,7 +26,7 @@ struct ResamplerState {
 };
 
 /// Base of the kernels: everything of the interface but `Resample` and `GetMargin`.
-class Resampler : public IRasterResampler {
+class Resampler : public IRasterResampler, public ThrowsOutOfMemory {
  public:
   void SetRatio(double ratioX, double ratioY) override {
     state_.ratioX = ratioX;

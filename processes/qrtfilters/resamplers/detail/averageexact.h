@@ -4,7 +4,6 @@
 
 #include <array>
 #include <cstdint>
-#include <vector>
 
 #include "basic/gobs/mask/validity.h"
 #include "basic/gobs/raster.h"
@@ -76,7 +75,7 @@ template <template <class> class Mean, int kFactor, class T>
 void AverageExact(const gobs::Raster& src, const gobs::Mask* srcMask, const gobs::Raster& dst,
                   double noData) {
   if (!HasData(src, srcMask)) {
-    std::vector<T> pixel(Mean<T>::kComponents);
+    Scratch<T> pixel(Mean<T>::kComponents);
     pixel[0] = Saturate<T>(noData);
     return FillBlock(dst, gobs::ViewOf<T>(dst, Mean<T>::kComponents), pixel);
   }

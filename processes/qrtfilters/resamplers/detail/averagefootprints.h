@@ -4,7 +4,6 @@
 
 #include <algorithm>
 #include <cstdint>
-#include <vector>
 
 #include "basic/gobs/mask/validity.h"
 #include "basic/gobs/raster.h"
@@ -17,9 +16,9 @@ namespace orin::resamplers::detail {
 
 /// The footprints of all destination columns or rows, cut to what the source's buffer holds. The
 /// last buffer line is never read.
-inline std::vector<Footprint> FootprintsOf(const AxisMapping& mapping, uint32_t dstSize,
-                                           const BufferRange& range) {
-  std::vector<Footprint> footprints(dstSize);
+inline Scratch<Footprint> FootprintsOf(const AxisMapping& mapping, uint32_t dstSize,
+                                       const BufferRange& range) {
+  Scratch<Footprint> footprints(dstSize);
   for (uint32_t i = 0; i < dstSize; ++i) {
     const Footprint whole = mapping.Cover(i);
     footprints[i] = {std::max(whole.start, range.first), range.Clamp(whole.centre),
@@ -31,8 +30,8 @@ inline std::vector<Footprint> FootprintsOf(const AxisMapping& mapping, uint32_t 
 /// The pixel that is written for no data. Deliberate: the value goes to as many components as there
 /// are channels; the rest are 0.
 template <class T>
-std::vector<T> NoDataPixel(uint64_t channels, uint32_t componentsPerSample, double noData) {
-  std::vector<T> pixel(channels * componentsPerSample);
+Scratch<T> NoDataPixel(uint64_t channels, uint32_t componentsPerSample, double noData) {
+  Scratch<T> pixel(channels * componentsPerSample);
   std::fill_n(pixel.begin(), channels, Saturate<T>(noData));
   return pixel;
 }
@@ -98,10 +97,10 @@ class AverageFootprintsPass {
   gobs::PixelView<const T> src_;
   gobs::PixelView<T> dst_;
   uint64_t channels_;
-  std::vector<T> noData_;
+  Scratch<T> noData_;
   const T* lastSample_;
-  std::vector<Footprint> columns_;
-  std::vector<Footprint> rows_;
+  Scratch<Footprint> columns_;
+  Scratch<Footprint> rows_;
 };
 
 /// Fills `dst`. \param srcMask  null: every pixel is valid

@@ -18,8 +18,8 @@ inline void RequireMargin(const gobs::Raster& src, uint32_t margin, const char* 
 /// \throws orin::Exception  the channel counts differ
 inline void RequireSameChannels(const gobs::Raster& src, const gobs::Raster& dst) {
   if (src.channelCount != dst.channelCount)
-    throw Exception("Input and output rasters must have an equal number of channels. Aborting.", "",
-                    "", 0);
+    throw Exception(N_("Input and output rasters must have an equal number of channels. Aborting."),
+                    "", "", 0);
 }
 
 /// Signature text of a member of `Kernel<T>` that returns nothing.

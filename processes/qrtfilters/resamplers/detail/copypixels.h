@@ -3,7 +3,6 @@
 #pragma once
 
 #include <cstdint>
-#include <vector>
 
 #include "basic/gobs/mask/mask.h"
 #include "basic/gobs/raster.h"
@@ -17,9 +16,8 @@ struct PixelCopy {
   gobs::PixelView<uint8_t> dst;
   const gobs::Mask* srcMask;  ///< null: every pixel is valid
   const uint8_t* noData;      ///< the pixel that is written where `srcMask` is clear
-  std::vector<uint32_t>
-      columns;                 ///< inside the source's useful area, one for each destination column
-  std::vector<uint32_t> rows;  ///< likewise
+  Scratch<uint32_t> columns;  ///< inside the source's useful area, one for each destination column
+  Scratch<uint32_t> rows;     ///< likewise
 };
 
 void CopyPixels(const PixelCopy& job);

@@ -3,20 +3,9 @@
 #pragma once
 
 #include "basic/core/typedispatch/dispatchtype.h"
-#include "processes/qrtfilters/resamplers/rasterresampler.h"
+#include "processes/qrtfilters/resamplers/resamplerpolicy.h"
 
-namespace orin::resamplers {
-
-/// Makes `Method<T>` for the type dispatch.
-template <template <class> class Method>
-struct ResamplerPolicy {
-  template <class T>
-  struct Factory {
-    static IRasterResampler* Create() { return new Method<T>; }
-  };
-};
-
-namespace detail {
+namespace orin::resamplers::detail {
 
 /// True when kernels run here. Deliberate: no other target exists, and asking for one gives no
 /// resampler. Says so on standard output when `ORIN_TARGET` asks for the GPU.
@@ -30,5 +19,4 @@ IRasterResampler* CreateKernel(const gobs::DataType& type) {
                                     ResamplerPolicy<Method>::template Factory>::Dispatch(type);
 }
 
-}  // namespace detail
-}  // namespace orin::resamplers
+}  // namespace orin::resamplers::detail

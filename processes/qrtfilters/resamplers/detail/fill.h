@@ -3,7 +3,6 @@
 #pragma once
 
 #include <algorithm>
-#include <vector>
 
 #include "basic/gobs/mask/mask.h"
 #include "basic/gobs/raster.h"
@@ -20,8 +19,7 @@ inline bool HasData(const gobs::RasterInfo& src, const gobs::Mask* srcMask) {
 
 /// Fills the useful area of `dst` with copies of `pixel`.
 template <class T>
-void FillBlock(const gobs::Raster& dst, const gobs::PixelView<T>& out,
-               const std::vector<T>& pixel) {
+void FillBlock(const gobs::Raster& dst, const gobs::PixelView<T>& out, const Scratch<T>& pixel) {
   ParallelRows(dst.height, [&](uint32_t row) {
     T* at = out.At(0, row);
     if (pixel.size() == 1) std::fill_n(at, dst.width, pixel.front());

@@ -5,7 +5,6 @@
 #include <algorithm>
 #include <array>
 #include <cstdint>
-#include <vector>
 
 #include "basic/gobs/mask/validity.h"
 #include "basic/gobs/raster.h"
@@ -85,9 +84,9 @@ class NeighbourhoodPass {
     typename Method::Weights weights;
   };
 
-  static std::vector<Line> LinesOf(const AxisMapping& mapping, uint32_t size,
-                                   const BufferRange& range) {
-    std::vector<Line> lines(size);
+  static Scratch<Line> LinesOf(const AxisMapping& mapping, uint32_t size,
+                               const BufferRange& range) {
+    Scratch<Line> lines(size);
     for (uint32_t i = 0; i < size; ++i) {
       const auto place = Method::Locate(mapping, i);
       for (int k = 0; k < kSpan; ++k) lines[i].at[k] = range.Clamp(int64_t{place.at} + k - kCentre);
@@ -128,8 +127,8 @@ class NeighbourhoodPass {
   gobs::PixelView<T> dst_;
   uint64_t channels_;
   T noData_;
-  std::vector<Line> columns_;
-  std::vector<Line> rows_;
+  Scratch<Line> columns_;
+  Scratch<Line> rows_;
 };
 
 /// Fills `dst` by `Method`. \param srcMask  null: every pixel is valid
@@ -139,7 +138,7 @@ void ResampleNeighbourhoods(const ResamplerState& state, const gobs::Raster& src
                             const gobs::Mask* srcMask, const gobs::Raster& dst) {
   if (!HasData(src, srcMask))
     return FillBlock(dst, gobs::ViewOf<T>(dst, 1),
-                     std::vector<T>(dst.channelCount, Saturate<T>(state.noDataValue)));
+                     Scratch<T>(dst.channelCount, Saturate<T>(state.noDataValue)));
   const NeighbourhoodPass<Method, T> pass(state, src, dst);
   gobs::WithValidity(srcMask, [&](const auto& valid) { pass.Run(valid); });
 }

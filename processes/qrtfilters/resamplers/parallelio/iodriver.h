@@ -6,6 +6,7 @@
 #include <memory>
 #include <vector>
 
+#include "basic/gobs/blockmemory.h"
 #include "host/datasources/rasterreader.h"
 #include "host/datasources/rasterwriter.h"
 #include "host/services/exception.h"
@@ -52,16 +53,20 @@ class IODriver : public Base {
   bool HasWrittenAll() const { return hasWrittenAll_; }
 
  private:
-  using Blocks = std::vector<BlockJob>;
+  /// What one `Process` works on.
+  struct Level {
+    datasources::IRasterReader* reader;
+    datasources::IRasterWriter* writer;
+    gobs::BlockBuffers buffers;
+    std::vector<BlockJob> blocks;
+  };
 
   static gobs::Raster* ReadInput(const BlockJob& job, datasources::IRasterReader& reader);
   static void WriteOutput(BlockJob& job, datasources::IRasterWriter& writer);
   void ProcessOutput(BlockJob& job, datasources::IRasterWriter& writer);
-  void RunStep(Blocks& blocks, size_t step, datasources::IRasterReader* reader,
-               datasources::IRasterWriter* writer, ErrorHolder& error);
-  void RunSteps(Blocks& blocks, datasources::IRasterReader* reader,
-                datasources::IRasterWriter* writer);
-  static void Discard(Blocks& blocks);
+  void RunStep(Level& level, size_t step, ErrorHolder& error);
+  void RunSteps(Level& level);
+  static void Discard(std::vector<BlockJob>& blocks);
 
   bool hasWrittenAll_ = false;
 };
@@ -93,12 +98,11 @@ void IODriver<Processing, Access, Base>::ProcessOutput(BlockJob& job,
 }
 
 template <class Processing, class Access, class Base>
-void IODriver<Processing, Access, Base>::RunStep(Blocks& blocks, size_t step,
-                                                 datasources::IRasterReader* reader,
-                                                 datasources::IRasterWriter* writer,
-                                                 ErrorHolder& error) {
+void IODriver<Processing, Access, Base>::RunStep(Level& level, size_t step, ErrorHolder& error) {
+  std::vector<BlockJob>& blocks = level.blocks;
   const auto guarded = [&](auto&& work) {
     if (error.IsSet() || this->IsCancelled()) return;
+    const gobs::BlockBuffers::Use use(level.buffers);
     try {
       work();
     } catch (const Exception& exception) {
@@ -109,29 +113,28 @@ void IODriver<Processing, Access, Base>::RunStep(Blocks& blocks, size_t step,
   {
 #pragma omp section
     guarded([&] {
-      if (step + 1 < blocks.size() && reader)
-        blocks[step + 1].raster = ReadInput(blocks[step + 1], *reader);
+      if (step + 1 < blocks.size() && level.reader)
+        blocks[step + 1].raster = ReadInput(blocks[step + 1], *level.reader);
     });
 #pragma omp section
-    guarded([&] { ProcessOutput(blocks[step], *writer); });
+    guarded([&] { ProcessOutput(blocks[step], *level.writer); });
 #pragma omp section
     guarded([&] {
-      if (step != 0) WriteOutput(blocks[step - 1], *writer);
+      if (step != 0) WriteOutput(blocks[step - 1], *level.writer);
     });
   }
 }
 
 template <class Processing, class Access, class Base>
-void IODriver<Processing, Access, Base>::RunSteps(Blocks& blocks,
-                                                  datasources::IRasterReader* reader,
-                                                  datasources::IRasterWriter* writer) {
+void IODriver<Processing, Access, Base>::RunSteps(Level& level) {
+  std::vector<BlockJob>& blocks = level.blocks;
   ErrorHolder error;
-  if (reader) blocks.front().raster = ReadInput(blocks.front(), *reader);
+  if (level.reader) blocks.front().raster = ReadInput(blocks.front(), *level.reader);
   for (size_t step = 0; step < blocks.size(); ++step) {
     if (this->IsCancelled()) break;
     this->Update(static_cast<float>(step) / static_cast<float>(blocks.size()));
     if (this->IsCancelled()) break;
-    RunStep(blocks, step, reader, writer, error);
+    RunStep(level, step, error);
     // Deliberate: the blocks still held are neither written nor destroyed, whatever state they are
     // in.
     if (error.IsSet()) throw Exception(error.Get());
@@ -139,7 +142,7 @@ void IODriver<Processing, Access, Base>::RunSteps(Blocks& blocks,
 }
 
 template <class Processing, class Access, class Base>
-void IODriver<Processing, Access, Base>::Discard(Blocks& blocks) {
+void IODriver<Processing, Access, Base>::Discard(std::vector<BlockJob>& blocks) {
   for (BlockJob& job : blocks) {
     delete job.raster;
     job.raster = nullptr;
@@ -150,10 +153,12 @@ template <class Processing, class Access, class Base>
 void IODriver<Processing, Access, Base>::Process(datasources::IRasterReader* reader,
                                                  datasources::IRasterWriter* writer) {
   hasWrittenAll_ = false;
-  Blocks blocks;
+  Level level{reader, writer, {}, {}};
+  std::vector<BlockJob>& blocks = level.blocks;
   this->ComputeBlocks(blocks, reader, writer);
   const OMPNested nested(true);
-  if (!blocks.empty()) RunSteps(blocks, reader, writer);
+  const gobs::BlockBuffers::Use use(level.buffers);
+  if (!blocks.empty()) RunSteps(level);
   if (this->IsCancelled()) {
     Discard(blocks);
     return;

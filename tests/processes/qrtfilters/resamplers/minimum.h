@@ -36,7 +36,7 @@ class Minimum final : public Resampler {
     detail::RequireSameChannels(*src, *dst);
     detail::ResampleNeighbourhoods<MinimumMethod<T>, T>(state_, *src, srcMask, *dst);
   }
-  uint32_t GetMargin() const override { return 1; }
+  uint32_t GetMargin() override { return 1; }
 };
 
 class MinimumResamplerFactory final : public IResamplerFactory {
@@ -44,7 +44,7 @@ class MinimumResamplerFactory final : public IResamplerFactory {
   IRasterResampler* CreateResampler(const gobs::DataType& type) override {
     return detail::CreateKernel<Minimum>(type);
   }
-  uint32_t GetMargin() const override { return 1; }
+  uint32_t GetMargin() override { return 1; }
 };
 
 }  // namespace orin::resamplers

@@ -58,7 +58,7 @@ TEST_F(Memory, ThatIsMissingForReadingIsAnExceptionThatNamesTheFile) {
   const auto dataset = Open(file_, datasources::kReadOnly);
   datasources::BasicReader reader(dataset.get(), {1, 2, 3}, false);
   gobs::Raster block({200, 160, 3, gobs::eDT_8U}, {});
-  EXPECT_EQ(file_ + ": not enough memory to read its pixels.",
+  EXPECT_EQ(file_ + ": cannot be read: there is not enough memory. Free memory, then run again.",
             FailureOf([&] { reader.Read(block); }));
   EXPECT_EQ("", FailureOf([] {}));
   reader.Read(block);  // goes on when there is memory again
@@ -72,7 +72,9 @@ TEST_F(Memory, ThatIsMissingForWritingIsAnExceptionAndTheFileStaysAsItWas) {
     accessor.CreateLevel(2);
     const std::unique_ptr<IRasterWriter> writer(accessor.CreateRasterWriter(2));
     const gobs::Raster block({100, 80, 3, gobs::eDT_8U}, {});
-    EXPECT_EQ(file_ + ": not enough memory to write its levels.",
+    EXPECT_EQ(file_ +
+                  ": its levels cannot be written: there is not enough memory. Free memory, then "
+                  "run the same command again to resume.",
               FailureOf([&] { writer->Write(block); }));
   }
   EXPECT_EQ(before, BytesOf(file_));

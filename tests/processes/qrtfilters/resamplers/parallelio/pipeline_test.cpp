@@ -67,6 +67,23 @@ TEST(Pipeline, NoMoreThanFourBlocksAreAliveAndNoneIsLeft) {
   EXPECT_EQ(before, LiveBlocks());
 }
 
+TEST(Pipeline, LargeBuffersAreHandedFromBlockToBlockAndReturnedAtTheEnd) {
+  LevelSetup level(400000);
+  level.driver.memoryBudget = 24 << 20;
+  const gobs::BlockMappings before = gobs::MappingsOfBlocks();
+  uint64_t most = 0;
+  level.factory.before = [&](const Raster&, const gobs::Mask*, const Raster&) {
+    most = std::max(most, gobs::MappingsOfBlocks().bytes);
+  };
+  level.Process();
+  const gobs::BlockMappings after = gobs::MappingsOfBlocks();
+  ASSERT_LE(4u, level.Writes());
+  EXPECT_EQ(before.bytes, after.bytes);
+  // Two sizes of input and of output at most, two of each alive.
+  EXPECT_GE(8u, after.count - before.count);
+  EXPECT_GE((24u << 20) + gobs::BlockBuffers::kMaxBytes, most - before.bytes);
+}
+
 TEST(Pipeline, BlocksOfTheWindowThatWasPlannedReachKernelAndWriter) {
   LevelSetup level;
   level.reader->SetMargin(3, 1, 2);
