@@ -95,7 +95,7 @@ std::unique_ptr<IDataset> OpenForBuild(const std::string& file, Placement placem
   std::optional<bool> external;
   if (placement != Placement::kAutomatic) external = placement == Placement::kExternal;
   bool isReadOnly = false;
-  return OpenForOverviews(file, external, isReadOnly);
+  return orin::overviews::OpenForOverviews(file, external, isReadOnly);
 }
 
 BuildPlan PlanBuild(const BuildOptions& options, const std::string& file) {

@@ -8,8 +8,10 @@
 #include <limits>
 
 #include "basic/core/typedispatch/pixeltypes.h"
+#include "basic/gobs/cancelled.h"
 #include "host/datasources/nodatastandin.h"
 #include "host/datasources/nodatavalue.h"
+#include "host/services/text.h"
 
 namespace orin::datasources {
 namespace {
@@ -40,8 +42,11 @@ std::string NoDataAnswers::StandInFor(const gobs::DataType& type) {
     if (known == type) return text;
   bool stopped = false;
   const std::string text = TextOf(FindNoDataStandIn(source_, type, stopped));
-  // What a stopped search found serves a run that is about to be stopped, and no other.
-  if (!stopped) standIns_.emplace_back(type, text);
+  if (stopped)
+    throw Cancelled(_("The search for a substitute no-data value was stopped."),
+                    "host/datasources/nodataanswers",
+                    "std::string NoDataAnswers::StandInFor(const gobs::DataType&)", 0);
+  standIns_.emplace_back(type, text);
   return text;
 }
 

@@ -33,6 +33,7 @@ class NoDataAnswers {
   /// is searched for a stand-in once for each type that needs one.
   /// \param declared  of a reader of `channels`, which are all of type `type`
   /// \throws orin::Exception  the image cannot be opened for the search
+  /// \throws orin::Cancelled  the user asked to stop it
   AuxiliaryData Answer(AuxiliaryData declared, const std::vector<unsigned>& channels,
                        const gobs::DataType& type);
 

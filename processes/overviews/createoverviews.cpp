@@ -69,7 +69,7 @@ bool CreateFileOverviews::OpenDataset(const std::string& name, IDataset** out) c
   bool readOnly = false;
   try {
     const auto external = automatic_ ? std::nullopt : std::optional<bool>(external_);
-    *out = OpenForOverviews(name, external, readOnly).release();
+    *out = orin::overviews::OpenForOverviews(name, external, readOnly).release();
   } catch (const orin::Exception&) {
     // deliberate: no dataset is the answer
   }
@@ -112,7 +112,9 @@ bool CreateFileOverviews::HasComplex() {
     channels.resize(raster->GetChannelCount());
     std::iota(channels.begin(), channels.end(), 1u);
   }
-  return std::any_of(channels.begin(), channels.end(), [raster](unsigned channel) {
+  const unsigned count = raster->GetChannelCount();
+  return std::any_of(channels.begin(), channels.end(), [raster, count](unsigned channel) {
+    if (channel < 1 || channel > count) return false;
     const HAutoPtr<orin::datasources::IChannelInfo> info(raster->GetChannelInfo(channel));
     return info->GetDataType().isComplex;
   });

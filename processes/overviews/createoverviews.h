@@ -39,7 +39,8 @@ class CreateFileOverviews {
   bool RasterDataExists() const;
   /// True when every listed channel exists; without a raster, when none is listed.
   bool ValidChannelList() const;
-  /// True when a listed channel (none listed: any) is complex.
+  /// True when a listed channel (none listed: any) is complex. Channels that the file does not have
+  /// are passed over.
   bool HasComplex();
 
   /// true: levels go to the side-car; false: into the file, and it is an error when they cannot.

@@ -35,7 +35,9 @@ bool Fail(const std::string& message, unsigned line) {
 }
 
 bool FailWith(const orin::Exception& exception) {
-  return Fail(_("Failed to create overviews.\n") + exception.GetMessage(), 913);
+  // Texts that are fixed in English are translated here, where they are shown.
+  return Fail(std::string(_("Failed to create overviews.\n")) + _(exception.GetMessage().c_str()),
+              913);
 }
 
 Channels AllChannels(unsigned count) {
@@ -85,9 +87,11 @@ bool CheckLevels(const Levels& levels, const IRasterDataset& raster, bool force)
 bool CheckInternalPlacement(IDataset* dataset, bool readOnly) {
   if (!SupportsInternalOverviews(dataset)) {
     const ZMBInfo_s* format = ZMBInfo[ZMBTestOpen(dataset->GetFileName().c_str())];
+    const std::string name =
+        format ? format->description : orin::datasources::FormatNameOf(*dataset);
     return Fail(FormatString(_("Error. You have requested overviews be created internally (with "
                                "KVX=NO) but that is not supported for %s files."),
-                             format->description.c_str()),
+                             name.c_str()),
                 658);
   }
   if (readOnly)
@@ -138,11 +142,11 @@ Levels MissingLevels(IRasterDataset& raster, const Levels& requested, const Chan
   return missing;
 }
 
-bool BuildLevels(const LevelRequest& request) {
+bool BuildLevels(const orin::overviews::LevelRequest& request) {
   bool result = false;
   orin::tarn::Counter::Update(0.0f);
   try {
-    result = LevelRun(request).Build();
+    result = orin::overviews::LevelRun(request).Build();
   } catch (const orin::Exception& exception) {
     FailWith(exception);
   }

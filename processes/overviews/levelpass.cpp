@@ -5,6 +5,7 @@
 #include <memory>
 #include <sstream>
 
+#include "basic/gobs/cancelled.h"
 #include "host/datasources/basicreader.h"
 #include "host/datasources/nodatamask.h"
 #include "host/datasources/overviewaccessors.h"
@@ -75,9 +76,7 @@ void Configure(parallelio::LevelDriver& driver, const PassRequest& request, doub
   driver.memoryBudget = kMemoryBudget;
 }
 
-}  // namespace
-
-PassResult BuildPass(const PassRequest& request, const PassReports& reports) {
+PassResult Build(const PassRequest& request, const PassReports& reports) {
   BasicReader fullResolution(request.raster, request.channels, false);
   NoData noData(fullResolution);
   BasicOverviewWriterAccessor accessor(request.raster, request.channels);
@@ -105,6 +104,16 @@ PassResult BuildPass(const PassRequest& request, const PassReports& reports) {
   else accessor.SetValid(1, request.level, true);
   result.isComplete = true;
   return result;
+}
+
+}  // namespace
+
+PassResult BuildPass(const PassRequest& request, const PassReports& reports) {
+  try {
+    return Build(request, reports);
+  } catch (const Cancelled&) {  // by the host, before the first block
+    return {.isComplete = false, .isCancelled = true};
+  }
 }
 
 }  // namespace orin::overviews

@@ -22,7 +22,7 @@ unsigned int GetDefaultDecimationLevels() {
   return IsPyramidFactor(factor) ? static_cast<unsigned>(factor) : kDefaultFactor;
 }
 
-unsigned int PyramidFactorOrDefault(long long factor) {
+unsigned int orin::overviews::PyramidFactorOrDefault(long long factor) {
   return IsPyramidFactor(factor) ? static_cast<unsigned>(factor) : GetDefaultDecimationLevels();
 }
 
@@ -33,7 +33,7 @@ bool CreateFileOverviews::GetLevelsToCompute(orin::datasources::IDataset* datase
   if (!raster) return false;
   if (levels_.empty())
     levels = ComputePyramidLevel(double(raster->GetWidth()), double(raster->GetHeight()),
-                                 PyramidFactorOrDefault(factor_));
+                                 orin::overviews::PyramidFactorOrDefault(factor_));
   else levels = levels_;  // as given: not sorted, repeated ones stay
   return true;
 }

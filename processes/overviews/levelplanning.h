@@ -6,5 +6,9 @@
 /// preference.
 unsigned int GetDefaultDecimationLevels();
 
+namespace orin::overviews {
+
 /// `factor` when it is 2 or 3, else the user's preference.
 unsigned int PyramidFactorOrDefault(long long factor);
+
+}  // namespace orin::overviews

@@ -41,7 +41,7 @@ unsigned SmallestValidLevel(IRasterDataset* raster, const std::vector<unsigned>&
 bool HasEnough(IRasterDataset* raster, const std::vector<unsigned>& channels, int factor) {
   const HAutoPtr<orin::datasources::IFormatDescriptor> notConsulted(raster->GetFormatDescriptor());
   unsigned step = SmallestValidLevel(raster, channels);
-  if (step < 2) step = PyramidFactorOrDefault(factor);
+  if (step < 2) step = orin::overviews::PyramidFactorOrDefault(factor);
   const orin::datasources::BasicReader reader(raster, {1}, false);
   const size_t expected =
       ComputePyramidLevel(double(reader.GetWidth()), double(reader.GetHeight()), step).size();

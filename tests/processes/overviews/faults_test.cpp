@@ -2,6 +2,9 @@
 // SPDX-License-Identifier: MIT
 #include <gtest/gtest.h>
 
+#include <clocale>
+
+#include "host/services/text.h"
 #include "tests/processes/overviews/overviewstesting.h"
 
 namespace orin::testing {
@@ -74,6 +77,23 @@ TEST(Fault, ThatIsNoHostExceptionPassesThrough) {
   host.FailAt("Create", 1, Fault::kStdRuntimeError);
   CreateFileOverviews job = JobFor("a.tif", {2});
   EXPECT_THROW(job.Generate(), std::runtime_error);
+}
+
+TEST(Fault, WithATextFixedInEnglishIsReportedInTheUsersLanguage) {
+  ASSERT_NE(nullptr, std::setlocale(LC_ALL, "C.UTF-8"));
+  setenv("LANGUAGE", "fr", 1);
+  BindTranslations(ORIN_LOCALE_DIR);
+  RecordingHost host;
+  host.Put("a.tif", NoiseOf(64, 48, 1));
+  CreateFileOverviews job = JobFor("a.tif", {2});
+  job.SetPyramidType(static_cast<QRTOverviewResampleType>(9));
+  EXPECT_FALSE(job.Generate());
+  unsetenv("LANGUAGE");
+  std::setlocale(LC_ALL, "C");
+  ASSERT_EQ(1u, host.Warnings().size());
+  EXPECT_EQ(std::string::npos, host.Warnings()[0].message.find("Failed"));
+  EXPECT_EQ(std::string::npos, host.Warnings()[0].message.find("has not been setup"));
+  EXPECT_NE(std::string::npos, host.Warnings()[0].message.find("IResamplerFactory"));
 }
 
 TEST(Fault, OfTheProcessingTargetIsReported) {

@@ -94,6 +94,13 @@ TEST(Job, IsComplexWhenAListedChannelIs) {
   EXPECT_TRUE(CreateFileOverviews("a.tif", {1, 2}).HasComplex());
 }
 
+TEST(Job, ChannelsThatDoNotExistAreNotComplex) {
+  RecordingHost host;
+  host.Put("a.tif", NoiseOf(8, 8, 1, gobs::DataTypeOf<float>(true)));
+  EXPECT_FALSE(CreateFileOverviews("a.tif", {0, 2, 4294967295u}).HasComplex());
+  EXPECT_TRUE(CreateFileOverviews("a.tif", {0, 2, 1}).HasComplex());
+}
+
 TEST(Job, OpensForUpdateAndStaysInsideAFileThatHoldsLevels) {
   RecordingHost host;
   host.Put("a.tif", NoiseOf(8, 8, 1));

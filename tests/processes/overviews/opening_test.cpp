@@ -15,7 +15,7 @@ struct Opened {
 
 Opened OpenIn(const std::string& file, std::optional<bool> external) {
   Opened answer;
-  const auto dataset = OpenForOverviews(file, external, answer.readOnly);
+  const auto dataset = overviews::OpenForOverviews(file, external, answer.readOnly);
   if (dataset) answer.format = datasources::FormatNameOf(*dataset);
   return answer;
 }
@@ -52,7 +52,7 @@ TEST_F(Opening, TellsWhetherUpdateWasRefused) {
 
 TEST_F(Opening, ThrowsTheReasonWhenThereIsNoWay) {
   bool readOnly = false;
-  EXPECT_THROW(OpenForOverviews("missing", std::nullopt, readOnly), Exception);
+  EXPECT_THROW(overviews::OpenForOverviews("missing", std::nullopt, readOnly), Exception);
   EXPECT_TRUE(readOnly);
 }
 

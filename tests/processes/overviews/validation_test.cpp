@@ -70,6 +70,18 @@ TEST(Validation, InternalLevelsNeedAFormatThatHoldsThem) {
           ZMBInfo[99]->description + " files.");
 }
 
+TEST(Validation, AFormatWithoutARecordIsCalledByItsName) {
+  RecordingHost host;
+  host.Put("a.odd", NoiseOf(64, 64, 1), 99);
+  CreateFileOverviews job = JobFor("a.odd", {2});
+  job.SaveToKvx(false);
+  ZMBInfo[99] = nullptr;
+  EXPECT_FALSE(job.Generate());
+  ExpectOneWarning(host, 658,
+                   "Error. You have requested overviews be created internally (with KVX=NO) but "
+                   "that is not supported for UNKNOWN files.");
+}
+
 TEST(Validation, InternalLevelsNeedAWritableFile) {
   RecordingHost host;
   drivers::MemoryRaster raster = NoiseOf(64, 64, 1);
