@@ -25,11 +25,12 @@ unsigned HfaLevelWriter::StoredTileWidth() const { return std::min(kTile, level_
 unsigned HfaLevelWriter::StoredTileHeight() const { return std::min(kTile, level_.height); }
 
 void HfaLevelWriter::OpenPixels() {
-  const std::vector<int> positions = store_.PositionsOf(level_.factor, level_.channels);
-  handle_ = std::make_unique<GdalHandle>(level_.path, store_.Format());
+  const HfaLevelPixels pixels = store_.PixelsOf(level_.factor, level_.channels);
+  view_ = pixels.view;
+  handle_ = std::make_unique<GdalHandle>(pixels.name, store_.Format());
   const GdalErrors errors;
-  for (size_t i = 0; i < positions.size(); ++i) {
-    GDALRasterBandH band = GDALGetOverview(handle_->Band(level_.channels[i]), positions[i]);
+  for (size_t i = 0; i < pixels.positions.size(); ++i) {
+    GDALRasterBandH band = GDALGetOverview(handle_->Band(level_.channels[i]), pixels.positions[i]);
     const bool fits = band && GDALGetRasterBandXSize(band) >= int(level_.width) &&
                       GDALGetRasterBandYSize(band) >= int(level_.height);
     errors.Require(fits, _("%s: cannot be read: %s."), level_.path);
@@ -82,13 +83,8 @@ void HfaLevelWriter::Write(const gobs::Raster& block) {
 }
 
 void HfaLevelWriter::Store(const gobs::Raster& block) {
-  if (!build_ || build_->isClosed) build_ = store_.BeginWriting(level_.factor, level_.channels);
-  for (unsigned i = 0; i < level_.channels.size(); ++i)
-    build_->update->WriteBlock(build_->bands[i], block, i, level_.width, level_.height);
-  for (uint64_t y = block.y; y < uint64_t{block.y} + block.height; ++y) {
-    const auto row = build_->covered.begin() + static_cast<std::ptrdiff_t>(y * level_.width);
-    std::fill(row + block.x, row + block.x + block.width, true);
-  }
+  if (!build_ || build_->IsClosed()) build_ = store_.BeginWriting(level_.factor, level_.channels);
+  build_->Write(block);
 }
 
 }  // namespace orin::drivers

@@ -54,9 +54,10 @@ class HfaLevelWriter final : public datasources::ReaderState<datasources::IRaste
 
   HfaLevelStore& store_;
   Level level_;
+  std::shared_ptr<HfaView> view_;       // outlives the handle; null where the file shows the level
   std::unique_ptr<GdalHandle> handle_;  // opened by the first Read
   std::vector<GDALRasterBandH> bands_;
-  std::shared_ptr<HfaBuild> build_;  // from the first Write on
+  std::shared_ptr<HfaLevelBuild> build_;  // from the first Write on
 };
 
 }  // namespace orin::drivers

@@ -1,6 +1,8 @@
 // SPDX-License-Identifier: MIT
 #include "host/drivers/gdal/hfanode.h"
 
+#include <algorithm>
+
 #include "host/services/exception.h"
 #include "host/services/text.h"
 
@@ -10,8 +12,7 @@ namespace {
 constexpr uint32_t kHeaderPointerAt = 16;
 constexpr uint32_t kHeaderBytes = 18;
 constexpr uint32_t kReadBytes = 120;  // of a node
-constexpr uint32_t kNameAt = 24, kNameBytes = 64;
-constexpr uint32_t kTypeAt = 88, kTypeBytes = 32;
+constexpr uint32_t kNameBytes = 64;
 
 constexpr unsigned kMostNodes = 100000;        // more is a loop, or no file to work with
 constexpr uint32_t kMostDataBytes = 64 << 20;  // of a node: the blocks of a file of 2 GB take 7 MB
@@ -32,25 +33,6 @@ uint32_t HfaNumberAt(std::string_view bytes, size_t at) {
 
 void PutHfaNumber(std::string& bytes, size_t at, uint32_t number) {
   for (size_t i = 0; i < 4; ++i) bytes.at(at + i) = static_cast<char>(number >> (8 * i) & 255);
-}
-
-std::vector<HfaPointer> PointersWithout(const std::vector<HfaNode>& children,
-                                        const std::function<bool(const HfaNode&)>& goes) {
-  std::vector<HfaPointer> pointers;
-  const HfaNode* kept = nullptr;  // the last one that stays
-  for (size_t i = 0; i < children.size(); ++i) {
-    if (!goes(children[i])) {
-      kept = &children[i];
-      continue;
-    }
-    size_t last = i;
-    while (last + 1 < children.size() && goes(children[last + 1])) ++last;
-    pointers.push_back({children[i].pointer, children[last].next});
-    if (last + 1 < children.size())
-      pointers.push_back({children[last + 1].position + kHfaPreviousAt, kept ? kept->position : 0});
-    i = last;
-  }
-  return pointers;
 }
 
 HfaTree::HfaTree(const std::string& path)
@@ -89,6 +71,13 @@ HfaNode HfaTree::Root() {
   return NodeAt(HfaNumberAt(Bytes(FileHeader().position, kHeaderBytes), kRootAt), 0);
 }
 
+std::string HfaTree::NodeBytes(const HfaNode& node) {
+  const uint64_t left = Size() - std::min<uint64_t>(Size(), node.position);
+  std::string bytes = Bytes(node.position, uint32_t(std::min<uint64_t>(kHfaNodeBytes, left)));
+  bytes.resize(kHfaNodeBytes);
+  return bytes;
+}
+
 std::vector<HfaNode> HfaTree::ChildrenOf(const HfaNode& parent) {
   std::vector<HfaNode> children;
   uint32_t pointer = parent.position + kHfaChildAt;
@@ -110,8 +99,8 @@ HfaNode HfaTree::NodeAt(uint32_t position, uint32_t pointer) {
           HfaNumberAt(bytes, kHfaChildAt),
           HfaNumberAt(bytes, kHfaDataAt),
           HfaNumberAt(bytes, kHfaDataAt + 4),
-          TextAt(bytes, kNameAt, kNameBytes),
-          TextAt(bytes, kTypeAt, kTypeBytes)};
+          TextAt(bytes, kHfaNameAt, kNameBytes),
+          TextAt(bytes, kHfaTypeAt, kHfaTypeBytes)};
 }
 
 }  // namespace orin::drivers

@@ -3,7 +3,6 @@
 #pragma once
 
 #include <cstdint>
-#include <functional>
 #include <memory>
 #include <string>
 #include <string_view>
@@ -16,9 +15,11 @@ namespace orin::drivers {
 // Positions within a node, bytes; all numbers of the format are little-endian.
 inline constexpr uint32_t kHfaNextAt = 0, kHfaPreviousAt = 4, kHfaParentAt = 8, kHfaChildAt = 12;
 inline constexpr uint32_t kHfaDataAt = 16;
-inline constexpr uint32_t kHfaNodeBytes = 128;  ///< the last four mean nothing
+inline constexpr uint32_t kHfaNameAt = 24, kHfaTypeAt = 88, kHfaTypeBytes = 32;
+inline constexpr uint32_t kHfaNodeBytes = 128;   ///< the last four mean nothing
+inline constexpr unsigned kDeepestHfaNode = 30;  ///< below the root; more is no file to work with
 
-/// A pointer of the tree that gets another value.
+/// A number of the file that leads to other bytes.
 struct HfaPointer {
   uint32_t position;
   uint32_t value;
@@ -42,11 +43,6 @@ uint32_t HfaNumberAt(std::string_view bytes, size_t at);
 /// Puts it there. \pre at + 4 <= bytes.size()
 void PutHfaNumber(std::string& bytes, size_t at, uint32_t number);
 
-/// What takes nodes out of the list of children that they stand in.
-/// \param children  all nodes of the list, in its order
-std::vector<HfaPointer> PointersWithout(const std::vector<HfaNode>& children,
-                                        const std::function<bool(const HfaNode&)>& goes);
-
 /// Reads the tree. Operations throw orin::Exception when it is damaged.
 class HfaTree {
  public:
@@ -54,12 +50,18 @@ class HfaTree {
   explicit HfaTree(const std::string& path);
 
   HfaNode Root();
+  /// The node that stands at `position`, which no other node needs to lead to.
+  HfaNode NodeAt(uint32_t position) { return NodeAt(position, 0); }
+  /// All bytes of a node; what lies behind the file's end counts as zeros.
+  std::string NodeBytes(const HfaNode& node);
   std::vector<HfaNode> ChildrenOf(const HfaNode& parent);
   std::string DataOf(const HfaNode& node) { return Bytes(node.data, node.dataBytes); }
   std::string Bytes(uint64_t position, uint32_t count);
 
   struct Header {
     uint32_t position, freeList, dictionary;
+    uint32_t RootPointer() const { return position + 8; }         ///< where the number stands
+    uint32_t DictionaryPointer() const { return position + 14; }  ///< the same
   };
   Header FileHeader();
   /// Of the file, bytes.

@@ -3,6 +3,7 @@
 
 #include <algorithm>
 #include <charconv>
+#include <iomanip>
 #include <sstream>
 #include <vector>
 
@@ -11,6 +12,8 @@ namespace orin::drivers {
 std::string HfaRecordKey(unsigned level) { return "ORIN_LEVEL_" + std::to_string(level); }
 
 namespace {
+
+constexpr size_t kPartDigits = 8;
 
 std::string Padded(std::string text, size_t length) {
   text.resize(std::max(length, text.size()), ' ');
@@ -38,6 +41,35 @@ std::optional<HfaRecord> ParseHfaRecord(const std::string& text, size_t channels
                        record.validity.find_first_not_of("-01") == std::string::npos;
   if (!isWhole) return std::nullopt;
   return record;
+}
+
+std::string HfaPendingKey(unsigned level) { return "ORIN_PENDING_" + std::to_string(level); }
+
+std::string ComposeHfaPending(const HfaPendingLevel& pending) {
+  std::ostringstream text;
+  for (const uint32_t part : pending.parts)
+    text << std::hex << std::setw(kPartDigits) << std::setfill('0') << part;
+  return text.str() + ";" + ComposeHfaRecord(pending.record);
+}
+
+std::optional<HfaPendingLevel> ParseHfaPending(const std::string& text, size_t channels) {
+  const size_t digits = kPartDigits * channels;
+  if (text.size() <= digits || text[digits] != ';') return std::nullopt;
+  const auto record = ParseHfaRecord(text.substr(digits + 1), channels);
+  if (!record) return std::nullopt;
+  HfaPendingLevel pending{*record, {}};
+  for (size_t i = 0; i < channels; ++i) {
+    const char* first = text.data() + i * kPartDigits;
+    uint32_t part = 0;
+    const auto [end, error] = std::from_chars(first, first + kPartDigits, part, 16);
+    if (error != std::errc() || end != first + kPartDigits) return std::nullopt;
+    pending.parts.push_back(part);
+  }
+  return pending;
+}
+
+bool AreAlike(const HfaRecord& one, const HfaRecord& other) {
+  return one.method == other.method && one.image.fingerprint == other.image.fingerprint;
 }
 
 std::string HfaProgramName() { return "Orin Overviews " ORIN_VERSION; }

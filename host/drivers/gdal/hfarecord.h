@@ -3,8 +3,10 @@
 // SPDX-License-Identifier: MIT
 #pragma once
 
+#include <cstdint>
 #include <optional>
 #include <string>
+#include <vector>
 
 #include "host/datasources/imagerecord.h"
 
@@ -22,6 +24,14 @@ struct HfaRecord {
   datasources::ImageRecord image = {};  ///< that it was computed from; blank when unknown
 };
 
+/// A level some of whose channels are finished and wait in the file for the others: no tree leads
+/// to them, so that other programs do not see half a level.
+struct HfaPendingLevel {
+  HfaRecord record;  ///< kHfaAbsent for the channels that do not wait
+  /// One a channel: where the node stands that becomes its level; 0 for those that do not wait.
+  std::vector<uint32_t> parts;
+};
+
 /// Name of the metadata item of the file that holds the record of `level`.
 std::string HfaRecordKey(unsigned level);
 /// The item's text, which ParseHfaRecord reads back. It ends with the stamp of `image`, and all
@@ -30,6 +40,17 @@ std::string ComposeHfaRecord(const HfaRecord& record);
 /// \param channels  of the image
 /// \returns nothing for a text that is no record of that many channels
 std::optional<HfaRecord> ParseHfaRecord(const std::string& text, size_t channels);
+
+/// Name of the item that tells of channels of `level` which wait for the others.
+std::string HfaPendingKey(unsigned level);
+/// The item's text: eight hexadecimal digits a channel, and the text of the record, whose lengths
+/// are fixed.
+std::string ComposeHfaPending(const HfaPendingLevel& pending);
+/// \returns nothing for a text that is none of that many channels
+std::optional<HfaPendingLevel> ParseHfaPending(const std::string& text, size_t channels);
+
+/// True when both tell of pixels that were computed in the same way from the same image.
+bool AreAlike(const HfaRecord& one, const HfaRecord& other);
 
 /// The name and version that levels are signed with.
 std::string HfaProgramName();

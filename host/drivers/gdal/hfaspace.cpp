@@ -3,12 +3,12 @@
 
 #include <algorithm>
 #include <array>
-#include <span>
 #include <string_view>
+#include <unordered_set>
 #include <utility>
 
 #include "host/drivers/gdal/hfablocks.h"
-#include "host/drivers/gdal/hfatree.h"
+#include "host/drivers/gdal/hfacatalogue.h"
 
 namespace orin::drivers {
 namespace {
@@ -30,22 +30,24 @@ constexpr std::string_view kPlainTypes[] = {"root",
                                             "Exfr_GenericXFormHeader",
                                             "Efga_Polynomial"};
 
-constexpr uint32_t kMostTextBytes = 1 << 20;
-constexpr unsigned kDeepestNode = 30;
+constexpr uint32_t kMaxTextBytes = 1 << 20;
+constexpr uint32_t kIdentityBytes = kHfaTypeAt + kHfaTypeBytes - kHfaDataAt;  // data, name, type
 
 class SpaceFinder {
  public:
-  explicit SpaceFinder(const std::string& path) : tree_(path) { space_.size = tree_.Size(); }
+  explicit SpaceFinder(const std::string& path) : path_(path), tree_(path) {
+    space_.size = tree_.Size();
+  }
 
   HfaSpace Find(const ByteRanges& given) {
-    UseHeader();
-    Walk(tree_.Root(), false, 0);
+    WalkAll();
     if (!isKnown_) return {space_.size, space_.size, {}, {}, {}};
-    space_.end = std::max(levels_.End(), others_.End());
+    space_.end = std::max(movable_.End(), others_.End());
     space_.free.Add({others_.End(), space_.size});
     space_.free.Add(given);
+    FreeReplacedNodes();
     space_.free.Remove({space_.size, UINT64_MAX});
-    space_.free.Remove(levels_);
+    space_.free.Remove(movable_);
     space_.free.Remove(others_);
     KeepMovablesApart();
     std::sort(space_.pointers.begin(), space_.pointers.end(),
@@ -53,25 +55,52 @@ class SpaceFinder {
     return std::move(space_);
   }
 
-  ByteRanges BytesOf(const HfaNode& node) {
-    Walk(node, true, 0);
-    return std::move(levels_);
+  ByteRanges Used() {
+    WalkAll();
+    others_.Add(movable_);
+    return std::move(others_);
   }
 
  private:
+  void WalkAll() {
+    UseHeader();
+    Walk(tree_.Root(), false, 0);
+    WalkPending();
+  }
+
+  /// Levels that wait: an item's text, which is no number, leads to their first nodes.
+  void WalkPending() {
+    const HfaCatalogue catalogue = ReadHfaCatalogue(path_, HfaLayersOf(tree_).size());
+    for (const auto& [level, pending] : catalogue.pending)
+      for (const uint32_t part : pending.parts) {
+        if (part == 0) continue;
+        Walk(tree_.NodeAt(part), true, 1);
+        std::erase_if(space_.movables, [&](const auto& m) { return m.position == part; });
+      }
+  }
+
   void UseHeader() {
     constexpr uint32_t kStartBytes = 20, kHeaderBytes = 18;
     const HfaTree::Header header = tree_.FileHeader();
     Use(0, kStartBytes);
     Use(header.position, kHeaderBytes);
     UseText(header.dictionary);
+    NotePointer(header.RootPointer(), tree_.Root().position);
     isKnown_ = isKnown_ && header.freeList == 0;
   }
 
   void Use(uint32_t start, uint64_t bytes) {
+    isLevel_ ? UseMovable(start, bytes) : Fix(start, bytes);
+  }
+
+  void UseMovable(uint32_t start, uint64_t bytes) {
     if (bytes == 0) return;
-    (isLevel_ ? levels_ : others_).Add({start, start + bytes});
-    if (isLevel_) space_.movables.push_back({start, static_cast<uint32_t>(bytes)});
+    movable_.Add({start, start + bytes});
+    space_.movables.push_back({start, static_cast<uint32_t>(bytes)});
+  }
+
+  void Fix(uint32_t start, uint64_t bytes) {
+    if (bytes > 0) others_.Add({start, start + bytes});
   }
 
   void NotePointer(uint32_t position, uint32_t value) {
@@ -80,7 +109,7 @@ class SpaceFinder {
 
   /// Of a text that ends with a zero.
   void UseText(uint32_t start) {
-    for (uint32_t bytes = 0; bytes < kMostTextBytes && start + uint64_t{bytes} < space_.size;) {
+    for (uint32_t bytes = 0; bytes < kMaxTextBytes && start + uint64_t{bytes} < space_.size;) {
       const uint64_t left = space_.size - start - bytes;
       const auto part = static_cast<uint32_t>(std::min<uint64_t>(4096, left));
       const size_t zero = tree_.Bytes(uint64_t{start} + bytes, part).find('\0');
@@ -137,15 +166,37 @@ class SpaceFinder {
     isLevel = isLevel || FactorOfHfaPart(node) != 0 || IsHfaNameList(node) ||
               node.name == "GDAL_MetaData";
     isLevel_ = isLevel;
-    Use(node.position, kHfaNodeBytes);
+    UseMovable(node.position, kHfaNodeBytes);
+    nodes_.insert(tree_.NodeBytes(node).substr(kHfaDataAt, kIdentityBytes));
     NotePointer(node.position + kHfaNextAt, node.next);
     NotePointer(node.position + kHfaPreviousAt, node.previous);
     NotePointer(node.position + kHfaParentAt, node.parent);
     NotePointer(node.position + kHfaChildAt, node.child);
     NotePointer(node.position + kHfaDataAt, node.data);
     UseData(node);
-    if (node.child != 0 && depth == kDeepestNode) tree_.Fail();
+    if (node.child != 0 && depth == kDeepestHfaNode) tree_.Fail();
     for (const HfaNode& child : tree_.ChildrenOf(node)) Walk(child, isLevel, depth + 1);
+  }
+
+  /// A change of the tree leaves its old nodes behind, in front of the image's data as well. Such a
+  /// one has the name, the type and the data of one that is used.
+  void FreeReplacedNodes() {
+    constexpr uint64_t kMaxBytes = 1 << 20;  // that are looked through
+    ByteRanges gaps;
+    gaps.Add({0, std::min(others_.End(), space_.size)});
+    gaps.Remove(others_);
+    gaps.Remove(movable_);
+    uint64_t looked = 0;
+    for (const auto& [start, end] : gaps) {
+      looked += end - start;
+      if (looked > kMaxBytes) return;
+      const std::string bytes = tree_.Bytes(start, static_cast<uint32_t>(end - start));
+      for (size_t at = 0; at + kHfaNodeBytes <= bytes.size();) {
+        const bool isNode = nodes_.contains(bytes.substr(at + kHfaDataAt, kIdentityBytes));
+        if (isNode) space_.free.Add({start + at, start + at + kHfaNodeBytes});
+        at += isNode ? kHfaNodeBytes : 1;
+      }
+    }
   }
 
   /// What is shared stays where it is.
@@ -166,84 +217,14 @@ class SpaceFinder {
     all = std::move(apart);
   }
 
+  std::string path_;
   HfaTree tree_;
   HfaSpace space_;
-  ByteRanges levels_, others_;
-  bool isLevel_ = false;  ///< what is being added belongs to levels
+  ByteRanges movable_, others_;
+  std::unordered_set<std::string> nodes_;  ///< what tells one from another
+  bool isLevel_ = false;                   ///< what is being added belongs to levels
   bool isKnown_ = true;
 };
-
-/// Where things go.
-class Moves {
- public:
-  /// Chooses places for what can move down. Large things first: they fit into fewer.
-  explicit Moves(HfaSpace& space) {
-    auto& all = space.movables;
-    std::stable_sort(all.begin(), all.end(),
-                     [](const auto& a, const auto& b) { return a.bytes > b.bytes; });
-    for (auto first = all.begin(); first != all.end();) {
-      const auto last = std::find_if(
-          first, all.end(), [&](const auto& other) { return other.bytes != first->bytes; });
-      PlaceAlike({first, last}, space.free);
-      first = last;
-    }
-  }
-
-  struct Move {
-    uint32_t bytes, to;
-  };
-  const std::map<uint32_t, Move>& All() const { return moves_; }
-
-  /// Where what stands at `position` will stand.
-  uint32_t Moved(uint32_t position) const {
-    auto at = moves_.upper_bound(position);
-    if (at == moves_.begin()) return position;
-    const auto& [from, move] = *--at;
-    return position - from < move.bytes ? move.to + (position - from) : position;
-  }
-
- private:
-  /// Things of one size, ascending: as many as can go to a lower place, the last ones, so that no
-  /// more move than there are places, and their order stays.
-  void PlaceAlike(std::span<const HfaMovable> alike, ByteRanges& free) {
-    const uint32_t bytes = alike.front().bytes;
-    std::vector<uint32_t> places;
-    while (places.size() < alike.size()) {
-      const auto place = free.TakeBefore(alike.back().position, bytes);
-      if (!place) break;
-      places.push_back(static_cast<uint32_t>(*place));
-    }
-    const auto fits = [&](size_t count) {
-      const auto last = alike.last(count);
-      for (size_t i = 0; i < count; ++i)
-        if (places[i] >= last[i].position) return false;
-      return true;
-    };
-    size_t count = 0, tooMany = places.size() + 1;
-    while (count + 1 < tooMany) {
-      const size_t middle = (count + tooMany) / 2;
-      (fits(middle) ? count : tooMany) = middle;
-    }
-    for (size_t i = 0; i < count; ++i) moves_[alike.last(count)[i].position] = {bytes, places[i]};
-    for (size_t i = count; i < places.size(); ++i)
-      free.Add({places[i], uint64_t{places[i]} + bytes});
-  }
-
-  std::map<uint32_t, Move> moves_;
-};
-
-/// What stands at `from`, as it is where it goes: its own pointers lead to where things will be.
-std::string CopyOf(PatchedFile& file, uint32_t from, uint32_t count, const HfaSpace& space,
-                   const Moves& moves) {
-  std::string bytes(count, '\0');  // what the file ends before was never written
-  file.Read(from, bytes.data(), bytes.size());
-  const auto first = std::lower_bound(
-      space.pointers.begin(), space.pointers.end(), from,
-      [](const HfaPointer& pointer, uint32_t at) { return pointer.position < at; });
-  for (auto at = first; at != space.pointers.end() && at->position - from + 4 <= count; ++at)
-    PutHfaNumber(bytes, at->position - from, moves.Moved(at->value));
-  return bytes;
-}
 
 }  // namespace
 
@@ -251,31 +232,6 @@ HfaSpace FindHfaSpace(const std::string& path, const ByteRanges& given) {
   return SpaceFinder(path).Find(given);
 }
 
-ByteRanges HfaBytesOf(const std::string& path, const HfaNode& node) {
-  return SpaceFinder(path).BytesOf(node);
-}
-
-uint64_t MoveHfaLevelsDown(const std::string& path, HfaSpace space) {
-  const Moves moves(space);
-  if (moves.All().empty()) return 0;
-  PatchedFile file(path);
-  uint64_t moved = 0;
-  for (const auto& [from, move] : moves.All()) {
-    const std::string bytes = CopyOf(file, from, move.bytes, space, moves);
-    file.WriteNow(move.to, bytes.data(), bytes.size());
-    moved += bytes.size();
-  }
-  std::string number(4, '\0');
-  for (const HfaPointer& pointer : space.pointers) {
-    const uint32_t value = moves.Moved(pointer.value);
-    // Pointers in what moves change in the copy alone: those in the original lead to originals.
-    if (value == pointer.value || moves.Moved(pointer.position) != pointer.position) continue;
-    PutHfaNumber(number, 0, value);
-    file.Write(pointer.position, number.data(), number.size());
-  }
-  file.RequireWritten();
-  file.Commit();
-  return moved;
-}
+ByteRanges UsedHfaBytes(const std::string& path) { return SpaceFinder(path).Used(); }
 
 }  // namespace orin::drivers

@@ -3,7 +3,10 @@
 
 #include <cpl_conv.h>
 
+#include <algorithm>
+
 #include "host/drivers/gdal/gdalerrors.h"
+#include "host/drivers/gdal/hfanodecopy.h"
 #include "host/drivers/gdal/hfatree.h"
 #include "host/services/exception.h"
 #include "host/services/text.h"
@@ -62,13 +65,6 @@ void HfaUpdate::Close() {
   dataset_ = nullptr;
 }
 
-void HfaUpdate::SetItem(const std::string& key, const std::string& text) {
-  const GdalErrors errors;
-  const CPLErr answer = GDALSetMetadataItem(dataset_, key.c_str(), text.c_str(), nullptr);
-  file_.RequireWritten();  // says why, which the library does not
-  errors.Require(answer == CE_None, CannotWrite(), path_);
-}
-
 void HfaUpdate::AddLevel(unsigned level, const std::vector<unsigned>& channels) {
   std::vector<int> bands(channels.begin(), channels.end());
   std::vector<int> before;
@@ -89,15 +85,6 @@ void HfaUpdate::AddLevel(unsigned level, const std::vector<unsigned>& channels) 
                          "cannot tell them apart. Choose another level, or build with --external."),
                        path_.c_str(), level),
           "host/drivers/gdal/hfaupdate", "orin::drivers::HfaUpdate::AddLevel", 0);
-}
-
-void HfaUpdate::OverwriteItem(const std::string& key, const std::string& text) {
-  const auto item = FindHfaItem(file_.LibraryName(), key);
-  if (!item || item->textBytes != text.size() + 1)
-    throw Exception(FormatString(CannotWrite(), path_.c_str(), _("another program changed it")),
-                    "host/drivers/gdal/hfaupdate", "orin::drivers::HfaUpdate::OverwriteItem", 0);
-  file_.WriteNow(item->text, text.data(), text.size());
-  file_.Sync();
 }
 
 GDALRasterBandH HfaUpdate::LevelBand(unsigned channel, int position) const {
@@ -138,14 +125,37 @@ void HfaUpdate::WriteBlock(GDALRasterBandH band, const gobs::Raster& block, unsi
   errors.Require(answer == CE_None, CannotWrite(), path_);
 }
 
-void HfaUpdate::Commit() {
-  {
-    const GdalErrors errors;
-    Close();
-    file_.RequireWritten();
-    errors.Require(true, CannotWrite(), path_);
-  }
-  file_.Commit();
+void HfaUpdate::Finish() {
+  const GdalErrors errors;
+  Close();
+  file_.RequireWritten();  // says why, which the library does not
+  errors.Require(true, CannotWrite(), path_);
+}
+
+uint32_t HfaUpdate::AppendPart(unsigned channel, unsigned level) {
+  HfaTree tree(file_.LibraryName());
+  const auto parts = HfaLayersOf(tree).at(channel - 1).parts;
+  const auto part = std::find_if(parts.begin(), parts.end(), [&](const HfaNode& node) {
+    return FactorOfHfaPart(node) == level;
+  });
+  if (part == parts.end()) tree.Fail();
+  const auto position = static_cast<uint32_t>(file_.Size());
+  const std::string bytes = HfaNodeCopy(tree, *part).BytesAt(position);
+  file_.Write(position, bytes.data(), bytes.size());
+  return position;
+}
+
+void HfaUpdate::Keep() {
+  file_.Keep();
+  // The library writes a longer dictionary where the file's does not know what a level is. It holds
+  // all that the other one holds, and may lead the way before anything needs it.
+  const HfaTree::Header there = HfaTree(path_).FileHeader();
+  const uint32_t dictionary = HfaTree(file_.LibraryName()).FileHeader().dictionary;
+  if (dictionary == there.dictionary) return;
+  std::string number(4, '\0');
+  PutHfaNumber(number, 0, dictionary);
+  file_.WriteNow(there.DictionaryPointer(), number.data(), number.size());
+  file_.Sync();
 }
 
 }  // namespace orin::drivers

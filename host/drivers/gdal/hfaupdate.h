@@ -1,4 +1,4 @@
-/// One change of an ERDAS Imagine file: done as a whole, or not at all.
+/// Pixels of a level of an ERDAS Imagine file, written by the library where no tree leads to.
 // SPDX-License-Identifier: MIT
 #pragma once
 
@@ -14,8 +14,9 @@
 
 namespace orin::drivers {
 
-/// Nothing that was there before changes until `Commit`; without it the file stays, or becomes
-/// again, what it was. For one thread at a time.
+/// The library writes them behind the end of the file; what it changes in the file's tree stays in
+/// memory. What was written becomes a part that a change of the tree can make a level of the file,
+/// or goes with the object. For one thread at a time.
 class HfaUpdate {
  public:
   /// \param renewed  of levels whose pixels get a new place, where they are all written anew
@@ -25,14 +26,9 @@ class HfaUpdate {
   HfaUpdate(const HfaUpdate&) = delete;
   HfaUpdate& operator=(const HfaUpdate&) = delete;
 
-  /// Sets a metadata item of the file.
-  void SetItem(const std::string& key, const std::string& text);
   /// Adds a level to `channels` (1-based), none of which has it.
   /// \throws orin::Exception  the file already holds a level of the same size, or it cannot be made
   void AddLevel(unsigned level, const std::vector<unsigned>& channels);
-  /// Puts another text of the same length into the item, at once and durably, before everything
-  /// else. \throws orin::Exception  there is no such item, or it cannot be written
-  void OverwriteItem(const std::string& key, const std::string& text);
   /// The level at `position` of the channel's list.
   GDALRasterBandH LevelBand(unsigned channel, int position) const;
   /// Stores one channel of a block, and where the block ends at the level's last column or row, the
@@ -41,9 +37,15 @@ class HfaUpdate {
   /// \param width   of the level in whole pixels, rounded down
   void WriteBlock(GDALRasterBandH band, const gobs::Raster& block, unsigned index, unsigned width,
                   unsigned height);
-  /// Closes the file and makes everything durable. Nothing else may follow.
+  /// Closes the file for the library. Only `AppendPart` and `Keep` may follow.
   /// \throws orin::Exception  something could not be written
-  void Commit();
+  void Finish();
+  /// Appends the channel's level once more, as a node with what belongs to it. Its pixels are those
+  /// that were written. \returns where it stands
+  uint32_t AppendPart(unsigned channel, unsigned level);
+  /// Makes the parts durable, which stay in the file from then on.
+  /// \throws orin::Exception  something could not be written
+  void Keep();
 
  private:
   void Close();

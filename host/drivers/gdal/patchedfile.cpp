@@ -21,7 +21,7 @@ PatchedFile::PatchedFile(std::string path)
 PatchedFile::~PatchedFile() {
   HideFromLibrary(libraryName_);
   try {
-    if (!isCommitted_ && size_ > end_) file_.Truncate(end_);
+    if (!isKept_ && size_ > end_) file_.Truncate(end_);
   } catch (const std::exception&) {
     // deliberate: what is left behind is at the file's end, and nothing refers to it
   }
@@ -31,7 +31,7 @@ void PatchedFile::FailToWrite() const {
   throw Exception(FormatString(_("%s: cannot be written: %s. Free space or change the permissions, "
                                  "then run again."),
                                file_.Path().c_str(), std::strerror(error_)),
-                  "host/drivers/gdal/patchedfile", "PatchedFile::Commit()", 0);
+                  "host/drivers/gdal/patchedfile", "PatchedFile", 0);
 }
 
 PatchedFile::Page& PatchedFile::PageAt(uint64_t number) {
@@ -94,47 +94,13 @@ size_t PatchedFile::Read(uint64_t position, void* bytes, size_t count) {
   return got;
 }
 
-std::vector<FilePatch> PatchedFile::Waiting() const {
-  std::vector<FilePatch> patches;
-  uint64_t lastPage = 0;
-  for (const auto& [number, page] : pages_) {
-    const uint64_t start = number * kPageBytes;
-    const size_t length = std::min<uint64_t>(kPageBytes, end_ - start);
-    Page stored{};
-    if (file_.ReadUpTo(start, stored.data(), length).error != 0) stored.fill(0);
-    const auto first = std::mismatch(page.begin(), page.begin() + length, stored.begin()).first;
-    if (first == page.begin() + length) continue;
-    auto last = page.begin() + length;
-    while (*(last - 1) == stored[static_cast<size_t>(last - 1 - page.begin())]) --last;
-    const bool goesOn = !patches.empty() && lastPage + 1 == number;
-    if (goesOn) {  // one number may lie across the border: no write may cut it
-      FilePatch& before = patches.back();
-      const Page& pageBefore = pages_.at(lastPage);
-      const uint64_t filled = before.position + before.bytes.size();
-      before.bytes.append(pageBefore.data() + filled % kPageBytes,
-                          filled % kPageBytes == 0 ? 0 : start - filled);
-      before.bytes.append(page.begin(), last);
-    } else {
-      patches.push_back({start + static_cast<uint64_t>(first - page.begin()), {first, last}});
-    }
-    lastPage = number;
-  }
-  // Lists stand before what they name: the names come last, so that none leads to nothing.
-  std::reverse(patches.begin(), patches.end());
-  return patches;
-}
-
 void PatchedFile::RequireWritten() const {
   if (error_ != 0) FailToWrite();
 }
 
-void PatchedFile::Commit() {
-  const std::vector<FilePatch> patches = Waiting();
+void PatchedFile::Keep() {
   Sync();
-  isCommitted_ = true;  // from here on something may refer to what was appended
-  for (const FilePatch& patch : patches)
-    if (!PutThrough(patch.position, patch.bytes.data(), patch.bytes.size())) FailToWrite();
-  Sync();
+  isKept_ = true;
 }
 
 }  // namespace orin::drivers

@@ -1,5 +1,4 @@
-/// A file whose existing bytes a library changes in memory first, so that all changes of its
-/// structure reach the disk at once, in an order of ours, when everything they refer to is there.
+/// A file whose existing bytes a library changes in memory alone, while it appends to the file.
 // SPDX-License-Identifier: MIT
 #pragma once
 
@@ -7,41 +6,33 @@
 #include <cstdint>
 #include <map>
 #include <string>
-#include <vector>
+
+#include "host/drivers/gdal/libraryfile.h"
 
 #include "host/drivers/common/positionedfile.h"
 
 namespace orin::drivers {
 
-/// Bytes to be put over existing ones.
-struct FilePatch {
-  uint64_t position;
-  std::string bytes;
-};
-
 /// The library opens `LibraryName()`. What it appends goes to the file at once; what it writes over
-/// bytes that were there before stays here until `Commit`. Given up without it, the file is cut
-/// back to what it was. For one thread at a time.
-class PatchedFile {
+/// bytes that were there before stays here, and is gone with the object. The file is cut back to
+/// what it was then, unless what was appended is kept. For one thread at a time.
+class PatchedFile final : public ILibraryFile {
  public:
   /// \throws orin::Exception  the file cannot be opened for writing
   explicit PatchedFile(std::string path);
-  ~PatchedFile();
+  ~PatchedFile() override;
   PatchedFile(const PatchedFile&) = delete;
   PatchedFile& operator=(const PatchedFile&) = delete;
 
   /// Its last part is the file's own name.
   const std::string& LibraryName() const { return libraryName_; }
-  /// The overwrites that wait and change something, by descending position.
-  std::vector<FilePatch> Waiting() const;
-  /// Makes what was appended durable, then the waiting overwrites, each by one write.
-  /// \throws orin::Exception  a write of the library failed, or one of these does
-  void Commit();
-
-  /// Overwrites bytes that nothing refers to, or that may change before everything else, at once.
+  /// Makes durable what was appended, which stays from now on.
+  /// \throws orin::Exception  a write failed, or it cannot be made durable
+  void Keep();
+  /// Overwrites bytes of the file at once.
   void WriteNow(uint64_t position, const void* bytes, size_t count);
-  /// Makes durable what was written at once.
-  /// \throws orin::Exception  it cannot be
+  /// Makes durable what was written.
+  /// \throws orin::Exception  a write failed, or it cannot be made durable
   void Sync();
 
   /// Throws when a write failed, also one that the library said nothing of.
@@ -49,9 +40,9 @@ class PatchedFile {
   void RequireWritten() const;
 
   // For the library. A failed write is remembered: the library may not tell.
-  size_t Read(uint64_t position, void* bytes, size_t count);
-  size_t Write(uint64_t position, const void* bytes, size_t count);
-  uint64_t Size() const { return size_; }
+  size_t Read(uint64_t position, void* bytes, size_t count) override;
+  size_t Write(uint64_t position, const void* bytes, size_t count) override;
+  uint64_t Size() const override { return size_; }
 
  private:
   static constexpr size_t kPageBytes = 4096;
@@ -67,7 +58,7 @@ class PatchedFile {
   uint64_t size_;  ///< with what was appended
   std::map<uint64_t, Page> pages_;
   int error_ = 0;  ///< errno of the first write that failed
-  bool isCommitted_ = false;
+  bool isKept_ = false;
 };
 
 }  // namespace orin::drivers

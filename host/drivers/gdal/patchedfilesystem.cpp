@@ -9,7 +9,7 @@
 #include <mutex>
 #include <string_view>
 
-#include "host/drivers/gdal/patchedfile.h"
+#include "host/drivers/gdal/libraryfile.h"
 
 namespace orin::drivers {
 namespace {
@@ -18,7 +18,7 @@ constexpr char kPrefix[] = "/vsiorinpatched/";
 
 /// One opening of a file by the library.
 struct Cursor {
-  PatchedFile& file;
+  ILibraryFile& file;
   uint64_t position = 0;
   bool isAtEnd = false;
 };
@@ -29,7 +29,7 @@ class Directory {
     static Directory directory;
     return directory;
   }
-  std::string Add(PatchedFile& file, const std::string& fileName) {
+  std::string Add(ILibraryFile& file, const std::string& fileName) {
     const std::lock_guard lock(mutex_);
     const std::string name = std::to_string(++number_) + "/" + fileName;
     files_[name] = &file;
@@ -39,7 +39,7 @@ class Directory {
     const std::lock_guard lock(mutex_);
     files_.erase(name.substr(std::strlen(kPrefix)));
   }
-  PatchedFile* Find(std::string_view name) {
+  ILibraryFile* Find(std::string_view name) {
     if (name.starts_with(kPrefix)) name.remove_prefix(std::strlen(kPrefix));
     const std::lock_guard lock(mutex_);
     const auto found = files_.find(std::string(name));
@@ -48,14 +48,14 @@ class Directory {
 
  private:
   std::mutex mutex_;
-  std::map<std::string, PatchedFile*> files_;
+  std::map<std::string, ILibraryFile*> files_;
   unsigned number_ = 0;
 };
 
 Cursor& CursorOf(void* handle) { return *static_cast<Cursor*>(handle); }
 
 int Stat(void*, const char* name, VSIStatBufL* status, int) {
-  const PatchedFile* file = Directory::Instance().Find(name);
+  const ILibraryFile* file = Directory::Instance().Find(name);
   if (!file) return -1;
   std::memset(status, 0, sizeof *status);
   status->st_mode = S_IFREG;
@@ -64,7 +64,7 @@ int Stat(void*, const char* name, VSIStatBufL* status, int) {
 }
 
 void* Open(void*, const char* name, const char* access) {
-  PatchedFile* file = access[0] == 'r' ? Directory::Instance().Find(name) : nullptr;
+  ILibraryFile* file = access[0] == 'r' ? Directory::Instance().Find(name) : nullptr;
   return file ? new Cursor{*file} : nullptr;
 }
 
@@ -126,7 +126,7 @@ void Install() {
 
 }  // namespace
 
-std::string ShowToLibrary(PatchedFile& file, const std::string& fileName) {
+std::string ShowToLibrary(ILibraryFile& file, const std::string& fileName) {
   Install();
   return Directory::Instance().Add(file, fileName);
 }

@@ -1,4 +1,4 @@
-/// Where the library finds patched files: a file system of our own among its virtual ones.
+/// Where the library finds files of ours: a file system of our own among its virtual ones.
 // SPDX-License-Identifier: MIT
 #pragma once
 
@@ -6,11 +6,11 @@
 
 namespace orin::drivers {
 
-class PatchedFile;
+class ILibraryFile;
 
 /// Lets the library open `file` under the name that is returned, which ends in "/" and `fileName`.
 /// Nothing else is found beside it, and nothing can be made there.
-std::string ShowToLibrary(PatchedFile& file, const std::string& fileName);
+std::string ShowToLibrary(ILibraryFile& file, const std::string& fileName);
 void HideFromLibrary(const std::string& libraryName);
 
 }  // namespace orin::drivers

@@ -15,7 +15,6 @@ namespace {
 using datasources::BasicOverviewWriterAccessor;
 using datasources::IRasterWriter;
 using datasources::kUpdate;
-using drivers::FilePatch;
 using drivers::PatchedFile;
 using ::testing::HasSubstr;
 
@@ -117,6 +116,107 @@ TEST_F(HfaLevels, AreWrittenChannelByChannelAndReadBackAsSources) {
   source->Read(block);
   EXPECT_EQ(LevelPixel(130, 91, 2, 2), *PixelAddress(block, 0, 0));
   EXPECT_EQ(LevelPixel(149, 100, 2, 2), *PixelAddress(block, 20, 10));  // the edge, repeated
+}
+
+TEST_F(HfaLevels, OfSomeOfTheChannelsAreNotFinished) {
+  Build(*Open(file_, kUpdate), 2, {2});
+  const auto level = Open(file_, kUpdate)->GetSource()->Levels()->List().at(0);
+  EXPECT_EQ(datasources::LevelStatus::kUnfinished, level.status);
+  EXPECT_EQ("-1", Validity(file_, 2));
+  Build(*Open(file_, kUpdate), 2, {1});
+  EXPECT_EQ(datasources::LevelStatus::kCurrent,
+            Open(file_, kUpdate)->GetSource()->Levels()->List().at(0).status);
+}
+
+/// How many levels another program sees of each channel: "01"
+std::string SeenLevels(const std::string& file) {
+  const std::unique_ptr<GDALDataset> dataset(GDALDataset::Open(file.c_str()));
+  std::string counts;
+  for (int channel = 1; channel <= dataset->GetRasterCount(); ++channel)
+    counts += std::to_string(dataset->GetRasterBand(channel)->GetOverviewCount());
+  return counts;
+}
+
+/// A pixel of a level as a store reads it.
+int PixelOf(const std::string& file, unsigned level, unsigned channel) {
+  const auto dataset = Open(file, kUpdate);
+  BasicOverviewWriterAccessor accessor(dataset.get(), {channel});
+  const std::unique_ptr<IRasterWriter> source(accessor.CreateRasterWriter(level));
+  gobs::Raster block({20, 10, 1, gobs::eDT_8U}, {1, 1, 30, 40});
+  source->Read(block);
+  return *PixelAddress(block, 0, 0);
+}
+
+TEST_F(HfaLevels, AreSeenByOtherProgramsWhenNoChannelIsMissing) {
+  for (const char* const compressed : {"COMPRESSED=NO", "COMPRESSED=YES"}) {
+    std::filesystem::remove(file_);
+    WritePicture(file_, "HFA",
+                 {.width = kWidth, .height = kHeight, .channels = 2, .options = {compressed}});
+    Build(*Open(file_, kUpdate), 2, {2});
+    EXPECT_EQ("00", SeenLevels(file_));
+    EXPECT_EQ("-1", Validity(file_, 2));
+    EXPECT_EQ(LevelPixel(30, 40, 2, 2), PixelOf(file_, 2, 2));
+    Build(*Open(file_, kUpdate), 3, {2});
+    EXPECT_EQ("00", SeenLevels(file_));
+    EXPECT_EQ(LevelPixel(30, 40, 2, 2), PixelOf(file_, 2, 2));
+    EXPECT_EQ(LevelPixel(30, 40, 2, 3), PixelOf(file_, 3, 2));
+    Build(*Open(file_, kUpdate), 3, {1});
+    EXPECT_EQ("11", SeenLevels(file_));
+    EXPECT_EQ("-1", Validity(file_, 2));
+    Build(*Open(file_, kUpdate), 2, {1});
+    EXPECT_EQ("22", SeenLevels(file_));
+    EXPECT_EQ("11", Validity(file_, 2));
+    EXPECT_EQ("", WrongPixels(file_));
+  }
+}
+
+TEST_F(HfaLevels, ThatAreWrittenAnewAreSeenByOtherProgramsForAllChannelsAtOnce) {
+  Build(*Open(file_, kUpdate), 2, {1, 2});
+  Build(*Open(file_, kUpdate), 2, {1}, 1, "AVERAGE");
+  EXPECT_EQ("10", Validity(file_, 2));
+  EXPECT_EQ("", WrongPixels(file_, 0));
+  EXPECT_EQ(LevelPixel(30, 40, 1, 2, 1), PixelOf(file_, 2, 1));
+  EXPECT_EQ(LevelPixel(30, 40, 2, 2, 0), PixelOf(file_, 2, 2));
+  Build(*Open(file_, kUpdate), 2, {2}, 1, "AVERAGE");
+  EXPECT_EQ("11", Validity(file_, 2));
+  EXPECT_EQ("", WrongPixels(file_, 1));
+}
+
+TEST_F(HfaLevels, OfAChannelThatWaitsGoWhenTheOthersAreMadeInAnotherWay) {
+  Build(*Open(file_, kUpdate), 2, {1, 2});
+  Build(*Open(file_, kUpdate), 2, {1}, 1, "AVERAGE");
+  Build(*Open(file_, kUpdate), 2, {2}, 2, "MODE");
+  EXPECT_EQ("01", Validity(file_, 2));
+  Build(*Open(file_, kUpdate), 2, {1}, 2, "MODE");
+  EXPECT_EQ("11", Validity(file_, 2));
+  EXPECT_EQ("", WrongPixels(file_, 2));
+}
+
+TEST_F(HfaLevels, OfChannelsThatWaitAreRemovedAsWell) {
+  const auto size = std::filesystem::file_size(file_);
+  Build(*Open(file_, kUpdate), 2, {1});
+  Open(file_, kUpdate)->GetSource()->Levels()->Remove({2});
+  EXPECT_EQ("", Validity(file_, 2));
+  EXPECT_EQ("", WrongPixels(file_));
+  EXPECT_GE(size + 4096, std::filesystem::file_size(file_));
+  const std::unique_ptr<GDALDataset> dataset(GDALDataset::Open(file_.c_str()));
+  EXPECT_EQ(nullptr, dataset->GetMetadataItem("ORIN_PENDING_2"));
+}
+
+TEST_F(HfaLevels, OfChannelsThatWaitSurviveChangesByOtherPrograms) {
+  Build(*Open(file_, kUpdate), 2, {1});
+  {
+    const std::unique_ptr<GDALDataset> dataset(GDALDataset::Open(file_.c_str(), GDAL_OF_UPDATE));
+    dataset->SetMetadataItem("SENSOR", "camera");
+    dataset->GetRasterBand(1)->SetStatistics(1, 2, 3, 4);
+  }
+  Build(*Open(file_, kUpdate), 2, {2});
+  EXPECT_EQ("11", SeenLevels(file_));
+  EXPECT_EQ("11", Validity(file_, 2));
+  EXPECT_EQ("", WrongPixels(file_));
+  const std::unique_ptr<GDALDataset> dataset(GDALDataset::Open(file_.c_str()));
+  EXPECT_STREQ("camera", dataset->GetMetadataItem("SENSOR"));
+  EXPECT_STREQ("2", dataset->GetRasterBand(1)->GetMetadataItem("STATISTICS_MAXIMUM"));
 }
 
 TEST_F(HfaLevels, AreWrittenForAllChannelsAtOnce) {
@@ -257,60 +357,6 @@ TEST_F(HfaLevels, OfACopiedFileAreNotItsOwnAndNoneAreWrittenInside) {
   EXPECT_TRUE(Open(File("copy.img"))->GetSource()->Levels()->List().empty());
 }
 
-/// The library's own change of a file: one more level with its pixels, and an item.
-void AddLevel(const std::string& libraryName, int factor) {
-  const drivers::GdalErrors errors;
-  CPLSetThreadLocalConfigOption("GDAL_PAM_ENABLED", "NO");
-  {
-    const std::unique_ptr<GDALDataset> dataset(
-        GDALDataset::Open(libraryName.c_str(), GDAL_OF_UPDATE));
-    ASSERT_TRUE(dataset);
-    ASSERT_EQ(CE_None, dataset->BuildOverviews("NONE", 1, &factor, 0, nullptr, nullptr, nullptr));
-    for (int channel = 1; channel <= 2; ++channel) {
-      GDALRasterBand& band = *dataset->GetRasterBand(channel);
-      GDALRasterBand& level = *band.GetOverview(band.GetOverviewCount() - 1);
-      for (int y = 0; y < level.GetYSize(); ++y) {
-        std::vector<uint8_t> row(size_t(level.GetXSize()));
-        for (size_t x = 0; x < row.size(); ++x)
-          row[x] = LevelPixel(uint32_t(x), uint32_t(y), unsigned(channel), unsigned(factor));
-        ASSERT_EQ(CE_None, level.RasterIO(GF_Write, 0, y, level.GetXSize(), 1, row.data(),
-                                          level.GetXSize(), 1, GDT_Byte, 0, 0, nullptr));
-      }
-    }
-    dataset->SetMetadataItem(drivers::HfaRecordKey(unsigned(factor)).c_str(), "record");
-  }
-  CPLSetThreadLocalConfigOption("GDAL_PAM_ENABLED", nullptr);
-  EXPECT_FALSE(errors.Any()) << errors.Reason();
-}
-
-/// The process may end between any two of the writes that a commit consists of; the next build
-/// finishes the level.
-TEST_F(HfaLevels, AreWholeOrAbsentAfterEveryWriteOfACommit) {
-  std::filesystem::create_directory(File("state"));
-  for (const int factor : {2, 3, 5, 9, 17}) {
-    PatchedFile patched(file_);
-    AddLevel(patched.LibraryName(), factor);
-    const std::vector<FilePatch> patches = patched.Waiting();
-    EXPECT_FALSE(patches.empty());
-    std::string state = BytesOf(file_);  // everything is appended
-    for (size_t done = 0; done <= patches.size(); ++done) {
-      if (done > 0)
-        state.replace(patches[done - 1].position, patches[done - 1].bytes.size(),
-                      patches[done - 1].bytes);
-      WriteBytes(File("state/image.img"), state);  // its own name is stored in the file
-      EXPECT_EQ("", WrongPixels(File("state/image.img"))) << factor << " after " << done;
-      EXPECT_EQ("", RefusalOf([&] {
-                  Build(*Open(File("state/image.img"), kUpdate), unsigned(factor), {1, 2});
-                }))
-          << factor << " after " << done << " of " << patches.size();
-      EXPECT_EQ("11", Validity(File("state/image.img"), unsigned(factor)));
-      EXPECT_EQ("", WrongPixels(File("state/image.img"))) << factor << " built after " << done;
-    }
-    patched.Commit();
-    EXPECT_EQ(state, BytesOf(file_));
-  }
-}
-
 uint64_t SizeWithLevels(const std::string& file, const std::vector<unsigned>& levels) {
   WritePicture(file, "HFA", {.width = kWidth, .height = kHeight, .channels = 2});
   for (const unsigned level : levels) Build(*Open(file, kUpdate), level, {1, 2});
@@ -353,15 +399,16 @@ TEST_F(HfaLevels, ThatARemovalLeftInTheTreeAreMadeAnewAllTheSame) {
   for (const unsigned level : {2u, 3u}) Build(*Open(file_, kUpdate), level, {1, 2});
   {
     PatchedFile file(file_);
-    drivers::HfaTree tree(file.LibraryName());
+    drivers::HfaTree tree(file_);
     for (const auto& layer : drivers::HfaLayersOf(tree))
       for (const auto& part : layer.parts) {
         if (!drivers::IsHfaNameList(part)) continue;
-        const auto list = drivers::NamesWithout(tree.DataOf(part), {2});
-        const std::string data = drivers::PlaceHfaNameList(list.data, part.data);
-        file.Write(part.data, data.data(), data.size());
+        drivers::HfaNameList list(tree.DataOf(part));
+        list.Remove({2});
+        const std::string data = list.DataAt(part.data);
+        ASSERT_EQ(part.dataBytes, data.size());
+        file.WriteNow(part.data, data.data(), data.size());
       }
-    file.Commit();
   }
   EXPECT_EQ("", Validity(file_, 2));
   Build(*Open(file_, kUpdate), 2, {1, 2});

@@ -54,5 +54,19 @@ TEST(HfaRecord, IsNoneWhenItIsOfAnotherNumberOfChannelsOrDamaged) {
   EXPECT_FALSE(ParseHfaRecord("", 3));
 }
 
+TEST(HfaRecord, OfChannelsThatWaitSaysWhereTheyStand) {
+  const HfaPendingLevel pending{{"NEAREST", 2, "program", "1-0"}, {0x12ab, 0, 0xffffffff}};
+  const std::string text = ComposeHfaPending(pending);
+  EXPECT_EQ("000012ab00000000ffffffff;" + ComposeHfaRecord(pending.record), text);
+  const auto read = ParseHfaPending(text, 3);
+  ASSERT_TRUE(read);
+  EXPECT_EQ(pending.parts, read->parts);
+  EXPECT_EQ("1-0", read->record.validity);
+  EXPECT_FALSE(ParseHfaPending(text, 2));
+  EXPECT_FALSE(ParseHfaPending(text, 4));
+  EXPECT_FALSE(ParseHfaPending("-" + text.substr(1), 3));
+  EXPECT_FALSE(ParseHfaPending(text.substr(0, 24), 3));
+}
+
 }  // namespace
 }  // namespace orin::drivers

@@ -3,7 +3,9 @@
 
 #include <cstring>
 
-#include "host/drivers/gdal/hfaremoval.h"
+#include "host/drivers/gdal/hfacompactor.h"
+#include "host/drivers/gdal/hfatree.h"
+#include "host/drivers/gdal/hfatreecopy.h"
 #include "tests/host/drivers/gdal/gdalfiles.h"
 
 namespace orin::tests {
@@ -45,6 +47,16 @@ class HfaBytes : public GdalFiles {
   std::string file_;
 };
 
+/// \returns the bytes that nothing refers to any more
+ByteRanges RemoveLevels(const std::string& file, const std::vector<unsigned>& levels) {
+  ByteRanges bytes = drivers::UsedHfaBytes(file);
+  drivers::HfaTreeChanges changes;
+  changes.removedLevels = levels;
+  drivers::ChangeHfaTree(file, changes);
+  bytes.Remove(drivers::UsedHfaBytes(file));
+  return bytes;
+}
+
 TEST_F(HfaBytes, OfAFileOfAnotherProgramAreNearlyAllUsed) {
   WriteLevels();
   const HfaSpace space = FindHfaSpace(file_, {});
@@ -78,7 +90,7 @@ TEST_F(HfaBytes, AreNeverFreeWhereAnUnknownNodeMayReferToThem) {
 
 TEST_F(HfaBytes, InFrontOfWhatIsNoLevelAreFreeOnlyWhenGiven) {
   WriteLevels();
-  const ByteRanges given = drivers::RemoveHfaLevels(file_, {2, 4, 8}, {});
+  const ByteRanges given = RemoveLevels(file_, {2, 4, 8});
   {  // what comes behind the levels that were
     const std::unique_ptr<GDALDataset> dataset(GDALDataset::Open(file_.c_str(), GDAL_OF_UPDATE));
     dataset->GetRasterBand(1)->SetStatistics(1, 2, 3, 4);
@@ -92,7 +104,7 @@ TEST_F(HfaBytes, OfRemovedLevelsAreTakenByTheOnesThatStay) {
     WriteLevels();
     const auto before = Levels();
     const auto size = FindHfaSpace(file_, {}).end;
-    const ByteRanges given = drivers::RemoveHfaLevels(file_, goes, {});
+    const ByteRanges given = RemoveLevels(file_, goes);
     EXPECT_EQ(3 - goes.size(), Levels().size());
     while (drivers::MoveHfaLevelsDown(file_, FindHfaSpace(file_, given)) > 0) {
     }
@@ -105,6 +117,22 @@ TEST_F(HfaBytes, OfRemovedLevelsAreTakenByTheOnesThatStay) {
     EXPECT_STREQ("camera", dataset->GetMetadataItem("SENSOR"));
     std::filesystem::remove(file_);
   }
+}
+
+/// The nodes stand between the image's data, and nothing but what they say tells that they are
+/// free.
+TEST_F(HfaBytes, OfNodesThatAChangedTreeReplacedAreFree) {
+  WriteLevels();
+  const uint64_t nodes = drivers::CountHfaNodes(file_) * drivers::kHfaNodeBytes;
+  {  // data of the image behind all nodes
+    const std::unique_ptr<GDALDataset> dataset(GDALDataset::Open(file_.c_str(), GDAL_OF_UPDATE));
+    dataset->GetRasterBand(1)->SetStatistics(1, 2, 3, 4);
+  }
+  const uint64_t before = FindHfaSpace(file_, {}).free.Size();
+  drivers::ChangeHfaTree(file_, {});
+  EXPECT_LE(before + nodes, FindHfaSpace(file_, {}).free.Size());
+  const std::unique_ptr<GDALDataset> dataset(GDALDataset::Open(file_.c_str()));
+  EXPECT_STREQ("camera", dataset->GetMetadataItem("SENSOR"));
 }
 
 TEST_F(HfaBytes, OfATreeThatIsARingAreNoneToFind) {

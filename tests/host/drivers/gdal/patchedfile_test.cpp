@@ -8,7 +8,6 @@
 namespace orin::tests {
 namespace {
 
-using drivers::FilePatch;
 using drivers::PatchedFile;
 
 class Patched : public GdalFiles {
@@ -45,17 +44,18 @@ TEST_F(Patched, ShowsTheLibraryWhatItWroteAndKeepsItFromTheFile) {
   EXPECT_TRUE(before_ == BytesOf(path_));
 }
 
-TEST_F(Patched, AppendsAtOnceAndOverwritesWhenCommitted) {
-  PatchedFile file(path_);
-  PutAt(file, 9998, "0123");
+TEST_F(Patched, KeepsWhatWasAppendedAndNothingElse) {
+  {
+    PatchedFile file(path_);
+    PutAt(file, 9998, "0123");
+    EXPECT_TRUE(before_ + "23" == BytesOf(path_));
+    EXPECT_TRUE(before_.substr(0, 9998) + "0123" == Seen(file));
+    file.Keep();
+  }
   EXPECT_TRUE(before_ + "23" == BytesOf(path_));
-  const std::string after = before_.substr(0, 9998) + "0123";
-  EXPECT_TRUE(after == Seen(file));
-  file.Commit();
-  EXPECT_TRUE(after == BytesOf(path_));
 }
 
-TEST_F(Patched, IsAsItWasWithoutACommit) {
+TEST_F(Patched, IsAsItWasWhenNothingIsKept) {
   {
     PatchedFile file(path_);
     PutAt(file, 10, "x");
@@ -64,52 +64,17 @@ TEST_F(Patched, IsAsItWasWithoutACommit) {
   EXPECT_TRUE(before_ == BytesOf(path_));
 }
 
-TEST_F(Patched, WaitsOnlyWithWhatChangesSomethingInOneWriteEach) {
-  PatchedFile file(path_);
-  PutAt(file, 9000, "x");
-  PutAt(file, 100, "aaaa");  // what is there already
-  PutAt(file, 500, "yaay");
-  const std::vector<FilePatch> waiting = file.Waiting();
-  ASSERT_EQ(2u, waiting.size());
-  EXPECT_EQ(500u, waiting[1].position);
-  EXPECT_EQ("yaay", waiting[1].bytes);
-  EXPECT_EQ(9000u, waiting[0].position);
-  EXPECT_EQ("x", waiting[0].bytes);
-}
-
-TEST_F(Patched, NeverCutsANumberThatLiesAcrossTwoPages) {
-  PatchedFile file(path_);
-  PutAt(file, 4094, "1234");
-  const std::vector<FilePatch> waiting = file.Waiting();
-  ASSERT_EQ(1u, waiting.size());
-  EXPECT_EQ(4094u, waiting[0].position);
-  EXPECT_EQ("1234", waiting[0].bytes);
-}
-
-TEST_F(Patched, JoinsChangesOfNeighbouringPagesWithWhatLiesBetween) {
-  PatchedFile file(path_);
-  PutAt(file, 4000, "x");
-  PutAt(file, 4200, "y");
-  const std::vector<FilePatch> waiting = file.Waiting();
-  ASSERT_EQ(1u, waiting.size());
-  EXPECT_EQ("x" + std::string(199, 'a') + "y", waiting[0].bytes);
-}
-
-TEST_F(Patched, OverwritesAtOnceWhatNobodyCountsOn) {
-  PatchedFile file(path_);
-  PutAt(file, 20, "y");  // of the same page
-  file.WriteNow(10, "x", 1);
+TEST_F(Patched, OverwritesAtOnceWhatIsToChangeNow) {
+  {
+    PatchedFile file(path_);
+    PutAt(file, 20, "y");  // of the same page
+    file.WriteNow(10, "x", 1);
+    EXPECT_EQ('x', BytesOf(path_)[10]);
+    EXPECT_EQ('x', Seen(file)[10]);
+    EXPECT_EQ('y', Seen(file)[20]);
+  }
   EXPECT_EQ('x', BytesOf(path_)[10]);
-  EXPECT_EQ('x', Seen(file)[10]);
-  const std::vector<FilePatch> waiting = file.Waiting();
-  ASSERT_EQ(1u, waiting.size());
-  EXPECT_EQ(20u, waiting[0].position);
-  EXPECT_EQ("y", waiting[0].bytes);
-}
-
-TEST_F(Patched, KeepsWhatWasWrittenAtOnceWithoutACommit) {
-  { PatchedFile(path_).WriteNow(10, "x", 1); }
-  EXPECT_EQ('x', BytesOf(path_)[10]);
+  EXPECT_EQ('a', BytesOf(path_)[20]);
 }
 
 TEST_F(Patched, LetsTheLibraryMakeNoOtherFile) {
