@@ -1,4 +1,4 @@
-/// The names in the text of a virtual raster.
+/// Fuzzes the text of a virtual raster: the names of its sources.
 // SPDX-License-Identifier: MIT
 #include "host/drivers/gdal/vrtnames.h"
 

@@ -216,6 +216,78 @@ class Palette(Case):
         self.assertIn("classes", answer.stderr)
 
 
+class Beside(Case):
+    """A value that stands in NAME.tif.aux.xml, where programs keep it for files that they may not
+    write."""
+
+    def setUp(self):
+        super().setUp()
+        self.pixels = random_pixels((2, 80, 90), numpy.uint8, 1)
+        self.pixels[:, 21:50, 11:70] = 60
+
+    def levels(self, name, beside="", no_data=None, method="average"):
+        """The level 2 of both channels, and which of its pixels hold data."""
+        file = self.path(name)
+        write_tiff(file, self.pixels, "Byte", no_data=no_data)
+        if beside:
+            with open(file + ".aux.xml", "w", encoding="utf-8") as text:
+                text.write(f"<PAMDataset>{beside}</PAMDataset>")
+        self.assertRan(run("build", file, "--levels", "2", "--method", method, "--internal"))
+        return read_pixels(file, 0), level_masks(file, 0)
+
+    def band(self, channel, value):
+        return f'<PAMRasterBand band="{channel}"><NoDataValue>{value}</NoDataValue></PAMRasterBand>'
+
+    def test_counts_as_one_in_the_tag_does(self):
+        everywhere = self.band(1, 60) + self.band(2, 60)
+        for method in ("average", "bilinear", "bicubic", "nearest", "mode"):
+            with self.subTest(method=method):
+                expected = self.levels(f"{method}-tag.tif", no_data=60, method=method)
+                found = self.levels(f"{method}.tif", everywhere, method=method)
+                self.assertSamePixels(expected[0], found[0])
+                self.assertSamePixels(expected[1], found[1])
+                plain = self.levels(f"{method}-none.tif", method=method)
+                self.assertEqual(method == "nearest",
+                                 expected[0].tobytes() == plain[0].tobytes())
+
+    def test_goes_before_the_tag_as_for_other_programs(self):
+        everywhere = self.band(1, 60) + self.band(2, 60)
+        expected = self.levels("tag.tif", no_data=60)
+        found = self.levels("both.tif", everywhere, no_data=7)
+        dataset = gdal.Open(self.path("both.tif"))
+        self.assertEqual(60, dataset.GetRasterBand(1).GetNoDataValue())
+        self.assertSamePixels(expected[0], found[0])
+
+    def test_of_one_channel_counts_there_alone(self):
+        write_tiff(self.path("one.tif"), self.pixels, "Byte")
+        with open(self.path("one.tif.aux.xml"), "w", encoding="utf-8") as text:
+            text.write(f"<PAMDataset>{self.band(2, 60)}</PAMDataset>")
+        build = ("build", "--levels", "2", "--method", "average", "--external")
+        self.assertRan(run(*build, self.path("one.tif")))
+        found = read_pixels(self.path("one.tif"), 0)
+        for channel, no_data in ((0, None), (1, 60)):
+            file = self.path(f"channel-{channel}.tif")
+            write_tiff(file, self.pixels[channel:channel + 1], "Byte", no_data=no_data)
+            self.assertRan(run(*build, file))
+            self.assertSamePixels(read_pixels(file, 0), found[channel:channel + 1])
+
+    def test_that_is_damaged_or_no_file_is_passed_over(self):
+        plain, _ = self.levels("plain.tif")
+        found, _ = self.levels("damaged.tif", self.band(1, 60) + "<PAMRasterBand>")
+        self.assertSamePixels(plain, found)
+        for make in (os.mkfifo, os.mkdir, lambda path: os.symlink("/dev/zero", path)):
+            file = self.path("image.tif")
+            write_tiff(file, self.pixels, "Byte")
+            make(file + ".aux.xml")
+            self.assertRan(run("build", file, "--levels", "2", "--method", "average"))
+            os.rename(file + ".aux.xml", self.path("away"))
+            self.assertSamePixels(plain, read_pixels(file, 0))
+            if os.path.isdir(self.path("away")) and not os.path.islink(self.path("away")):
+                os.rmdir(self.path("away"))
+            else:
+                os.remove(self.path("away"))
+
+
 class BitMask(Case):
     def test_a_named_mask_of_one_bit_is_refused_with_a_reason(self):
         file = self.path("mask.tif")

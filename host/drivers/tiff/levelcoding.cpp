@@ -89,6 +89,14 @@ void Inherit(const PositionedFile& file, const TiffStructure& structure,
   }
 }
 
+/// Levels declare the value in their tag, wherever the image does.
+void DeclareNoData(LevelCoding& coding) {
+  if (!coding.format.noDataIsBeside) return;
+  DropInherited(coding, [](uint16_t tag) { return tag == TIFFTAG_GDAL_NODATA; });
+  if (!coding.format.noData.empty())
+    coding.inherited.push_back(TextEntry(TIFFTAG_GDAL_NODATA, coding.format.noData));
+}
+
 std::vector<uint64_t> NumbersIn(const PositionedFile& file, const TiffStructure& structure,
                                 const TiffDirectory& directory, uint16_t tag) {
   const TiffEntry* entry = directory.Find(tag);
@@ -121,6 +129,7 @@ LevelCoding CodingOf(const PositionedFile& file, const TiffStructure& structure,
     coding.jpegQuality = JpegQualityIn(file, structure, directory, coding.jpegQuality);
   LookAtStoredSizes(file, structure, directory, coding);
   Inherit(file, structure, directory, coding);
+  DeclareNoData(coding);
   return coding;
 }
 

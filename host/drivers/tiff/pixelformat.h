@@ -28,6 +28,7 @@ struct PixelFormat {
   uint16_t sampleFormat = 1;
   std::string
       noData;  ///< text of the no-data tag, blanks at its ends removed; empty when there is none
+  bool noDataIsBeside = false;  ///< it is none of the tag: the file beside the image declares it
 
   /// Bytes of a delivered sample, both components of a complex one; the bit type takes one.
   uint32_t SampleBytes() const { return BytesPerComponent(type) * ComponentsPerSample(type); }

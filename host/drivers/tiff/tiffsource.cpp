@@ -5,7 +5,6 @@
 #include <cerrno>
 #include <cstring>
 #include <filesystem>
-#include <fstream>
 #include <map>
 #include <new>
 #include <utility>
@@ -13,8 +12,9 @@
 #include <fcntl.h>
 #include <unistd.h>
 
-#include "host/datasources/nodatavalue.h"
 #include "host/datasources/validityreader.h"
+#include "host/drivers/common/auxiliaryfile.h"
+#include "host/drivers/tiff/declarednodata.h"
 #include "host/drivers/tiff/pixelreader.h"
 #include "host/drivers/tiff/tifffingerprint.h"
 #include "host/drivers/tiff/tifflevelstore.h"
@@ -26,7 +26,6 @@ namespace orin::drivers {
 namespace {
 
 using datasources::AuxiliaryData;
-using datasources::kNoDataKey;
 
 /// A reader of full-resolution pixels.
 class TiffReader final : public datasources::ReaderState<datasources::IRasterReader> {
@@ -100,15 +99,6 @@ std::string MetadataTextOf(const TiffHandle& tiff, const std::string& path) {
   return text;
 }
 
-/// Whether the file in which raster programs keep what a TIFF has no tag for names classes.
-bool NamesCategories(const std::string& auxiliaryFile) {
-  constexpr size_t kMostBytes = 4 << 20;  // names stand before long tables
-  std::ifstream file(auxiliaryFile, std::ios::binary);
-  std::string text(kMostBytes, '\0');
-  file.read(text.data(), kMostBytes);
-  return file.gcount() > 0 && text.find("<CategoryNames>") != std::string::npos;
-}
-
 }  // namespace
 
 TiffSource::TiffSource(std::string file, datasources::AccessMode access) : file_(std::move(file)) {
@@ -119,11 +109,9 @@ TiffSource::TiffSource(std::string file, datasources::AccessMode access) : file_
     metadata_ = ParseMetadata(MetadataTextOf(tiff, file_));
     alphaChannel_ = AlphaChannelOf(tiff, format_);
   }  // closed: who gives space back asks whether somebody has the file open
-  const bool declared = std::any_of(
-      metadata_.begin(), metadata_.end(),
-      [](const MetadataItem& item) { return item.domain.empty() && item.name == kNoDataKey; });
-  if (!declared && datasources::ParseNoData(format_.noData))
-    metadata_.push_back({kNoDataKey, std::nullopt, "", "", format_.noData});
+  const AuxiliaryFile auxiliary = ReadAuxiliaryFile(file_);
+  namesCategories_ = auxiliary.namesCategories;
+  noDataOrigin_ = DeclareNoData(metadata_, format_, auxiliary);
   watch_ = std::make_shared<datasources::ImageWatch>(
       file_, [path = file_](const std::stop_token& stop) { return FingerprintOfTiff(path, stop); });
   FindMasks();
@@ -156,7 +144,7 @@ AuxiliaryData TiffSource::MetadataOf(const std::vector<unsigned>& channels) cons
 }
 
 bool TiffSource::HoldsClasses() const {
-  return format_.photometric == PHOTOMETRIC_PALETTE || NamesCategories(file_ + ".aux.xml");
+  return format_.photometric == PHOTOMETRIC_PALETTE || namesCategories_;
 }
 
 std::unique_ptr<datasources::IRasterReader> TiffSource::OpenReader(
