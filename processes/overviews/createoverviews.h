@@ -6,6 +6,7 @@
 #include <vector>
 
 #include "host/datasources/dataset.h"
+#include "processes/overviews/diagnosis.h"
 #include "processes/overviews/resampletype.h"
 
 /// Holds a configuration only: every operation opens the file it needs and releases it before it
@@ -25,7 +26,8 @@ class CreateFileOverviews {
   /// Builds what is missing of the job's own file. Failures are reported through the host's
   /// warnings.
   /// \returns true when all requested levels exist and are valid; false after a failure, a
-  ///          cancellation or when there is no level to build for a file of this size
+  ///          cancellation or, without a warning, when the file cannot be opened or a file of its
+  ///          size needs no levels, which `orin::overviews::Diagnose` tells apart
   bool Generate();
   /// Builds what is missing of several files in turn and stops at the first failure. Files that
   /// cannot be opened, and read-only ones that already have levels, are skipped. The job's file
@@ -58,6 +60,8 @@ class CreateFileOverviews {
   void ShowProgress(bool on);
 
  private:
+  friend orin::overviews::Diagnosis orin::overviews::Diagnose(const CreateFileOverviews&);
+
   bool OpenDataset(const std::string& name, orin::datasources::IDataset** out) const;
   bool GetLevelsToCompute(orin::datasources::IDataset* dataset,
                           std::vector<unsigned int>& levels) const;
