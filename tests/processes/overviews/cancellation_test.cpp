@@ -12,27 +12,32 @@ namespace {
 /// Raster large enough for several blocks a level at the run's memory budget.
 drivers::MemoryRaster SeveralBlocks() { return NoiseOf(6000, 4000, 1, gobs::DataTypeOf<double>()); }
 
-size_t CallsOfAnUndisturbedRun(const drivers::MemoryRaster& raster, const char* file, int code) {
-  RecordingHost host;
-  host.Put(file, raster, code);
-  EXPECT_TRUE(JobFor(file, {2, 4}).Generate());
-  return host.Progress().size();
-}
-
 struct Place {
   const char* file;
   int code;
   datasources::LevelPlace place;
 };
 
+struct Undisturbed {
+  size_t reports;
+  LevelPixels pixels;
+};
+
+Undisturbed UndisturbedRun(const drivers::MemoryRaster& raster, const Place& place) {
+  RecordingHost host;
+  host.Put(place.file, raster, place.code);
+  EXPECT_TRUE(JobFor(place.file, {2, 4}).Generate());
+  return {host.Progress().size(), PixelsOf(host, place.file, place.place)};
+}
+
 class Cancellation : public ::testing::TestWithParam<Place> {};
 
 TEST_P(Cancellation, AtAnyCallLeavesNoUnfinishedLevelValidAndTheNextRunFinishes) {
   const Place& place = GetParam();
   const drivers::MemoryRaster raster = SeveralBlocks();
-  const size_t calls = CallsOfAnUndisturbedRun(raster, place.file, place.code);
-  ASSERT_GT(calls, 8u);
-  for (size_t n = 1; n <= calls; ++n) {
+  const auto [reports, pixels] = UndisturbedRun(raster, place);
+  ASSERT_GT(reports, 8u);
+  for (size_t n = 1; n <= reports; ++n) {
     RecordingHost host;
     host.Put(place.file, raster, place.code);
     host.RefuseProgressAt(n);
@@ -40,6 +45,7 @@ TEST_P(Cancellation, AtAnyCallLeavesNoUnfinishedLevelValidAndTheNextRunFinishes)
     const bool both =
         IsValid(host, place.file, 2, place.place) && IsValid(host, place.file, 4, place.place);
     EXPECT_TRUE(both || !answer) << n;
+    EXPECT_TRUE(ValidChannelsHold(pixels, host, place.file, place.place)) << n;
     EXPECT_TRUE(host.Warnings().empty()) << n;
     EXPECT_EQ(1.0f, host.Progress().back()) << n;
     EXPECT_EQ(0, host.Live().Total()) << n;

@@ -19,20 +19,27 @@ struct Setting {
 class Faults : public ::testing::TestWithParam<Setting> {
  protected:
   static drivers::MemoryRaster Raster() { return NoiseOf(64, 48, 2); }
-  static size_t CallsOfAnUndisturbedRun() {
+  static datasources::LevelPlace Place() {
+    return GetParam().code == 99 ? datasources::LevelPlace::kSideCar
+                                 : datasources::LevelPlace::kInternal;
+  }
+  struct Undisturbed {
+    size_t calls;
+    LevelPixels pixels;
+  };
+  static Undisturbed UndisturbedRun() {
     RecordingHost host;
     host.Put(GetParam().file, Raster(), GetParam().code);
     EXPECT_TRUE(JobFor(GetParam().file, {2, 4}).Generate());
-    return host.CallCount();
+    return {host.CallCount(), PixelsOf(host, GetParam().file, Place())};
   }
 };
 
 TEST_P(Faults, AtAnyCallEndWithAWarningAndNoFalseFlag) {
   const auto [file, code, fault] = GetParam();
-  const size_t calls = CallsOfAnUndisturbedRun();
+  const auto [calls, pixels] = UndisturbedRun();
   ASSERT_GT(calls, 15u);
-  const auto place =
-      code == 99 ? datasources::LevelPlace::kSideCar : datasources::LevelPlace::kInternal;
+  const auto place = Place();
   for (size_t n = 1; n <= calls; ++n) {
     RecordingHost host;
     host.Put(file, Raster(), code);
@@ -50,6 +57,8 @@ TEST_P(Faults, AtAnyCallEndWithAWarningAndNoFalseFlag) {
           << host.Warnings()[0].message;
     }
     EXPECT_EQ(0, host.Live().Total()) << n;
+    EXPECT_TRUE(ValidChannelsHold(pixels, host, file, place)) << n;
+    EXPECT_TRUE(ValidChannelsHold(pixels, host, file, datasources::LevelPlace::kSideCar)) << n;
     host.Clear();
     EXPECT_TRUE(JobFor(file, {2, 4}).Generate()) << n;
   }

@@ -74,6 +74,29 @@ TEST(Generate, ForceRebuildsValidLevels) {
   EXPECT_THAT(CreatedLevels(host), ElementsAre(2, 4));
 }
 
+TEST(Generate, AForcedFactorRebuildsValidLevels) {
+  for (const bool force : {false, true}) {
+    RecordingHost host;
+    host.Put("a.tif", NoiseOf(600, 48, 1));
+    host.AddLevel("a.tif", 2);
+    host.AddLevel("a.tif", 4);
+    CreateFileOverviews job("a.tif");
+    job.SetPyramidFactor(2, force);
+    EXPECT_TRUE(job.Generate());
+    EXPECT_EQ(force ? 2u : 0u, CreatedLevels(host).size());
+  }
+}
+
+TEST(Generate, AnEmptyListOfLevelsMeansAPyramid) {
+  RecordingHost host;
+  host.Put("a.tif", NoiseOf(600, 48, 1));
+  CreateFileOverviews job("a.tif");
+  job.SetPyramidFactor(3, false);
+  job.SetPyramidLevels({}, false);
+  EXPECT_TRUE(job.Generate());
+  EXPECT_THAT(CreatedLevels(host), ElementsAre(2, 4)) << "the preferred factor, not the one before";
+}
+
 TEST(Generate, LeavesOutBitChannelsAndKeepsTheListInTheJob) {
   RecordingHost host;
   drivers::MemoryRaster raster = NoiseOf(64, 48, 3);
@@ -140,6 +163,15 @@ TEST(GenerateList, SkipsReadOnlyFilesThatHaveLevels) {
   EXPECT_TRUE(host.Levels("with.tif", LevelPlace::kSideCar).levels.empty());
   EXPECT_TRUE(IsValid(host, "without.tif", 2, LevelPlace::kSideCar));
   EXPECT_TRUE(IsValid(host, "without.tif", 4, LevelPlace::kSideCar));
+}
+
+TEST(GenerateList, CompletesWritableFilesThatHaveLevels) {
+  RecordingHost host;
+  host.Put("a.tif", NoiseOf(600, 48, 1));
+  host.AddLevel("a.tif", 2);
+  std::vector<std::string> files = {"a.tif"};
+  EXPECT_TRUE(CreateFileOverviews().Generate(files));
+  EXPECT_THAT(CreatedLevels(host), ElementsAre(4));
 }
 
 TEST(GenerateList, StopsAtTheFirstFailureAndKeepsItsName) {

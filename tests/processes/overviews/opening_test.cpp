@@ -10,13 +10,17 @@ namespace {
 
 struct Opened {
   std::string format;  ///< empty: nothing was opened
+  datasources::AccessMode access = datasources::kReadOnly;
   bool readOnly = false;
 };
 
 Opened OpenIn(const std::string& file, std::optional<bool> external) {
   Opened answer;
   const auto dataset = overviews::OpenForOverviews(file, external, answer.readOnly);
-  if (dataset) answer.format = datasources::FormatNameOf(*dataset);
+  if (dataset) {
+    answer.format = datasources::FormatNameOf(*dataset);
+    answer.access = dataset->GetAccessMode();
+  }
   return answer;
 }
 
@@ -48,6 +52,30 @@ TEST_F(Opening, GoesWhereTheUserWantsTheLevels) {
 TEST_F(Opening, TellsWhetherUpdateWasRefused) {
   EXPECT_FALSE(OpenIn("tiff", true).readOnly);
   EXPECT_TRUE(OpenIn("fixed", true).readOnly);
+}
+
+TEST_F(Opening, ReopensForUpdateUnlessThatWasRefused) {
+  EXPECT_EQ(datasources::kUpdate, OpenIn("tiff", true).access);
+  EXPECT_EQ(datasources::kUpdate, OpenIn("odd", std::nullopt).access);
+  EXPECT_EQ(datasources::kReadOnly, OpenIn("fixed", std::nullopt).access);
+}
+
+TEST_F(Opening, ReleasesTheFileBeforeItIsOpenedAgain) {
+  OpenIn("odd", std::nullopt);
+  const std::vector<std::string> log = host_.Log();
+  ASSERT_LT(2u, log.size());
+  EXPECT_EQ("Open(odd,update)", log[0]);
+  EXPECT_EQ("~source", log[1]);
+  EXPECT_EQ("Open(odd,read)", log[2]);
+}
+
+TEST(OpeningOfANamesake, OfTheGenericLayerIsNotReopened) {
+  RecordingHost host({{"MYZMBX", "a format that keeps its name", 98, 0}});
+  host.Put("a", NoiseOf(30, 20, 1), 98);
+  EXPECT_EQ("MYZMBX", OpenIn("a", true).format);
+  EXPECT_EQ("MYZMBX", OpenIn("a", std::nullopt).format);
+  EXPECT_EQ(2u, host.Log("Open(a,update)").size());
+  EXPECT_TRUE(host.Log("sidecar.Open").empty());
 }
 
 TEST_F(Opening, ThrowsTheReasonWhenThereIsNoWay) {

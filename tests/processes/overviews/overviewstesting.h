@@ -4,6 +4,7 @@
 
 #include <gtest/gtest.h>
 
+#include <map>
 #include <string>
 #include <vector>
 
@@ -39,6 +40,29 @@ inline std::vector<unsigned> CreatedLevels(const RecordingHost& host) {
     for (const std::string& line : host.Log(start))
       levels.push_back(static_cast<unsigned>(std::stoul(line.substr(line.find('(') + 1))));
   return levels;
+}
+
+/// Pixels of every channel of every level.
+using LevelPixels = std::map<unsigned, std::vector<std::vector<unsigned char>>>;
+
+inline LevelPixels PixelsOf(RecordingHost& host, const std::string& file,
+                            datasources::LevelPlace place) {
+  LevelPixels pixels;
+  for (const auto& [level, stored] : host.Levels(file, place).levels)
+    for (const auto& channel : stored.channels) pixels[level].push_back(channel.samples);
+  return pixels;
+}
+
+/// Whether every channel of a level that is marked valid holds the pixels of an undisturbed run.
+inline ::testing::AssertionResult ValidChannelsHold(const LevelPixels& undisturbed,
+                                                    RecordingHost& host, const std::string& file,
+                                                    datasources::LevelPlace place) {
+  for (const auto& [level, stored] : host.Levels(file, place).levels)
+    for (size_t c = 0; c < stored.channels.size(); ++c)
+      if (stored.channels[c].valid && stored.channels[c].samples != undisturbed.at(level).at(c))
+        return ::testing::AssertionFailure()
+               << "level " << level << ", channel " << c + 1 << " is valid and not complete";
+  return ::testing::AssertionSuccess();
 }
 
 /// True when `level` is marked valid for all of the file's channels.

@@ -3,8 +3,12 @@
 #include <gmock/gmock.h>
 
 #include <cstring>
+#include <locale>
 
+#include "host/datasources/blocksize.h"
+#include "host/services/text.h"
 #include "tests/processes/overviews/overviewstesting.h"
+#include "tests/testing/fakeraster.h"
 
 namespace orin::testing {
 namespace {
@@ -150,7 +154,22 @@ TEST(Passes, MessagesCanBeSwitchedOff) {
   CreateFileOverviews job = JobFor("a.tif", {2});
   job.ShowProgress(false);
   EXPECT_TRUE(job.Generate());
-  for (const std::string& line : host.Log("Update(")) EXPECT_EQ(std::string::npos, line.find(','));
+  EXPECT_THAT(host.Log("Update("), ElementsAre("Update(0)", "Update(0)", "Update(1)", "Update(1)"));
+}
+
+TEST(Passes, BlocksStayWithinABudgetOf64MiB) {
+  RecordingHost host;
+  host.Put("a.tif", NoiseOf(6000, 4000, 1, gobs::DataTypeOf<double>()));
+  FakeRaster image = LevelOf(6000, 4000, 1);
+  FakeRaster level = LevelOf(6000, 4000, 2);
+  image.type = level.type = gobs::DataTypeOf<double>();
+  EXPECT_TRUE(JobFor("a.tif", {2}).Generate());
+  // 64 MiB over two of each: 8 bytes of input, and 8 of output for every fourth one.
+  unsigned width = 0, height = 0;
+  FindOptimalRasterSize(&image, &level, 67108864 / 16, width, height, {});
+  EXPECT_EQ(FormatString("writer[2]{1}.Write(0,0,%u,%u)", width, height),
+            host.Log("writer[2]{1}.Write").front());
+  EXPECT_LT(1u, host.Log("writer[2]{1}.Write").size());
 }
 
 drivers::MemoryRaster WithNoData(drivers::MemoryRaster raster, const std::string& file,
@@ -173,6 +192,25 @@ TEST(Passes, TheFilesNoDataValueComesBeforeTheChannels) {
   EXPECT_THAT(LevelTwo(WithNoData(picture, "", "9")), ElementsAre(9, 3));
   // The channel's 3 is what is masked; the file's 9 is what fills.
   EXPECT_THAT(LevelTwo(WithNoData(picture, "9", "3")), ElementsAre(9, 9));
+}
+
+/// Writes "1,5" for one and a half.
+class DecimalComma final : public std::numpunct<char> {
+  char do_decimal_point() const override { return ','; }
+};
+
+TEST(Passes, TheNoDataTextIsReadTheSameInEveryLocale) {
+  const auto picture =
+      WithNoData(PictureOf<float>({{-9.5f, -9.5f, 3, 3}, {-9.5f, -9.5f, 3, 3}}), "-9.5", "");
+  const std::locale former =
+      std::locale::global(std::locale(std::locale::classic(), new DecimalComma));
+  const std::vector<unsigned char> samples = LevelTwo(picture);
+  std::locale::global(former);
+  float pixels[2];
+  ASSERT_EQ(sizeof pixels, samples.size());
+  std::memcpy(pixels, samples.data(), sizeof pixels);
+  EXPECT_EQ(-9.5f, pixels[0]);
+  EXPECT_EQ(3.0f, pixels[1]);
 }
 
 }  // namespace

@@ -117,6 +117,17 @@ TEST(Validation, ComplexDataIsRefusedByAllButNearestAndAverage) {
   }
 }
 
+TEST(Validation, ComplexDataIsRefusedEvenWhereNothingIsMissing) {
+  RecordingHost host;
+  host.Put("a.tif", NoiseOf(64, 64, 1, gobs::DataTypeOf<short>(true)));
+  host.AddLevel("a.tif", 2);
+  CreateFileOverviews job = JobFor("a.tif", {2});
+  job.SetPyramidType(ResampleMode);
+  EXPECT_FALSE(job.Generate());
+  ExpectOneWarning(host, 698, "Only AVER or NEAREST is supported for complex data.");
+  EXPECT_TRUE(host.Events().empty());
+}
+
 TEST(Validation, ComplexDataIsTakenByNearest) {
   RecordingHost host;
   host.Put("a.tif", NoiseOf(64, 64, 1, gobs::DataTypeOf<short>(true)));
