@@ -5,7 +5,9 @@
 #include <cstring>
 #include <memory>
 
+#include <fcntl.h>
 #include <sys/stat.h>
+#include <unistd.h>
 
 #include "host/datasources/formats.h"
 #include "host/datasources/genericlayer.h"
@@ -21,15 +23,32 @@ namespace {
   throw Exception(text, "host/datasources/datasetmanager", function, 0);
 }
 
-/// Why no driver took the file: it is not there, or it is nothing that a driver knows.
-std::string UnrecognisedText(const std::string& file) {
-  if (std::string why = FormatRegistry::Instance().WhyUnrecognised(file); !why.empty()) return why;
-  struct stat status;
-  if (stat(file.c_str(), &status) != 0)
-    return FormatString(_("%s: cannot be opened: %s."), file.c_str(), std::strerror(errno));
+/// Why a file that is there cannot be read, in the system's words; empty when it can be.
+std::string ObstacleTo(const std::string& file, const struct stat& status) {
   if (S_ISDIR(status.st_mode))
     return FormatString(_("%s: is a directory, not a raster file."), file.c_str());
-  return FormatString(_("%s: is not a raster file of a known format."), file.c_str());
+  if (!S_ISREG(status.st_mode))
+    return FormatString(_("%s: is a pipe or a device, not a raster file."), file.c_str());
+  const int descriptor = open(file.c_str(), O_RDONLY | O_CLOEXEC | O_NONBLOCK);
+  if (descriptor < 0)
+    return FormatString(_("%s: cannot be opened: %s."), file.c_str(), std::strerror(errno));
+  close(descriptor);
+  return {};
+}
+
+/// Why no driver took the file: it is not there, cannot be read, or is nothing that a driver knows.
+std::string UnrecognisedText(const std::string& file) {
+  struct stat status;
+  const bool isThere = stat(file.c_str(), &status) == 0;
+  const int error = errno;
+  if (isThere)
+    if (std::string obstacle = ObstacleTo(file, status); !obstacle.empty()) return obstacle;
+  if (std::string why = FormatRegistry::Instance().WhyUnrecognised(file); !why.empty()) return why;
+  if (!isThere)
+    return FormatString(_("%s: cannot be opened: %s."), file.c_str(), std::strerror(error));
+  return FormatString(_("%s: is not a raster file of a known format. If another program reads it, "
+                        "make a TIFF of it: gdal_translate %s OUT.tif"),
+                      file.c_str(), file.c_str());
 }
 
 /// True for a format of its own whose name the library takes for the generic layer's, so that it

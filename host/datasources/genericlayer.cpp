@@ -35,10 +35,11 @@ class BothPlaces final : public ILevelStore {
   }
   std::vector<LevelDescription> ListHidden() const override {
     std::vector<LevelDescription> hidden;
+    if (!internal_) return hidden;
     const std::vector<LevelDescription> levels = sideCar_->List();
-    if (internal_)
-      for (LevelDescription& entry : internal_->List())
-        if (Holds(levels, entry.level)) hidden.push_back(std::move(entry));
+    for (LevelDescription& entry : internal_->List())
+      if (Holds(levels, entry.level)) hidden.push_back(std::move(entry));
+    for (LevelDescription& entry : internal_->ListHidden()) hidden.push_back(std::move(entry));
     return hidden;
   }
   void Create(unsigned level, const std::vector<unsigned>& channels,

@@ -47,8 +47,8 @@ class ILevelStore {
   /// this call it is the level of this store whose pixels are read, or else the image.
   virtual void SetSource(const LevelDescription& /*source*/) {}
 
-  /// Levels inside the file that `List` leaves out because they stand beside it, too. Other
-  /// programs read these.
+  /// Levels that `List` leaves out and other programs may read: those inside the file that stand
+  /// beside it, too; those that cannot be managed.
   virtual std::vector<LevelDescription> ListHidden() const { return {}; }
 
   /// Where `List` had to read the whole image to tell what is up to date, keeps the answer with the

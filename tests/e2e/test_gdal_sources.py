@@ -187,6 +187,38 @@ class Headers(Sources):
         self.assertEqual({"current"}, self.states("scene.bil"))
 
 
+class Refusals(Sources):
+    """Why a file is not read, in the words of the system, and what to do."""
+
+    def check(self, name, *texts):
+        answer = run("info", name, **({"user": 65534} if os.geteuid() == 0 else {}))
+        self.assertNotEqual(0, answer.returncode)
+        for text in texts:
+            self.assertIn(text, answer.stderr)
+
+    def test_are_those_of_the_system(self):
+        write("photo.png", "PNG", self.pixels, "Byte")
+        os.chmod(".", 0o755)
+        for name in ("photo.png", "image.tif"):
+            os.chmod(name, 0)
+            self.check(name, f"{name}: cannot be opened: Permission denied.")
+        os.mkdir("folder.tif")
+        self.check("folder.tif", "is a directory")
+        self.check("/dev/null", "is a pipe or a device")
+        self.check("missing.png", "missing.png: cannot be opened: No such file or directory.")
+
+    def test_of_an_unknown_format_name_the_way_out(self):
+        os.chmod(".", 0o755)
+        with open("raster.xyz", "wb") as file:
+            file.write(b"no format of ours")
+        self.check("raster.xyz", "known format", "gdal_translate raster.xyz OUT.tif")
+
+    def test_inside_an_archive_are_those_of_the_library(self):
+        with zipfile.ZipFile("all.zip", "w") as archive:
+            archive.write("image.tif")
+        self.check(f"/vsizip/{os.getcwd()}/all.zip/other.tif", "does not exist in the file system")
+
+
 class Pipes(Sources):
     """What is opened under the name of an image may be a pipe: nobody waits for it."""
 

@@ -16,6 +16,8 @@ enum class Decoding {
   kRowsOfAllChannels,  ///< and reading one channel costs as much as reading all
 };
 
+inline constexpr int kFormatArchivedTiff = 301;  ///< TIFF that is no file by itself
+
 /// One driver of the library.
 struct GdalFormat {
   const char* driver;        ///< the library's name of it: "JP2OpenJPEG"

@@ -50,7 +50,7 @@ void GdalErrors::Add(bool isFailure, const char* message) {
 
 std::string GdalErrors::Reason() const {
   std::string reason = Printable(first_.substr(0, first_.find('\n')));
-  while (!reason.empty() && (reason.back() == '.' || reason.back() == ' ')) reason.pop_back();
+  reason.erase(reason.find_last_not_of(".! ") + 1);
   return reason.empty() ? _("the file is damaged") : reason;
 }
 

@@ -8,6 +8,7 @@
 #include <cstring>
 #include <utility>
 
+#include "host/drivers/gdal/archivedlevels.h"
 #include "host/drivers/gdal/gdalbands.h"
 #include "host/drivers/gdal/gdalerrors.h"
 #include "host/drivers/gdal/gdalmask.h"
@@ -53,6 +54,7 @@ GdalSource::GdalSource(std::string name, const GdalFormat& format, SourceUse use
   KeepDecodedRows(handle);
   hasMask_ = HasMaskInside(handle);
   watch_ = WatchOf(handle, format_);
+  if (format_.code == kFormatArchivedTiff) levels_ = ArchivedLevels(name_, format_);
   if (format_.code != kFormatErdas) return;
   if (use == SourceUse::kUpdate) RequireAllValid();
   levels_ = OpenHfaLevels(name_, format_, *this, use);

@@ -2,6 +2,9 @@
 #include "host/drivers/gdal/readingdriver.h"
 
 #include <cpl_conv.h>
+#include <cpl_error.h>
+#include <cpl_vsi.h>
+#include <cpl_vsi_error.h>
 #include <gdal.h>
 
 #include <memory>
@@ -31,6 +34,31 @@ constexpr Setting kSettings[] = {
     {"CPL_VSIL_GZIP_WRITE_PROPERTIES", "NO"},  // reading makes no file
 };
 
+/// What a server answered: "HTTP response code: 403"; empty when it answered well. The library has
+/// forgotten that when it opens the name a second time.
+std::string ServerAnswer(const std::string& name) {
+  if (!name.starts_with("/vsicurl")) return {};
+  VSICurlPartialClearCache(name.c_str());
+  VSIErrorReset();
+  VSIStatBufL status;
+  if (VSIStatExL(name.c_str(), &status, VSI_STAT_EXISTS_FLAG | VSI_STAT_SET_ERROR_FLAG) == 0)
+    return {};
+  return VSIGetLastErrorMsg();
+}
+
+/// In the words of the server or the library; empty when they have none.
+std::string WhyNotOpened(const std::string& name) {
+  const GdalErrors errors;
+  std::string reason = ServerAnswer(name);
+  if (reason.empty()) {
+    GDALClose(GDALOpenEx(name.c_str(), GDAL_OF_RASTER | GDAL_OF_VERBOSE_ERROR, nullptr, nullptr,
+                         nullptr));
+    if (!errors.Any()) return {};
+    reason = errors.Reason();
+  }
+  return FormatString(_("%s: cannot be opened: %s."), name.c_str(), reason.c_str());
+}
+
 class ReadingDriver final : public datasources::IFormatDriver {
  public:
   std::vector<ZMBInfo_s> Formats() const override { return GdalFormatRecords(); }
@@ -42,7 +70,8 @@ class ReadingDriver final : public datasources::IFormatDriver {
 
   std::string WhyUnrecognised(const std::string& file) const override {
     const std::string special = SpecialFiles().Beside(file);
-    return special.empty() ? "" : SpecialFileText(file, special);
+    if (!special.empty()) return SpecialFileText(file, special);
+    return IsLibraryName(file) ? WhyNotOpened(file) : "";
   }
 
   std::unique_ptr<datasources::IRasterSource> Open(const std::string& file,

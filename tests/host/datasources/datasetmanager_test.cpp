@@ -103,7 +103,7 @@ TEST(DatasetManager, WhatCannotBeOpenedIsNamedWithTheReason) {
   EXPECT_EQ("/nowhere/a.tif: cannot be opened: No such file or directory.",
             MessageOf([] { Open("/nowhere/a.tif"); }));
   EXPECT_EQ("/tmp: is a directory, not a raster file.", MessageOf([] { Open("/tmp"); }));
-  EXPECT_EQ("/dev/null: is not a raster file of a known format.",
+  EXPECT_EQ("/dev/null: is a pipe or a device, not a raster file.",
             MessageOf([] { Open("/dev/null"); }));
   EXPECT_EQ("/nowhere/a.tif: cannot be opened: No such file or directory.",
             MessageOf([] { OpenFormat("ZMBALL", "/nowhere/a.tif"); }));
