@@ -14,8 +14,8 @@ constexpr uint32_t kHeaderBytes = 18;
 constexpr uint32_t kReadBytes = 120;  // of a node
 constexpr uint32_t kNameBytes = 64;
 
-constexpr unsigned kMostNodes = 100000;        // more is a loop, or no file to work with
-constexpr uint32_t kMostDataBytes = 64 << 20;  // of a node: the blocks of a file of 2 GB take 7 MB
+constexpr uint32_t kMaxDataBytes = 64 << 20;  // of a node: the blocks of a file of 2 GB take 7 MB
+constexpr uint64_t kMaxVisits = 16;           // of a node; more is a loop
 
 std::string TextAt(std::string_view bytes, size_t at, size_t length) {
   const std::string_view field = bytes.substr(at, length);
@@ -38,6 +38,7 @@ void PutHfaNumber(std::string& bytes, size_t at, uint32_t number) {
 HfaTree::HfaTree(const std::string& path)
     : path_(path), file_(VSIFOpenL(path.c_str(), "rb"), [](VSILFILE* f) { VSIFCloseL(f); }) {
   if (!file_) Fail();
+  maxNodesRead_ = kMaxVisits * (1 + Size() / kHfaNodeBytes);
 }
 
 void HfaTree::Fail() const {
@@ -47,7 +48,7 @@ void HfaTree::Fail() const {
 }
 
 std::string HfaTree::Bytes(uint64_t position, uint32_t count) {
-  if (count > kMostDataBytes) Fail();
+  if (count > kMaxDataBytes || position + count > Size()) Fail();
   std::string bytes(count, '\0');
   if (VSIFSeekL(file_.get(), position, SEEK_SET) != 0 ||
       VSIFReadL(bytes.data(), 1, count, file_.get()) != count)
@@ -82,7 +83,7 @@ std::vector<HfaNode> HfaTree::ChildrenOf(const HfaNode& parent) {
   std::vector<HfaNode> children;
   uint32_t pointer = parent.position + kHfaChildAt;
   for (uint32_t at = parent.child; at != 0; at = children.back().next) {
-    if (++nodesRead_ > kMostNodes) Fail();
+    if (++nodesRead_ > maxNodesRead_) Fail();
     children.push_back(NodeAt(at, pointer));
     pointer = at + kHfaNextAt;
   }

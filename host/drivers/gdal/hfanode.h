@@ -73,7 +73,8 @@ class HfaTree {
 
   std::string path_;
   std::unique_ptr<VSILFILE, void (*)(VSILFILE*)> file_;
-  unsigned nodesRead_ = 0;
+  uint64_t nodesRead_ = 0;
+  uint64_t maxNodesRead_ = 0;  ///< nodes have no bytes in common, so that so many would be a loop
 };
 
 }  // namespace orin::drivers

@@ -181,7 +181,7 @@ class SpaceFinder {
   /// A change of the tree leaves its old nodes behind, in front of the image's data as well. Such a
   /// one has the name, the type and the data of one that is used.
   void FreeReplacedNodes() {
-    constexpr uint64_t kMaxBytes = 1 << 20;  // that are looked through
+    constexpr uint64_t kMaxBytes = 1 << 18;  // that are looked through
     ByteRanges gaps;
     gaps.Add({0, std::min(others_.End(), space_.size)});
     gaps.Remove(others_);

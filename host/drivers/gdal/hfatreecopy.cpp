@@ -8,6 +8,8 @@
 #include "host/drivers/gdal/hfarecord.h"
 #include "host/drivers/gdal/hfatree.h"
 #include "host/drivers/gdal/patchedfile.h"
+#include "host/services/exception.h"
+#include "host/services/text.h"
 
 namespace orin::drivers {
 namespace {
@@ -153,6 +155,11 @@ void ChangeHfaTree(const std::string& path, const HfaTreeChanges& changes) {
   PatchedFile file(path);
   const auto position = static_cast<uint32_t>(file.Size());
   const std::string bytes = copy.BytesAt(position);
+  if (file.Size() + bytes.size() > UINT32_MAX)
+    throw Exception(FormatString(_("%s: would grow beyond the 2 GB that the format keeps in one "
+                                   "file."),
+                                 path.c_str()),
+                    "host/drivers/gdal/hfatreecopy", "orin::drivers::ChangeHfaTree", 0);
   file.Write(position, bytes.data(), bytes.size());
   file.Keep();
   std::string number(4, '\0');
