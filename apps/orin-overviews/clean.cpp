@@ -46,12 +46,16 @@ std::vector<unsigned> FactorsOf(const std::vector<LevelDescription>& levels) {
   return factors;
 }
 
+/// Free space that a command left which was killed is given back as well.
 /// \returns what was removed
-std::vector<LevelDescription> CleanInside(const CleanOptions& options, const std::string& file) {
+std::vector<LevelDescription> CleanInside(const CleanOptions& options, const std::string& file,
+                                          bool& hasReclaimed) {
   std::unique_ptr<IDataset> dataset(
       DatasetManager::GetInstance()->Open(file, datasources::kReadOnly));
-  const auto chosen = Chosen(LevelsOf(*dataset), LevelPlace::kInternal, options);
-  if (chosen.empty()) return chosen;
+  ILevelStore* store = LevelsOf(*dataset);
+  const auto chosen = Chosen(store, LevelPlace::kInternal, options);
+  if (chosen.empty() && !(store && store->HasReclaimableSpace())) return chosen;
+  hasReclaimed = true;
   dataset.reset();
   ZMBFormatType code = kFormatUnknown;
   datasources::IFormatDriver* driver = datasources::FormatRegistry::Instance().DriverOf(file, code);
@@ -60,12 +64,16 @@ std::vector<LevelDescription> CleanInside(const CleanOptions& options, const std
 }
 
 /// What a build that was killed left of a side-car goes as well, unless single levels are named.
-std::vector<LevelDescription> CleanBeside(const CleanOptions& options, const std::string& file) {
+std::vector<LevelDescription> CleanBeside(const CleanOptions& options, const std::string& file,
+                                          bool& hasReclaimed) {
   const std::unique_ptr<IDataset> dataset(
       DatasetManager::GetInstance()->OpenFormat("ZMBALL", file, datasources::kReadOnly));
   ILevelStore* store = LevelsOf(*dataset);
   const auto chosen = Chosen(store, LevelPlace::kSideCar, options);
-  if (store && (!chosen.empty() || options.levels.empty())) store->Remove(FactorsOf(chosen));
+  const bool reclaims = store && store->HasReclaimableSpace();
+  if (store && (reclaims || !chosen.empty() || options.levels.empty()))
+    store->Remove(FactorsOf(chosen));
+  hasReclaimed = hasReclaimed || reclaims;
   return chosen;
 }
 
@@ -79,9 +87,9 @@ std::string RemovedText(const std::vector<LevelDescription>& removed) {
 
 /// One place of one file, every failure reported.
 ExitCode TryPlace(const auto& clean, const CleanOptions& options, const std::string& file,
-                  bool& hasRemoved, Console& console) {
+                  bool& hasRemoved, bool& hasReclaimed, Console& console) {
   try {
-    const std::vector<LevelDescription> removed = clean(options, file);
+    const std::vector<LevelDescription> removed = clean(options, file, hasReclaimed);
     if (removed.empty()) return kDone;
     hasRemoved = true;
     console.Result(file + ": " + RemovedText(removed));
@@ -111,11 +119,14 @@ ExitCode CleanFile(const CleanOptions& options, const std::string& file, Console
   if (!CanOpen(file, console)) return kCannotOpen;
   ExitCode code = kDone;
   bool hasRemoved = false;
+  bool hasReclaimed = false;
   if (options.placement != Placement::kExternal)
-    code = TryPlace(CleanInside, options, file, hasRemoved, console);
+    code = TryPlace(CleanInside, options, file, hasRemoved, hasReclaimed, console);
   if (options.placement != Placement::kInternal)
-    code = std::max(code, TryPlace(CleanBeside, options, file, hasRemoved, console));
-  if (code == kDone && !hasRemoved)
+    code = std::max(code, TryPlace(CleanBeside, options, file, hasRemoved, hasReclaimed, console));
+  if (code == kDone && !hasRemoved && hasReclaimed)
+    console.Result(file + ": " + _("no levels to remove; free space was given back"));
+  else if (code == kDone && !hasRemoved)
     console.Result(file + ": " +
                    (options.levels.empty() ? _("nothing to do: there are no levels")
                                            : _("nothing to do: there are no such levels")));

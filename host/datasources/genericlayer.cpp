@@ -62,6 +62,7 @@ class BothPlaces final : public ILevelStore {
     if (internal_) internal_->KeepAnswers();
   }
   void SetOptions(const LevelOptions& options) override { sideCar_->SetOptions(options); }
+  bool HasReclaimableSpace() const override { return sideCar_ && sideCar_->HasReclaimableSpace(); }
   LevelRoom RoomFor(const std::vector<unsigned>& levels,
                     const std::vector<unsigned>& channels) const override {
     return sideCar_->RoomFor(levels, channels);

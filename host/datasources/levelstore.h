@@ -66,8 +66,14 @@ class ILevelStore {
     return {};
   }
 
+  /// Whether the levels' file holds free space of this program that is worth to be given back: a
+  /// run that was killed left it.
+  /// \throws orin::Exception  the file cannot be read
+  virtual bool HasReclaimableSpace() const { return false; }
+
   /// Removes the levels named, those of other programs too, as far as there are such; their masks
-  /// go with them, the image's pixels stay. None of them is being written.
+  /// go with them, the image's pixels stay. None of them is being written. Free space is given back
+  /// when the store goes, and also where there is no such level.
   /// \throws orin::Exception  they cannot be removed; the text names the file
   virtual void Remove(const std::vector<unsigned>& levels) = 0;
 };

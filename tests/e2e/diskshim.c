@@ -4,7 +4,8 @@
  * DISK_LOG     a file to which every change is appended: lines "OPERATION NUMBERS", paths in quotes;
  *              the bytes of a write follow their line, and a newline
  * DISK_FAULT   "CALL NUMBER REASON": the call of that number, from 1, fails; REASON is a number of
- *              errno, or "short", which writes half of the bytes asked for
+ *              errno, "short", which writes half of the bytes asked for, or "kill", which kills the
+ *              program instead
  * DISK_CALLS   a file to which every call is appended: lines "CALL NUMBER PLACE"; calls that the same
  *              functions of the program led to have the same place
  */
@@ -15,6 +16,7 @@
 #include <execinfo.h>
 #include <fcntl.h>
 #include <pthread.h>
+#include <signal.h>
 #include <stdarg.h>
 #include <stdio.h>
 #include <stdlib.h>
@@ -67,6 +69,7 @@ static int FaultOf(enum Call call) {
   NoteCall(call);
   if (!fault || sscanf(fault, "%15s %lu %15s", name, &number, reason) != 3) return -1;
   if (strcmp(name, kNames[call]) != 0 || counts[call] != number) return -1;
+  if (strcmp(reason, "kill") == 0) kill(getpid(), SIGKILL);
   return strcmp(reason, "short") == 0 ? 0 : atoi(reason);
 }
 

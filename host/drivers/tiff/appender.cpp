@@ -84,14 +84,10 @@ NewEntry TextEntry(uint16_t tag, const std::string& text) {
           std::vector<uint8_t>(text.c_str(), text.c_str() + text.size() + 1)};
 }
 
-Appender::Appender(PositionedFile& file, bool isBig, ByteOrder byteOrder, OwnSpace space)
-    : file_(file),
-      isBig_(isBig),
-      byteOrder_(byteOrder),
-      end_(file.Size()),
-      space_(std::move(space)) {}
+Appender::Appender(PositionedFile& file, bool isBig, ByteOrder byteOrder, FreeSpaceMap map)
+    : file_(file), isBig_(isBig), byteOrder_(byteOrder), end_(file.Size()), map_(std::move(map)) {}
 
-void Appender::RequireRoom(uint64_t position, uint64_t bytes) const {
+void Appender::RequireBelowLimit(uint64_t position, uint64_t bytes) const {
   if (isBig_ || (position <= kClassicLimit && bytes <= kClassicLimit - position)) return;
   throw Exception(
       FormatString(_("%s: would pass 4 GiB, the limit of a classic TIFF; use --external, "
@@ -100,44 +96,43 @@ void Appender::RequireRoom(uint64_t position, uint64_t bytes) const {
       "host/drivers/tiff/appender", "Appender::Reserve(uint64_t)", 0);
 }
 
-bool Appender::HasOpenStretch() const {
-  return !space_.stretches.empty() && space_.stretches.back().end == 0;
+bool Appender::HasOpenSegment() const {
+  return !map_.segments.empty() && map_.segments.back().end == 0;
 }
 
-void Appender::EndStretch() {
-  if (!HasOpenStretch()) return;
-  space_.stretches.back().end = end_;
-  space_.unclosed.push_back(space_.stretches.back());
+void Appender::EndSegment() {
+  if (!HasOpenSegment()) return;
+  map_.segments.back().end = end_;
+  map_.unclosed.push_back(map_.segments.back());
 }
 
-/// Bytes of another program end the stretch.
+/// Bytes of another program end the segment.
 void Appender::NoticeOthers() {
   const uint64_t size = file_.Size();
   if (size <= end_) return;
-  EndStretch();
+  EndSegment();
   end_ = kept_ = size;
 }
 
-void Appender::BeginStretch(uint64_t bytes) {
-  if (HasOpenStretch()) return;
-  std::vector<Stretch>& stretches = space_.stretches;
-  const Stretch stretch = StretchAt(end_, stretches.empty() ? 0 : stretches.back().marker);
-  RequireRoom(stretch.Body(), bytes);
-  stretches.push_back(stretch);
-  end_ = stretch.Body();
-  file_.Write(stretch.marker, ComposeMarker(stretch).data(), kMarkerBytes);
+void Appender::BeginSegment(uint64_t bytes) {
+  if (HasOpenSegment()) return;
+  const Segment segment = SegmentAt(end_);
+  RequireBelowLimit(segment.Body(), bytes);
+  map_.segments.push_back(segment);
+  end_ = segment.Body();
+  file_.Write(segment.marker, ComposeMarker(segment).data(), kMarkerBytes);
 }
 
 uint64_t Appender::Reserve(uint64_t bytes, Taking take) {
   const std::lock_guard lock(mutex_);
   NoticeOthers();
-  if (const auto position = take ? (space_.free.*take)(bytes) : std::nullopt) {
+  if (const auto position = take ? (map_.free.*take)(bytes) : std::nullopt) {
     taken_.Add({*position, *position + bytes});
     return *position;
   }
-  BeginStretch(bytes);
+  BeginSegment(bytes);
   const uint64_t position = EvenFrom(end_);
-  RequireRoom(position, bytes);
+  RequireBelowLimit(position, bytes);
   end_ = position + bytes;
   return position;
 }
@@ -148,37 +143,21 @@ uint64_t Appender::Append(const std::vector<uint8_t>& bytes) {
   return position;
 }
 
-uint64_t Appender::MarkerFor(uint64_t position) const {
-  const std::lock_guard lock(mutex_);
-  for (const Stretch& stretch : space_.stretches)
-    if (position >= stretch.Body() && (stretch.end == 0 || position < stretch.end))
-      return stretch.marker;
-  return 0;
-}
-
 uint64_t Appender::SizeOfDirectory(const std::vector<NewEntry>& entries) const {
-  return kPointerBytes + Layout(isBig_, byteOrder_).SizeOf(entries);
+  return Layout(isBig_, byteOrder_).SizeOf(entries);
 }
 
-/// Behind what was appended for it, since the stretch is found by a directory in it. Else in the
-/// shortest gap: a longer one may hold a tile.
+/// In the shortest gap: a longer one may hold a tile.
 uint64_t Appender::ReserveDirectory(const std::vector<NewEntry>& entries) {
-  const bool goesBehind = [this] {
-    const std::lock_guard lock(mutex_);
-    return HasOpenStretch();
-  }();
-  return Reserve(SizeOfDirectory(entries), goesBehind ? nullptr : &ByteRanges::TakeFromShortest);
+  return Reserve(SizeOfDirectory(entries), &ByteRanges::TakeFromShortest);
 }
 
 uint64_t Appender::WriteDirectory(std::vector<NewEntry> entries, uint64_t next, uint64_t reserved) {
   std::sort(entries.begin(), entries.end(),
             [](const NewEntry& a, const NewEntry& b) { return a.tag < b.tag; });
-  const uint64_t position = reserved + kPointerBytes;
-  std::vector<uint8_t> bytes = ComposePointer(MarkerFor(position), position);
-  const auto directory = Layout(isBig_, byteOrder_).Compose(entries, position, next);
-  bytes.insert(bytes.end(), directory.begin(), directory.end());
-  file_.Write(reserved, bytes.data(), bytes.size());
-  return position;
+  const auto directory = Layout(isBig_, byteOrder_).Compose(entries, reserved, next);
+  file_.Write(reserved, directory.data(), directory.size());
+  return reserved;
 }
 
 uint64_t Appender::AppendDirectory(std::vector<NewEntry> entries, uint64_t next) {
@@ -186,20 +165,20 @@ uint64_t Appender::AppendDirectory(std::vector<NewEntry> entries, uint64_t next)
   return WriteDirectory(std::move(entries), next, reserved);
 }
 
-/// What is appended begins at even positions: so a stretch has room for the same in any order.
-void Appender::PadStretch() {
-  if (!HasOpenStretch() || end_ == EvenFrom(end_) || file_.Size() > end_) return;
+/// What is appended begins at even positions: so a segment has room for the same in any order.
+void Appender::PadSegment() {
+  if (!HasOpenSegment() || end_ == EvenFrom(end_) || file_.Size() > end_) return;
   const uint8_t padding = 0;
   file_.Write(end_++, &padding, 1);
 }
 
 void Appender::Close() {
   const std::lock_guard lock(mutex_);
-  PadStretch();
-  EndStretch();
-  for (const Stretch& stretch : space_.unclosed)
-    file_.Write(stretch.marker, ComposeMarker(stretch).data(), kMarkerBytes);
-  space_.unclosed.clear();
+  PadSegment();
+  EndSegment();
+  for (const Segment& segment : map_.unclosed)
+    file_.Write(segment.marker, ComposeMarker(segment).data(), kMarkerBytes);
+  map_.unclosed.clear();
 }
 
 void Appender::Link(uint64_t linkPosition, uint64_t target) {
@@ -222,18 +201,18 @@ void Appender::Keep() {
 
 void Appender::CutBackTo(uint64_t end) {
   const std::lock_guard lock(mutex_);
-  for (const auto& [start, stop] : taken_) space_.free.Add({start, stop});
+  for (const auto& [start, stop] : taken_) map_.free.Add({start, stop});
   taken_ = {};
   if (end < kept_ || file_.Size() > end_) return;
   file_.Truncate(end);
   end_ = end;
-  const auto isGone = [end](const Stretch& stretch) { return stretch.start >= end; };
-  std::erase_if(space_.stretches, isGone);
-  std::erase_if(space_.unclosed, isGone);
-  if (space_.stretches.empty() || space_.stretches.back().end <= end) return;
-  const Stretch cut = space_.stretches.back();  // goes on where it was cut
-  std::erase_if(space_.unclosed, [&](const Stretch& s) { return s.marker == cut.marker; });
-  space_.stretches.back().end = 0;
+  const auto isGone = [end](const Segment& segment) { return segment.start >= end; };
+  std::erase_if(map_.segments, isGone);
+  std::erase_if(map_.unclosed, isGone);
+  if (map_.segments.empty() || map_.segments.back().end <= end) return;
+  const Segment cut = map_.segments.back();  // goes on where it was cut
+  std::erase_if(map_.unclosed, [&](const Segment& s) { return s.marker == cut.marker; });
+  map_.segments.back().end = 0;
 }
 
 }  // namespace orin::drivers

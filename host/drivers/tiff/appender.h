@@ -8,7 +8,7 @@
 #include <vector>
 
 #include "host/drivers/common/positionedfile.h"
-#include "host/drivers/tiff/ownspace.h"
+#include "host/drivers/tiff/freespacemap.h"
 #include "host/drivers/tiff/structure.h"
 
 namespace orin::drivers {
@@ -33,8 +33,8 @@ NewEntry TextEntry(uint16_t tag, const std::string& text);
 class Appender {
  public:
   /// \param file   open for update; outlives the appender
-  /// \param space  as it is now
-  Appender(PositionedFile& file, bool isBig, ByteOrder byteOrder, OwnSpace space = {});
+  /// \param map    as it is now
+  Appender(PositionedFile& file, bool isBig, ByteOrder byteOrder, FreeSpaceMap map = {});
 
   /// Adds `bytes`, near those added before. \returns their position, which is even
   /// \throws orin::Exception  a classic file would pass 4 GiB, or the bytes cannot be written
@@ -51,7 +51,7 @@ class Appender {
   /// Makes the link at `linkPosition` point at `target`, in one write.
   void Link(uint64_t linkPosition, uint64_t target);
 
-  /// Bytes that a directory takes with its values and all that goes in front of it.
+  /// Bytes that a directory takes with its values.
   uint64_t SizeOfDirectory(const std::vector<NewEntry>& entries) const;
   /// Where the file ends.
   uint64_t End() const;
@@ -67,12 +67,11 @@ class Appender {
   /// \param take  null: nothing is taken from the free space
   uint64_t Reserve(uint64_t bytes, Taking take);
   void NoticeOthers();
-  bool HasOpenStretch() const;
-  void EndStretch();
-  void PadStretch();
-  void BeginStretch(uint64_t bytes);
-  void RequireRoom(uint64_t position, uint64_t bytes) const;
-  uint64_t MarkerFor(uint64_t position) const;
+  bool HasOpenSegment() const;
+  void EndSegment();
+  void PadSegment();
+  void BeginSegment(uint64_t bytes);
+  void RequireBelowLimit(uint64_t position, uint64_t bytes) const;
 
   PositionedFile& file_;
   bool isBig_;
@@ -80,7 +79,7 @@ class Appender {
   mutable std::mutex mutex_;
   uint64_t end_;
   uint64_t kept_ = 0;  ///< the file is never cut before this
-  OwnSpace space_;     ///< `free`: what may be taken; the last stretch may be open
+  FreeSpaceMap map_;   ///< `free`: what may be taken; the last segment may be open
   ByteRanges taken_;   ///< of the free space, since the last Keep
 };
 

@@ -113,10 +113,10 @@ void LevelFile::OpenForChange() {
 }
 
 void LevelFile::StartAppending() {
-  OwnSpace space = isMade_ ? FindOwnSpace(*file_, structure_) : OwnSpace();
-  if (!mayReuse_) space.free = {};
+  FreeSpaceMap map = isMade_ ? FindFreeSpace(*file_, structure_) : FreeSpaceMap();
+  if (!mayReuse_) map.free = {};
   appender_ =
-      std::make_unique<Appender>(*file_, structure_.isBig, structure_.byteOrder, std::move(space));
+      std::make_unique<Appender>(*file_, structure_.isBig, structure_.byteOrder, std::move(map));
 }
 
 /// What bears the name of a file that is being made, locked; null when there is nothing. It was
@@ -189,23 +189,19 @@ void LevelFile::DeclareEdited() {
   if (at != text.npos) file_->Write(start + at, after.data(), after.size());
 }
 
-void LevelFile::LinkAll(const std::vector<DirectoryLink>& links) {
+void LevelFile::Link(const Place& place, uint64_t directory) {
   OpenForChange();
   appender_->Close();
   file_->Sync();
   if (isMade_) DeclareEdited();
   Keep();  // first: a link that fails half-way may point there already
-  for (const DirectoryLink& link : links) appender_->Link(link.position, link.target);
+  appender_->Link(place.linkPosition, directory);
   file_->Sync();
   if (!isMade_) {
     file_->Rename(path_);
     isMade_ = true;
   }
   structure_ = ParseStructure(*file_);
-}
-
-void LevelFile::Link(const Place& place, uint64_t directory) {
-  LinkAll({{place.linkPosition, directory}});
 }
 
 void LevelFile::Keep() {
@@ -242,6 +238,27 @@ void LevelFile::Relink(uint64_t position, uint64_t offset) {
   DeclareEdited();
   appender_->Link(position, offset);
   file_->Sync();
+}
+
+/// Of an image's own file the first directory stays where it is, whatever its markers say.
+Compactor LevelFile::CompactorOf() const { return Compactor(*file_, access_ ? 0 : 1); }
+
+bool LevelFile::HasReclaimableSpace() const { return isMade_ && CompactorOf().IsWorthwhile(); }
+
+void LevelFile::Reclaim() {
+  if (!appender_ || !isMade_) return;
+  CompactorOf().Compact();
+  structure_ = ParseStructure(*file_);
+  mayReuse_ = false;  // somebody may have opened the file meanwhile
+  StartAppending();
+}
+
+void LevelFile::CutOff(const ByteRanges& given) {
+  OpenForChange();
+  CompactorOf().CutOff(given);
+  structure_ = ParseStructure(*file_);
+  mayReuse_ = false;  // somebody may still read what was removed
+  StartAppending();
 }
 
 }  // namespace orin::drivers

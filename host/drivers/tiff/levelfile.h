@@ -10,8 +10,8 @@
 
 #include "host/drivers/common/positionedfile.h"
 #include "host/drivers/tiff/appender.h"
+#include "host/drivers/tiff/compactor.h"
 #include "host/drivers/tiff/leveldirectories.h"
-#include "host/drivers/tiff/packing.h"
 #include "host/drivers/tiff/structure.h"
 
 namespace orin::drivers {
@@ -70,11 +70,17 @@ class LevelFile {
   /// goes altogether.
   void CutBackTo(uint64_t end);
 
-  /// Moves levels of this program into its free space and shortens the file by what is free at its
-  /// end; not while others have the file open, which may still read levels that were replaced.
-  void GiveBackSpace();
+  /// Whether the file holds free space of this program that is worth to be reclaimed.
+  bool HasReclaimableSpace() const;
+  /// Whether nothing else has the file open, in this process or another.
+  bool IsAlone() const {
+    return file_->DoAlone([] {}) == PositionedFile::Alone::kDone;
+  }
+  /// Relocates levels of this program into its free space and shortens the file by what is free at
+  /// its end; not while others have the file open, which may still read levels that were replaced.
+  void Reclaim();
   /// Shortens it, whoever has it open, by `given` as well, which nothing refers to any more.
-  void GiveBackSpace(const ByteRanges& given);
+  void CutOff(const ByteRanges& given);
   /// Takes the file away; it counts as not yet made afterwards.
   void Delete();
   /// Takes away what a build that was killed left of a file that is not yet made.
@@ -88,20 +94,7 @@ class LevelFile {
   void Make();
   void StartAppending();
   void DeclareEdited();
-  struct DirectoryLink {
-    uint64_t position;  ///< of the field
-    uint64_t target;
-  };
-  void LinkAll(const std::vector<DirectoryLink>& links);
-  bool IsAlone();
-  std::vector<Movable> Movables(const OwnSpace& space) const;
-  struct Carried;
-  Carried CopyTiles(size_t index);
-  void Carry(const Move& move, const OwnSpace& space);
-  void Join(const Joining& joining);
-  bool PackOnce(uint64_t& evacuated);
-  void Pack();
-  void Shorten(const OwnSpace& space, uint64_t end);
+  Compactor CompactorOf() const;
   std::unique_ptr<PositionedFile> OpenUnfinished() const;
 
   std::string path_;

@@ -3,6 +3,7 @@
 // SPDX-License-Identifier: MIT
 #include <algorithm>
 
+#include "host/drivers/tiff/references.h"
 #include "host/drivers/tiff/tifflevelstore.h"
 #include "host/services/text.h"
 
@@ -70,7 +71,7 @@ void TiffLevelStore::RemoveStored(const std::vector<unsigned>& levels) {
          ReferencesOf(file_->File(), structure, structure.directories[index]).extents)
       given.Add({start, end});
   Unlink(indices);
-  file_->GiveBackSpace(given);
+  file_->CutOff(given);
   file_->Refresh();
   TidyMasks(std::nullopt);
 }
@@ -80,6 +81,7 @@ void TiffLevelStore::Remove(const std::vector<unsigned>& levels) {
   const bool areThere = std::any_of(levels.begin(), levels.end(),
                                     [this](unsigned level) { return Find(level) != nullptr; });
   if (areThere) RemoveStored(levels);
+  else PrepareToReclaim();
   if (!file_->Exists()) file_->DeleteUnfinished();
   Reload();
   if (areThere) Settle();

@@ -36,9 +36,10 @@ TiffLevelStore::TiffLevelStore(std::unique_ptr<LevelFile> file, Settings setting
 TiffLevelStore::~TiffLevelStore() {
   try {
     StoreAllWaitingBut(0);
-    if (!file_->IsChanged()) return;
+    const bool mayReclaim = settings_.place == datasources::LevelPlace::kInternal;
+    if (!file_->IsChanged() && !(mayReclaim && PrepareToReclaim())) return;
     freshness_.BeginChange(levels_);
-    file_->GiveBackSpace();
+    file_->Reclaim();
     Reload();
     Settle();
   } catch (const std::exception&) {
@@ -51,6 +52,19 @@ void TiffLevelStore::Reload() {
   if (!file_->Exists()) return;
   levels_ = FindLevels(file_->File(), file_->Structure(), settings_.image);
   FindLevelMasks(file_->File(), file_->Structure(), settings_.image, levels_);
+}
+
+bool TiffLevelStore::HasReclaimableSpace() const {
+  const std::lock_guard lock(mutex_);
+  return file_->HasReclaimableSpace();
+}
+
+/// Has free space given back when the store goes, although nothing was changed.
+/// \returns false: there is none, or others have the file open
+bool TiffLevelStore::PrepareToReclaim() {
+  if (!file_->MayChange() || !file_->HasReclaimableSpace() || !file_->IsAlone()) return false;
+  CatchUp();
+  return true;
 }
 
 /// Opens the file for changes and looks again where everything stands: another program may have

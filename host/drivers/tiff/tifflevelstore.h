@@ -49,7 +49,8 @@ class TiffLevelStore final : public datasources::ILevelStore {
   };
   /// \throws orin::Exception  the file cannot be read
   TiffLevelStore(std::unique_ptr<LevelFile> file, Settings settings);
-  /// Gives back the space of levels that were replaced, where it is at the file's end.
+  /// Gives back the space of levels that were replaced, and inside an image that was opened to be
+  /// changed also what a run that was killed left.
   ~TiffLevelStore() override;
 
   std::vector<datasources::LevelDescription> List() const override;
@@ -63,6 +64,7 @@ class TiffLevelStore final : public datasources::ILevelStore {
   void SetOptions(const datasources::LevelOptions& options) override;
   datasources::LevelRoom RoomFor(const std::vector<unsigned>& levels,
                                  const std::vector<unsigned>& channels) const override;
+  bool HasReclaimableSpace() const override;
   void Remove(const std::vector<unsigned>& levels) override;
 
   // For the level writers.
@@ -112,6 +114,7 @@ class TiffLevelStore final : public datasources::ILevelStore {
   const StoredLevel* FindOurs(unsigned level) const;
   void Reload();
   void CatchUp();
+  bool PrepareToReclaim();
   datasources::LevelDescription Describe(const StoredLevel& stored,
                                          datasources::LevelStatus status) const;
   void AddPending(unsigned level, const Pending& pending,

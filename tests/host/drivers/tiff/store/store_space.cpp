@@ -5,7 +5,7 @@
 #include <sys/wait.h>
 #include <unistd.h>
 
-#include "host/drivers/tiff/ownspace.h"
+#include "host/drivers/tiff/freespacemap.h"
 #include "host/services/exception.h"
 #include "tests/host/drivers/common/byterangestext.h"
 #include "tests/host/drivers/tiff/store/storesupport.h"
@@ -34,9 +34,9 @@ class Space : public TiffStore {
     return wrong;
   }
   uint64_t Size() const { return std::filesystem::file_size(file_); }
-  drivers::OwnSpace Own() const {
+  drivers::FreeSpaceMap Map() const {
     const PositionedFile file(file_, PositionedFile::Mode::kRead);
-    return drivers::FindOwnSpace(file, drivers::ParseStructure(file));
+    return drivers::FindFreeSpace(file, drivers::ParseStructure(file));
   }
   /// Where the values of metadata items stand. \param item  up to and with ">", then what follows
   std::vector<uint64_t> PlacesOf(const std::string& item) const {
@@ -108,7 +108,7 @@ TEST_F(Space, ThatAKilledBuildTookIsTakenAgain) {
     EXPECT_EQ(longest, Size());
   }
   BuildAll();
-  EXPECT_TRUE(Own().free.Size() < 256) << TextOf(Own().free);
+  EXPECT_TRUE(Map().free.Size() < 256) << TextOf(Map().free);
   EXPECT_EQ("", WrongLevels());
 }
 
@@ -134,7 +134,7 @@ TEST_F(Space, OfOtherProgramsIsNeverTaken) {
 TEST_F(Space, IsNotTakenWhereTheChainIsBrokenAndSomethingMayBeHidden) {
   BuildAll();
   BuildAll("AVERAGE");
-  EXPECT_FALSE(Own().stretches.empty());
+  EXPECT_FALSE(Map().segments.empty());
   const auto last = DirectoriesOf(file_).back().offset;
   const auto bytes = BytesOf(file_);
   const size_t link = last + 2 + 12 * size_t(uint8_t(bytes[last]));
@@ -142,8 +142,8 @@ TEST_F(Space, IsNotTakenWhereTheChainIsBrokenAndSomethingMayBeHidden) {
   stream.seekp(std::streamoff(link));
   stream.write("\xF0\xFF\xFF\x7F", 4);
   stream.close();
-  EXPECT_TRUE(Own().stretches.empty());
-  EXPECT_TRUE(Own().free.IsEmpty());
+  EXPECT_TRUE(Map().segments.empty());
+  EXPECT_TRUE(Map().free.IsEmpty());
 }
 
 TEST_F(Space, IsNotTakenWhereTheChainIsLongerThanWhatIsRead) {
@@ -172,19 +172,19 @@ TEST_F(Space, IsNotTakenWhereTheChainIsLongerThanWhatIsRead) {
     stream.seekp(std::streamoff(link));
     stream.write(number(start, 4).data(), 4);
     stream.close();
-    EXPECT_EQ(count == 65535u - 4, !Own().stretches.empty()) << count;
+    EXPECT_EQ(count == 65535u - 4, !Map().segments.empty()) << count;
   }
 }
 
 TEST_F(Space, OfADamagedMarkerIsLostAndNothingElse) {
   BuildAll();
-  const auto own = Own();
-  ASSERT_EQ(3u, own.stretches.size());
+  const auto map = Map();
+  ASSERT_EQ(3u, map.segments.size());
   std::fstream stream(file_, std::ios::in | std::ios::out | std::ios::binary);
-  stream.seekp(std::streamoff(own.stretches[1].marker + 20));
+  stream.seekp(std::streamoff(map.segments[1].marker + 20));
   stream.put('!');
   stream.close();
-  EXPECT_EQ(2u, Own().stretches.size());
+  EXPECT_EQ(2u, Map().segments.size());
   BuildAll("AVERAGE");
   EXPECT_EQ("", WrongLevels());
 }
@@ -199,6 +199,61 @@ TEST_F(Space, OfRemovedLevelsIsGivenBackAndTheImageIsWhatItWas) {
   const auto after = BytesOf(file_);
   ASSERT_EQ(before.size(), after.size());
   EXPECT_EQ(before, after);
+}
+
+TEST_F(Space, IsFoundBehindBytesOfOtherProgramsAndBetweenThemWithoutAnyLevel) {
+  const uint64_t before = Size();
+  Append(std::string(77, 'x'));
+  const uint64_t start = Size();
+  BuildAll();
+  const uint64_t end = Size();
+  Append(std::string(5000, 'y'));
+  Open(file_, datasources::kUpdate)->GetSource()->Levels()->Remove({2, 4, 8});
+  const auto map = Map();
+  EXPECT_EQ(before, map.used.End());
+  ASSERT_FALSE(map.segments.empty());
+  EXPECT_EQ(start, map.segments.front().start);
+  EXPECT_EQ(end, map.segments.back().end);
+  BuildAll();
+  EXPECT_EQ(end + 5000, Size());  // into the space of before
+  EXPECT_EQ("", WrongLevels());
+}
+
+TEST_F(Space, OfAMarkerInACopyOfTheFileInsideItIsNotTaken) {
+  BuildAll();
+  const auto bytes = BytesOf(file_);
+  const std::string copy(bytes.begin(), bytes.end());
+  const size_t before = Map().segments.size();
+  Append(std::string(64 - Size() % 64, 'x') + copy);
+  EXPECT_EQ(before, Map().segments.size());
+  BuildAll("AVERAGE");
+  const auto after = BytesOf(file_);
+  EXPECT_NE(std::string::npos, std::string(after.begin(), after.end()).find(copy));
+}
+
+TEST_F(Space, OfAnOpenSegmentEndsWhereAnotherProgramsBytesAreReferredTo) {
+  const uint64_t start = Size();
+  const auto writeMarker = [&](drivers::Segment segment) {
+    const auto marker = drivers::ComposeMarker(segment);
+    std::fstream stream(file_, std::ios::in | std::ios::out | std::ios::binary);
+    stream.seekp(std::streamoff(segment.marker));
+    stream.write(reinterpret_cast<const char*>(marker.data()), std::streamsize(marker.size()));
+  };
+  const drivers::Segment open = drivers::SegmentAt(start);
+  std::filesystem::resize_file(file_, open.Body() + 1000);
+  writeMarker(open);
+  auto map = Map();
+  ASSERT_EQ(1u, map.segments.size());
+  EXPECT_EQ(Size(), map.segments[0].end);
+  EXPECT_EQ(1u, map.unclosed.size());
+  writeMarker(
+      {open.start, open.marker, open.Body() + 5000});  // behind the end: not all was written
+  map = Map();
+  ASSERT_EQ(1u, map.segments.size());
+  EXPECT_EQ(Size(), map.segments[0].end);
+  BuildAll();
+  EXPECT_TRUE(Map().unclosed.empty());
+  EXPECT_EQ("", WrongLevels());
 }
 
 TEST_F(Space, OfRemovedLevelsInFrontOfOtherBytesStays) {
