@@ -240,6 +240,12 @@ class Pipes(Sources):
         os.mkfifo("cube.hdr")
         self.check_refused("cube.envi", "cube.hdr")
 
+    def test_of_another_name_are_none_of_its_business(self):
+        write("photo.png", "PNG", self.pixels, "Byte")
+        for pipe in ("photos.png", "photo", "other.aux.xml"):
+            os.mkfifo(pipe)
+        self.assertEqual([], info("photo.png")["levels"])
+
     def test_as_a_source_or_beside_a_source(self):
         os.mkfifo("pipe.tif")
         for text in (SOURCE % "<SourceFilename relativeToVRT='1'>pipe.tif</SourceFilename>",

@@ -67,7 +67,7 @@ std::string SpecialFiles::Beside(const std::string& image) {
   const auto known = folders_.find(folder);
   const auto& names =
       known != folders_.end() ? known->second : folders_[folder] = SpecialFilesIn(folder);
-  const std::string stem = path.stem().string();
+  const std::string stem = path.stem().string() + ".";
   for (const std::string& name : names)
     if (name.starts_with(stem)) return (path.parent_path() / name).string();
   return {};

@@ -11,8 +11,8 @@ namespace orin::drivers {
 /// Remembers what it saw of each folder; made for one look at an image and its sources.
 class SpecialFiles {
  public:
-  /// A pipe or device whose name begins as that of `image` without its extension; empty when there
-  /// is none. The library opens whatever has such a name.
+  /// A pipe or device that has the name of `image` but for extensions; empty when there is none.
+  /// The library opens whatever has such a name.
   std::string Beside(const std::string& image);
 
  private:
