@@ -12,6 +12,8 @@ constexpr GdalFormat kFormats[] = {
      Decoding::kRowsOfAllChannels},
     {"GTiff", "GDALRegister_GTiff", kFormatArchivedTiff, "GTIF-REMOTE",
      "GeoTIFF in an archive or on a server", 0, Decoding::kBlocks},
+    {"GTiff", "GDALRegister_GTiff", kFormatTiffPage, "GTIF-PAGE", "page of a GeoTIFF", 0,
+     Decoding::kBlocks},
     {"COG", "GDALRegister_COG", 0, "", "", 0, Decoding::kBlocks},
     {"NITF", "GDALRegister_NITF", 302, "NITF", "NITF", 0, Decoding::kBlocks},
     {"AAIGrid", "GDALRegister_AAIGrid", 303, "AAIGRID", "Arc/Info ASCII grid", 0, Decoding::kRows},

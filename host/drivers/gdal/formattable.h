@@ -16,7 +16,9 @@ enum class Decoding {
   kRowsOfAllChannels,  ///< and reading one channel costs as much as reading all
 };
 
-inline constexpr int kFormatArchivedTiff = 301;  ///< TIFF that is no file by itself
+// TIFF that is no file by itself.
+inline constexpr int kFormatArchivedTiff = 301;
+inline constexpr int kFormatTiffPage = 317;
 
 /// One driver of the library.
 struct GdalFormat {

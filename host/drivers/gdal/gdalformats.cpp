@@ -3,9 +3,11 @@
 
 #include <dlfcn.h>
 #include <gdal.h>
+#include <strings.h>
 
 #include <algorithm>
 #include <mutex>
+#include <string_view>
 #include <vector>
 
 #include "host/drivers/gdal/gdalerrors.h"
@@ -14,6 +16,8 @@
 
 namespace orin::drivers {
 namespace {
+
+constexpr char kPagePrefix[] = "GTIFF_DIR:";
 
 /// The library in the process, wherever it came from; null when it is part of the program.
 void* LibraryInProcess() {
@@ -50,10 +54,12 @@ const GdalFormat* IdentifyGdalFormat(const std::string& name) {
   const auto allowed = OpeningDrivers();
   GDALDriverH driver = GDALIdentifyDriverEx(name.c_str(), GDAL_OF_RASTER, allowed.data(), nullptr);
   if (!driver) return nullptr;
-  const std::string found = GDALGetDriverShortName(driver);
+  const std::string_view found = GDALGetDriverShortName(driver);
+  const bool isPage = strncasecmp(name.c_str(), kPagePrefix, sizeof kPagePrefix - 1) == 0;
   const std::span<const GdalFormat> formats = GdalFormats();
-  const auto format = std::find_if(formats.begin(), formats.end(),
-                                   [&](const GdalFormat& f) { return f.driver == found; });
+  const auto format = std::find_if(formats.begin(), formats.end(), [&](const GdalFormat& f) {
+    return f.driver == found && (!isPage || f.code == kFormatTiffPage);
+  });
   return format == formats.end() ? nullptr : &*format;
 }
 

@@ -54,7 +54,8 @@ GdalSource::GdalSource(std::string name, const GdalFormat& format, SourceUse use
   KeepDecodedRows(handle);
   hasMask_ = HasMaskInside(handle);
   watch_ = WatchOf(handle, format_);
-  if (format_.code == kFormatArchivedTiff) levels_ = ArchivedLevels(name_, format_);
+  if (format_.code == kFormatArchivedTiff || format_.code == kFormatTiffPage)
+    levels_ = ArchivedLevels(name_, format_);
   if (format_.code != kFormatErdas) return;
   if (use == SourceUse::kUpdate) RequireAllValid();
   levels_ = OpenHfaLevels(name_, format_, *this, use);

@@ -56,6 +56,17 @@ TEST_F(GdalDriver, LeavesLocalTiffFilesToTheTiffDriver) {
   EXPECT_EQ("TIFF", datasources::FormatNameOf(*Open(File("image.tif"))));
 }
 
+TEST_F(GdalDriver, CallsAPageOfATiffAPage) {
+  WritePicture(File("image.tif"), "GTiff", {});
+  for (const char* prefix : {"GTIFF_DIR:1:", "gtiff_dir:1:"}) {
+    const auto page = Open(prefix + File("image.tif"));
+    ASSERT_TRUE(page);
+    EXPECT_EQ("GTIF-PAGE", datasources::FormatNameOf(*page));
+    EXPECT_EQ("page of a GeoTIFF", ZMBGetFormatInfo(page->GetFileFormatCode())->description);
+  }
+  EXPECT_EQ("GTIF-REMOTE", datasources::FormatNameOf(*Open("/vsisubfile/0," + File("image.tif"))));
+}
+
 TEST_F(GdalDriver, DoesNotTakeDirectoriesMissingFilesOrMemoryForRasters) {
   WriteBytes(File("text.png"), "no picture");
   for (const std::string& name :
