@@ -10,6 +10,7 @@
 #include "apps/orin-overviews/progressmodel.h"
 #include "host/datasources/dataset.h"
 #include "host/datasources/levelroom.h"
+#include "host/model/levelsize.h"
 
 namespace orin::app {
 
@@ -34,7 +35,7 @@ struct BuildPlan {
   LevelReport report = LevelReport::kWithinShare;
   datasources::LevelRoom room;  ///< that the levels to be built take
 
-  bool IsEmpty(unsigned level) const { return width / level == 0 || height / level == 0; }
+  bool IsEmpty(unsigned level) const { return model::LevelSizeOf(width, height, level).IsEmpty(); }
 };
 
 /// \throws orin::Exception  the file cannot be opened or is no raster

@@ -15,12 +15,6 @@ struct LevelRoom {
   bool blursAlpha = false;  ///< opacity is stored with loss; masks say exactly what holds data
 };
 
-/// False for level 0, and where a side of the level would be shorter than a pixel.
-/// \param width, height  of the image in pixels
-inline bool LevelHasPixels(uint32_t width, uint32_t height, unsigned level) {
-  return level != 0 && width >= level && height >= level;
-}
-
 /// Why the file system cannot take the levels, naming what is needed and what is free; empty when
 /// it can, or does not tell how much is free.
 std::string SpaceProblem(const LevelRoom& room);

@@ -6,6 +6,7 @@
 
 #include "host/datasources/formats.h"
 #include "host/datasources/overviewaccessors.h"
+#include "host/model/levelsize.h"
 #include "host/services/autoptr.h"
 #include "host/services/counter.h"
 #include "host/services/exception.h"
@@ -22,6 +23,7 @@ namespace {
 using orin::HAutoPtr;
 using orin::datasources::IDataset;
 using orin::datasources::IRasterDataset;
+using orin::model::LevelSizeOf;
 using orin::resamplers::IResamplerFactory;
 using Levels = std::vector<unsigned>;
 using Channels = std::vector<unsigned>;
@@ -63,17 +65,13 @@ bool CheckChannels(const Channels& channels, unsigned count) {
   return true;
 }
 
-bool IsEmptyLevel(const IRasterDataset& raster, unsigned level) {
-  return raster.GetWidth() / level == 0 || raster.GetHeight() / level == 0;
-}
-
 bool CheckLevels(const Levels& levels, const IRasterDataset& raster, bool force) {
   for (size_t i = 0; i < levels.size(); ++i) {
     if (levels[i] < 2)
       return Fail(FormatString(_("OLEVELS[%d] = %d  - Levels must be 2 or greater.\n"), int(i + 1),
                                int(levels[i])),
                   625);
-    if (force && IsEmptyLevel(raster, levels[i]))
+    if (force && LevelSizeOf(raster.GetWidth(), raster.GetHeight(), levels[i]).IsEmpty())
       return Fail(_("You cannot use level ") + std::to_string(levels[i]) +
                       _(" With a file with size ") + std::to_string(raster.GetWidth()) + "x" +
                       std::to_string(raster.GetHeight()) +

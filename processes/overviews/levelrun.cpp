@@ -3,6 +3,7 @@
 
 #include <algorithm>
 
+#include "host/model/levelsize.h"
 #include "host/services/counter.h"
 #include "host/services/text.h"
 #include "processes/overviews/levelpass.h"
@@ -24,7 +25,8 @@ LevelRun::LevelRun(const LevelRequest& request) : request_(request) {
 }
 
 bool LevelRun::IsEmpty(unsigned level) const {
-  return request_.raster->GetWidth() / level == 0 || request_.raster->GetHeight() / level == 0;
+  return model::LevelSizeOf(request_.raster->GetWidth(), request_.raster->GetHeight(), level)
+      .IsEmpty();
 }
 
 bool LevelRun::Build() {

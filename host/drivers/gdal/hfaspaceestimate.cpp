@@ -7,6 +7,7 @@
 
 #include "host/datasources/levelroom.h"
 #include "host/drivers/gdal/hfablocks.h"
+#include "host/model/levelsize.h"
 #include "host/services/text.h"
 
 namespace orin::drivers {
@@ -79,7 +80,7 @@ LevelRoom HfaSpaceEstimate::For(const std::vector<unsigned>& levels,
   LevelRoom room;
   std::vector<unsigned> made = levels;
   std::erase_if(made, [&](unsigned level) {
-    return !datasources::LevelHasPixels(image_.Width(), image_.Height(), level);
+    return model::LevelSizeOf(image_.Width(), image_.Height(), level).IsEmpty();
   });
   if (made.empty() || channels.empty()) return room;
   room.bytes = TreeBytesOf(made, channels);

@@ -4,6 +4,7 @@
 #include <algorithm>
 
 #include "host/drivers/memory/memoryplane.h"
+#include "host/model/levelsize.h"
 #include "host/services/exception.h"
 #include "host/services/text.h"
 
@@ -159,7 +160,8 @@ void MemoryLevels::Create(unsigned level, const std::vector<unsigned>& channels,
       "MemoryLevels::Create(unsigned int, const std::vector<unsigned int>&, const std::string&)";
   RequireWritable(function);
   const std::lock_guard lock(table_->mutex);
-  if (level < 2 || table_->width / level == 0 || table_->height / level == 0)
+  const model::LevelSize size = model::LevelSizeOf(table_->width, table_->height, level);
+  if (level < 2 || size.IsEmpty())
     throw Exception(FormatString(_("%s: of %u x %u pixels, can have no level %u."),
                                  table_->file.c_str(), table_->width, table_->height, level),
                     kSource, function, 0);
@@ -168,8 +170,8 @@ void MemoryLevels::Create(unsigned level, const std::vector<unsigned>& channels,
   made.channels.resize(table_->types.size());
   LevelDescription& description = made.description;
   description.level = level;
-  description.width = table_->width / level;
-  description.height = table_->height / level;
+  description.width = size.width;
+  description.height = size.height;
   description.place = table_->place;
   description.file = table_->file;
   description.method = method;

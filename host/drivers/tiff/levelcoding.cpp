@@ -7,9 +7,9 @@
 #include <tuple>
 #include <utility>
 
-#include "host/datasources/levelroom.h"
 #include "host/drivers/tiff/codingoptions.h"
 #include "host/drivers/tiff/jpegquality.h"
+#include "host/model/levelsize.h"
 #include "host/services/exception.h"
 #include "host/services/text.h"
 
@@ -187,10 +187,10 @@ LevelCoding CodingOfLevel(const LevelCoding& image, unsigned level, const std::s
   };
   LevelCoding coding = image;
   PixelFormat& format = coding.format;
-  if (!datasources::LevelHasPixels(image.format.width, image.format.height, level))
-    refuse(_("%s: level %u would have no pixel."));
-  format.width = image.format.width / level;
-  format.height = image.format.height / level;
+  const auto size = model::LevelSizeOf(format.width, format.height, level);
+  if (size.IsEmpty()) refuse(_("%s: level %u would have no pixel."));
+  format.width = size.width;
+  format.height = size.height;
   const bool keepsTiles = image.format.tiled && format.tileWidth % 16 == 0 &&
                           format.tileHeight % 16 == 0 && coding.TileBytes() <= kMostTileBytes;
   if (!keepsTiles) format.tileWidth = format.tileHeight = kTileEdge;

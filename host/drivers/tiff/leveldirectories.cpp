@@ -5,6 +5,7 @@
 #include <cmath>
 #include <limits>
 
+#include "host/model/levelsize.h"
 #include "host/services/exception.h"
 
 namespace orin::drivers {
@@ -59,7 +60,8 @@ void ReadMetadata(const PositionedFile& file, const TiffStructure& structure,
 bool IsOurs(const StoredLevel& stored, const ImageShape& image) {
   const unsigned level = stored.metadata.level;
   return level >= 2 && stored.metadata.validity.size() == image.samples &&
-         stored.format.width == image.width / level && stored.format.height == image.height / level;
+         model::LevelSizeOf(image.width, image.height, level) ==
+             model::LevelSize{stored.format.width, stored.format.height};
 }
 
 /// The level that directory `index` holds, if it is one of this image.

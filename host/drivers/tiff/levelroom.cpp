@@ -6,12 +6,12 @@
 #include "host/drivers/tiff/levelmask.h"
 #include "host/drivers/tiff/storedsize.h"
 #include "host/drivers/tiff/tifflevelstore.h"
+#include "host/model/levelsize.h"
 #include "host/services/text.h"
 
 namespace orin::drivers {
 
 using datasources::BigTiff;
-using datasources::LevelHasPixels;
 using datasources::LevelRoom;
 
 /// The most that a level of `planes` planes takes, with its mask where it gets one.
@@ -85,7 +85,8 @@ LevelRoom TiffLevelStore::RoomOf(const std::vector<unsigned>& levels,
   uint64_t most = 0;
   const TiffStructure& structure = file_->Structure();
   for (const unsigned level : levels) {
-    if (!LevelHasPixels(settings_.image.width, settings_.image.height, level)) continue;
+    const ImageShape& image = settings_.image;
+    if (model::LevelSizeOf(image.width, image.height, level).IsEmpty()) continue;
     const LevelCoding coding = PendingFor(level).coding;
     room.blursAlpha = room.blursAlpha || BlursAlpha(coding.format);
     const auto planes = static_cast<uint32_t>(PlanesOf(coding, channels).size());

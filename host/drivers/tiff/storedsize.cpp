@@ -6,6 +6,7 @@
 #include <set>
 
 #include "host/datasources/pyramidlevels.h"
+#include "host/model/levelsize.h"
 
 namespace orin::drivers {
 namespace {
@@ -81,11 +82,12 @@ uint64_t MostBytesOfPyramids(uint32_t imageWidth, uint32_t imageHeight, LevelCod
   std::set<unsigned> factors;
   for (const unsigned step : {2u, 3u})
     for (const unsigned factor : ComputePyramidLevel(imageWidth, imageHeight, step))
-      if (imageWidth / factor > 0 && imageHeight / factor > 0) factors.insert(factor);
+      if (!model::LevelSizeOf(imageWidth, imageHeight, factor).IsEmpty()) factors.insert(factor);
   uint64_t bytes = 0;
   for (const unsigned factor : factors) {
-    level.format.width = imageWidth / factor;
-    level.format.height = imageHeight / factor;
+    const auto size = model::LevelSizeOf(imageWidth, imageHeight, factor);
+    level.format.width = size.width;
+    level.format.height = size.height;
     bytes += MostBytesOf(level, level.Planes(), true);
   }
   return bytes;
