@@ -2,6 +2,8 @@
 // SPDX-License-Identifier: MIT
 #include <benchmark/benchmark.h>
 
+#include <algorithm>
+#include <cctype>
 #include <memory>
 #include <random>
 #include <string>
@@ -40,9 +42,10 @@ std::unique_ptr<gobs::Mask> RandomMask(const gobs::Raster& block) {
 }
 
 /// Items are destination samples.
-template <class Factory, class T>
-void Halve(benchmark::State& state, uint32_t channels, bool masked) {
-  const std::unique_ptr<IRasterResampler> kernel(Factory().CreateResampler(gobs::DataTypeOf<T>()));
+template <class T>
+void Halve(benchmark::State& state, QRTOverviewResampleType type, uint32_t channels, bool masked) {
+  const std::unique_ptr<IRasterResampler> kernel(
+      MakeResamplerFactory(type)->CreateResampler(gobs::DataTypeOf<T>()));
   const auto src = RandomBlock<T>(kSide, channels, kMargin);
   const auto dst = RandomBlock<T>(kSide / 2, channels, 0);
   const auto mask = masked ? RandomMask(*src) : nullptr;
@@ -54,30 +57,28 @@ void Halve(benchmark::State& state, uint32_t channels, bool masked) {
   state.SetItemsProcessed(state.iterations() * int64_t{dst->width} * dst->height * channels);
 }
 
-template <class Factory, class T>
-void Register(const std::string& method, const std::string& type, uint32_t channels) {
+/// "Bicubic/uint16/1ch/masked/half"
+template <class T>
+void Register(const model::Method& method, const std::string& type, uint32_t channels) {
+  std::string name(method.name);
+  std::transform(name.begin() + 1, name.end(), name.begin() + 1,
+                 [](unsigned char c) { return static_cast<char>(std::tolower(c)); });
   for (const bool masked : {false, true}) {
-    const std::string name = method + "/" + type + "/" + std::to_string(channels) + "ch/" +
+    const std::string full = name + "/" + type + "/" + std::to_string(channels) + "ch/" +
                              (masked ? "masked" : "unmasked") + "/half";
-    benchmark::RegisterBenchmark(name.c_str(), Halve<Factory, T>, channels, masked);
+    benchmark::RegisterBenchmark(full.c_str(), Halve<T>, method.type, channels, masked);
   }
 }
 
-template <class Factory>
-bool RegisterTypes(const std::string& method) {
-  Register<Factory, uint8_t>(method, "uint8", 1);
-  Register<Factory, uint8_t>(method, "uint8", 3);
-  Register<Factory, uint16_t>(method, "uint16", 1);
-  Register<Factory, float>(method, "float32", 1);
+[[maybe_unused]] const bool kRegistered = [] {
+  for (const model::Method& method : model::kMethods) {
+    Register<uint8_t>(method, "uint8", 1);
+    Register<uint8_t>(method, "uint8", 3);
+    Register<uint16_t>(method, "uint16", 1);
+    Register<float>(method, "float32", 1);
+  }
   return true;
-}
-
-[[maybe_unused]] const bool kRegistered =
-    RegisterTypes<NearestNeighbourResamplerFactory>("Nearest") &&
-    RegisterTypes<AverageResamplerFactory>("Average") &&
-    RegisterTypes<ModeResamplerFactory>("Mode") &&
-    RegisterTypes<BilinearResamplerFactory>("Bilinear") &&
-    RegisterTypes<BicubicResamplerFactory>("Bicubic");
+}();
 
 }  // namespace
 }  // namespace orin::resamplers

@@ -99,9 +99,8 @@ std::string ChannelProblem(const CreateFileOverviews& job, const BuildPlan& plan
 void WarnOfBlending(const BuildPlan& plan, const BuildOptions& options, const std::string& file,
                     Console& console) {
   const auto method = options.method == ResampleInvalid ? GetDefaultPyramidType() : options.method;
-  const bool blends =
-      method == ResampleAverage || method == ResampleBilinear || method == ResampleBicubic;
-  if (blends && plan.holdsClasses && !plan.building.empty())
+  const model::Method* const row = model::FindMethod(method);
+  if (row && row->blends && plan.holdsClasses && !plan.building.empty())
     console.Warning(AfterFileName(file, BlendedClassesText()));
 }
 

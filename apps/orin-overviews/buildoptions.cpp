@@ -10,7 +10,7 @@ namespace {
 /// An option whose text `read` turns into a value, or answers why it cannot.
 template <class Read>
 CLI::Option* AddText(CLI::App& command, const std::string& name, const char* kind,
-                     const char* description, Read read) {
+                     const std::string& description, Read read) {
   return command
       .add_option_function<std::string>(
           name,
@@ -37,9 +37,8 @@ std::string ReadFactor(const std::string& text, unsigned& factor) {
 std::string ReadMethod(const std::string& text, QRTOverviewResampleType& method) {
   method = GetPyramidType(text);
   if (method != ResampleInvalid) return "";
-  return FormatString(
-      _("there is no method \"%s\"; the methods are nearest, average, mode, bilinear, bicubic"),
-      text.c_str());
+  return FormatString(_("unknown method \"%s\"; the methods are %s"), text.c_str(),
+                      PyramidTypeNames().c_str());
 }
 
 /// Reads every KEY=VALUE.
@@ -86,7 +85,7 @@ CLI::App* AddBuildCommand(CLI::App& app, BuildOptions& options) {
   const auto* factor = AddText(
       *command, "--factor", "2|3", _("Build the whole pyramid, each level this much smaller"),
       [&](const std::string& text) { return ReadFactor(text, options.factor); });
-  AddText(*command, "--method", _("METHOD"), _("nearest, average, mode, bilinear or bicubic"),
+  AddText(*command, "--method", _("METHOD"), PyramidTypeNames(),
           [&](const std::string& text) { return ReadMethod(text, options.method); });
   AddText(*command, "--channels", _("LIST"), _("Channels to treat, such as 1,3-5"),
           [&](const std::string& text) { return ReadList(ParseChannels(text), options.channels); });

@@ -1,12 +1,12 @@
 /// The run: checks a request against its file, decides what is missing, and has it built.
 // SPDX-License-Identifier: MIT
 #include <algorithm>
-#include <memory>
 #include <numeric>
 
 #include "host/datasources/formats.h"
 #include "host/datasources/overviewaccessors.h"
 #include "host/model/levelsize.h"
+#include "host/model/methods.h"
 #include "host/services/autoptr.h"
 #include "host/services/counter.h"
 #include "host/services/exception.h"
@@ -24,7 +24,7 @@ using orin::HAutoPtr;
 using orin::datasources::IDataset;
 using orin::datasources::IRasterDataset;
 using orin::model::LevelSizeOf;
-using orin::resamplers::IResamplerFactory;
+using orin::model::Method;
 using Levels = std::vector<unsigned>;
 using Channels = std::vector<unsigned>;
 
@@ -98,29 +98,6 @@ bool CheckInternalPlacement(IDataset* dataset, bool readOnly) {
           "is not possible for a read-only file."),
         670);
   return true;
-}
-
-struct Method {
-  std::unique_ptr<IResamplerFactory> factory;  ///< null for a type that does not exist
-  std::string name;
-};
-
-Method MethodOf(QRTOverviewResampleType type) {
-  using namespace orin::resamplers;
-  switch (type) {
-    case ResampleNearest:
-      return {std::make_unique<NearestNeighbourResamplerFactory>(), "NEAREST"};
-    case ResampleAverage:
-      return {std::make_unique<AverageResamplerFactory>(), "AVERAGE"};
-    case ResampleMode:
-      return {std::make_unique<ModeResamplerFactory>(), "MODE"};
-    case ResampleBilinear:
-      return {std::make_unique<BilinearResamplerFactory>(), "BILINEAR"};
-    case ResampleBicubic:
-      return {std::make_unique<BicubicResamplerFactory>(), "BICUBIC"};
-    default:
-      return {nullptr, ""};
-  }
 }
 
 /// The requested levels that do not exist or are not valid for all channels, ascending.
@@ -208,8 +185,9 @@ bool CreateFileOverviews::CreateOverviews(IDataset** dataset, bool readOnly,
   if (!CheckLevels(levels, *raster, force_)) return false;
   if (!external_ && !automatic_ && !CheckInternalPlacement(*dataset, readOnly)) return false;
   const bool hasComplex = HasComplex();
-  const Method method = MethodOf(type);
-  if (type != ResampleNearest && type != ResampleAverage && hasComplex)
+  const Method* const method = orin::model::FindMethod(type);
+  const auto factory = orin::resamplers::MakeResamplerFactory(type);
+  if (hasComplex && !(method && method->takesComplex))
     return Fail(_("Only AVER or NEAREST is supported for complex data."), 698);
   if (channels_.empty()) return true;  // only bit masks: they have no overviews
   const Levels missing = MissingLevels(*raster, levels, channels_, force_);
@@ -219,6 +197,7 @@ bool CreateFileOverviews::CreateOverviews(IDataset** dataset, bool readOnly,
         kSource, 724);
     return true;
   }
-  return BuildLevels({raster, channels_, missing, method.factory.get(), method.name, isTiff,
-                      type == ResampleAverage, progress_});
+  return BuildLevels({raster, channels_, missing, factory.get(),
+                      std::string(method ? method->name : ""), isTiff,
+                      method && method->needsDivisor, progress_});
 }

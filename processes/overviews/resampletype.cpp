@@ -2,27 +2,22 @@
 #include "processes/overviews/resampletype.h"
 
 #include <algorithm>
+#include <iterator>
 #include <string_view>
 
 #include "host/services/preferences.h"
 
 namespace {
 
-struct Name {
-  std::string_view prefix;
-  QRTOverviewResampleType type;
-};
-
-constexpr Name kNames[] = {
-    {"NEAR", ResampleNearest},  {"AVER", ResampleAverage}, {"MODE", ResampleMode},
-    {"BILI", ResampleBilinear}, {"BICU", ResampleBicubic}, {"CUBIC", ResampleBicubic},
-};
+using orin::model::kMethods;
+using orin::model::Method;
 
 /// ASCII only, so that no locale changes what a name means.
 char UpperCase(char c) { return c >= 'a' && c <= 'z' ? static_cast<char>(c - 'a' + 'A') : c; }
+char LowerCase(char c) { return c >= 'A' && c <= 'Z' ? static_cast<char>(c - 'A' + 'a') : c; }
 
 bool StartsLike(std::string_view name, std::string_view prefix) {
-  return name.size() >= prefix.size() &&
+  return !prefix.empty() && name.size() >= prefix.size() &&
          std::equal(prefix.begin(), prefix.end(), name.begin(),
                     [](char expected, char given) { return expected == UpperCase(given); });
 }
@@ -30,8 +25,9 @@ bool StartsLike(std::string_view name, std::string_view prefix) {
 }  // namespace
 
 QRTOverviewResampleType GetPyramidType(std::string name) {
-  for (const Name& known : kNames)
-    if (StartsLike(name, known.prefix)) return known.type;
+  for (const Method& method : kMethods)
+    for (const std::string_view prefix : method.prefixes)
+      if (StartsLike(name, prefix)) return method.type;
   return ResampleInvalid;
 }
 
@@ -47,4 +43,13 @@ QRTOverviewResampleType GetDefaultPyramidType() {
     default:
       return ResampleNearest;  // deliberate: bilinear and bicubic are never a preference
   }
+}
+
+std::string PyramidTypeNames() {
+  std::string names;
+  for (const Method& method : kMethods) {
+    if (!names.empty()) names += ", ";
+    std::transform(method.name.begin(), method.name.end(), std::back_inserter(names), LowerCase);
+  }
+  return names;
 }

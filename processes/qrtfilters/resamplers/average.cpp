@@ -57,4 +57,9 @@ void Average<T>::ResampleGeneral(gobs::Raster* src, gobs::Mask* srcMask, gobs::R
 
 ORIN_INSTANTIATE_KERNEL(Average);
 
+template <>
+std::unique_ptr<IResamplerFactory> detail::NewFactory<ResampleAverage>() {
+  return std::make_unique<AverageResamplerFactory>();
+}
+
 }  // namespace orin::resamplers

@@ -2,6 +2,7 @@
 // SPDX-License-Identifier: MIT
 #pragma once
 
+#include "processes/qrtfilters/resamplers/resamplerfactory.h"
 #include "processes/qrtfilters/resamplers/resamplerstate.h"
 
 namespace orin::resamplers {
@@ -29,5 +30,7 @@ class Average final : public Resampler {
 
   uint32_t GetMargin() override { return 1; }
 };
+
+class AverageResamplerFactory final : public KernelFactory<Average> {};
 
 }  // namespace orin::resamplers

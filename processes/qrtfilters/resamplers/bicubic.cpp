@@ -66,4 +66,9 @@ void Bicubic<T>::SetComplex(bool isComplex) {
 
 ORIN_INSTANTIATE_KERNEL(Bicubic);
 
+template <>
+std::unique_ptr<IResamplerFactory> detail::NewFactory<ResampleBicubic>() {
+  return std::make_unique<BicubicResamplerFactory>();
+}
+
 }  // namespace orin::resamplers

@@ -2,6 +2,7 @@
 // SPDX-License-Identifier: MIT
 #pragma once
 
+#include "processes/qrtfilters/resamplers/resamplerfactory.h"
 #include "processes/qrtfilters/resamplers/resamplerstate.h"
 
 namespace orin::resamplers {
@@ -19,5 +20,7 @@ class Bicubic final : public Resampler {
   /// \throws orin::Exception  `isComplex` is true; the state is unchanged
   void SetComplex(bool isComplex) override;
 };
+
+class BicubicResamplerFactory final : public KernelFactory<Bicubic> {};
 
 }  // namespace orin::resamplers

@@ -51,4 +51,9 @@ void Bilinear<T>::SetComplex(bool isComplex) {
 
 ORIN_INSTANTIATE_KERNEL(Bilinear);
 
+template <>
+std::unique_ptr<IResamplerFactory> detail::NewFactory<ResampleBilinear>() {
+  return std::make_unique<BilinearResamplerFactory>();
+}
+
 }  // namespace orin::resamplers

@@ -1,51 +1,31 @@
 // SPDX-License-Identifier: MIT
 #include "processes/qrtfilters/resamplers/factories.h"
 
-#include <algorithm>
-#include <iostream>
-#include <string>
+#include <array>
+#include <utility>
 
-#include "host/services/environment.h"
-#include "processes/qrtfilters/resamplers/average.h"
-#include "processes/qrtfilters/resamplers/bicubic.h"
-#include "processes/qrtfilters/resamplers/bilinear.h"
 #include "processes/qrtfilters/resamplers/detail/createkernel.h"
-#include "processes/qrtfilters/resamplers/mode.h"
-#include "processes/qrtfilters/resamplers/nearestneighbour.h"
 
 namespace orin::resamplers {
 namespace {
 
-/// The processing target that the environment asks for, in upper case; empty when it asks for none.
-std::string RequestedTarget() {
-  std::string target = core::QRTGetEnvironmentVariable("ORIN_TARGET");
-  std::transform(target.begin(), target.end(), target.begin(),
-                 [](char c) { return c >= 'a' && c <= 'z' ? char(c - 'a' + 'A') : c; });
-  return target;
+using model::kMethods;
+
+/// One entry for each row of the table of methods: a row without a kernel does not link.
+template <size_t... kRows>
+constexpr auto FactoriesOf(std::index_sequence<kRows...>) {
+  static_assert(((static_cast<size_t>(kMethods[kRows].type) == kRows) && ...),
+                "the rows stand in the order of the enumerators");
+  return std::array{&detail::NewFactory<kMethods[kRows].type>...};
 }
+
+constexpr auto kFactories = FactoriesOf(std::make_index_sequence<kMethods.size()>());
 
 }  // namespace
 
-bool detail::RunsOnCpu() {
-  const std::string target = RequestedTarget();
-  if (target == "GPU") std::cout << "Using the GPU!" << std::endl;
-  return target.empty() || target == "CPU";
-}
-
-IRasterResampler* NearestNeighbourResamplerFactory::CreateResampler(const gobs::DataType& type) {
-  return detail::CreateKernel<NearestNeighbour>(type);
-}
-IRasterResampler* AverageResamplerFactory::CreateResampler(const gobs::DataType& type) {
-  return detail::CreateKernel<Average>(type);
-}
-IRasterResampler* ModeResamplerFactory::CreateResampler(const gobs::DataType& type) {
-  return detail::CreateKernel<Mode>(type);
-}
-IRasterResampler* BilinearResamplerFactory::CreateResampler(const gobs::DataType& type) {
-  return detail::CreateKernel<Bilinear>(type);
-}
-IRasterResampler* BicubicResamplerFactory::CreateResampler(const gobs::DataType& type) {
-  return detail::CreateKernel<Bicubic>(type);
+std::unique_ptr<IResamplerFactory> MakeResamplerFactory(QRTOverviewResampleType type) {
+  if (!model::FindMethod(type)) return nullptr;
+  return kFactories[static_cast<size_t>(type)]();
 }
 
 }  // namespace orin::resamplers

@@ -1,39 +1,20 @@
-/// The five methods' factories. Stateless.
+/// The factories of the methods, by name and by the table of methods. Stateless.
 // SPDX-License-Identifier: MIT
 #pragma once
 
+#include <memory>
+
+#include "host/model/methods.h"
+#include "processes/qrtfilters/resamplers/average.h"
+#include "processes/qrtfilters/resamplers/bicubic.h"
+#include "processes/qrtfilters/resamplers/bilinear.h"
+#include "processes/qrtfilters/resamplers/mode.h"
+#include "processes/qrtfilters/resamplers/nearestneighbour.h"
 #include "processes/qrtfilters/resamplers/resamplerfactory.h"
 
 namespace orin::resamplers {
 
-class NearestNeighbourResamplerFactory final : public IResamplerFactory {
- public:
-  IRasterResampler* CreateResampler(const gobs::DataType& type) override;
-  uint32_t GetMargin() override { return 0; }
-};
-
-class AverageResamplerFactory final : public IResamplerFactory {
- public:
-  IRasterResampler* CreateResampler(const gobs::DataType& type) override;
-  uint32_t GetMargin() override { return 1; }
-};
-
-class ModeResamplerFactory final : public IResamplerFactory {
- public:
-  IRasterResampler* CreateResampler(const gobs::DataType& type) override;
-  uint32_t GetMargin() override { return 1; }
-};
-
-class BilinearResamplerFactory final : public IResamplerFactory {
- public:
-  IRasterResampler* CreateResampler(const gobs::DataType& type) override;
-  uint32_t GetMargin() override { return 1; }
-};
-
-class BicubicResamplerFactory final : public IResamplerFactory {
- public:
-  IRasterResampler* CreateResampler(const gobs::DataType& type) override;
-  uint32_t GetMargin() override { return 3; }
-};
+/// A new factory of a method; null for a value that is no method.
+std::unique_ptr<IResamplerFactory> MakeResamplerFactory(QRTOverviewResampleType type);
 
 }  // namespace orin::resamplers

@@ -71,4 +71,9 @@ void Mode<T>::SetComplex(bool isComplex) {
 
 ORIN_INSTANTIATE_KERNEL(Mode);
 
+template <>
+std::unique_ptr<IResamplerFactory> detail::NewFactory<ResampleMode>() {
+  return std::make_unique<ModeResamplerFactory>();
+}
+
 }  // namespace orin::resamplers

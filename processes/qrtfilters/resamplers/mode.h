@@ -2,6 +2,7 @@
 // SPDX-License-Identifier: MIT
 #pragma once
 
+#include "processes/qrtfilters/resamplers/resamplerfactory.h"
 #include "processes/qrtfilters/resamplers/resamplerstate.h"
 
 namespace orin::resamplers {
@@ -18,5 +19,7 @@ class Mode final : public Resampler {
   /// \throws orin::Exception  `isComplex` is true; the state is unchanged
   void SetComplex(bool isComplex) override;
 };
+
+class ModeResamplerFactory final : public KernelFactory<Mode> {};
 
 }  // namespace orin::resamplers

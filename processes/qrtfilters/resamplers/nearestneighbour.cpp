@@ -49,4 +49,9 @@ void NearestNeighbour<T>::Resample(gobs::Raster* src, gobs::Mask* srcMask, gobs:
 
 ORIN_INSTANTIATE_KERNEL(NearestNeighbour);
 
+template <>
+std::unique_ptr<IResamplerFactory> detail::NewFactory<ResampleNearest>() {
+  return std::make_unique<NearestNeighbourResamplerFactory>();
+}
+
 }  // namespace orin::resamplers

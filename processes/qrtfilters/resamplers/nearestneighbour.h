@@ -2,6 +2,7 @@
 // SPDX-License-Identifier: MIT
 #pragma once
 
+#include "processes/qrtfilters/resamplers/resamplerfactory.h"
 #include "processes/qrtfilters/resamplers/resamplerstate.h"
 
 namespace orin::resamplers {
@@ -15,5 +16,7 @@ class NearestNeighbour final : public Resampler {
   void Resample(gobs::Raster* src, gobs::Mask* srcMask, gobs::Raster* dst) override;
   uint32_t GetMargin() override { return 0; }
 };
+
+class NearestNeighbourResamplerFactory final : public KernelFactory<NearestNeighbour> {};
 
 }  // namespace orin::resamplers

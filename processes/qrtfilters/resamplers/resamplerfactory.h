@@ -20,4 +20,13 @@ class IResamplerFactory {
   virtual ~IResamplerFactory() = default;
 };
 
+/// Makes `Kernel<T>` for blocks of any of the pixel types, real or complex. Defined where the
+/// kernel is compiled.
+template <template <class> class Kernel>
+class KernelFactory : public IResamplerFactory {
+ public:
+  IRasterResampler* CreateResampler(const gobs::DataType& type) override;
+  uint32_t GetMargin() override;
+};
+
 }  // namespace orin::resamplers

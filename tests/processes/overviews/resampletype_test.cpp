@@ -37,6 +37,15 @@ TEST(GetPyramidType, KnowsNoOtherName) {
     EXPECT_EQ(ResampleInvalid, GetPyramidType(name)) << name;
 }
 
+TEST(GetPyramidType, KnowsEveryMethodOfTheTableByItsStoredName) {
+  for (const orin::model::Method& method : orin::model::kMethods)
+    EXPECT_EQ(method.type, GetPyramidType(std::string(method.name))) << method.name;
+}
+
+TEST(PyramidTypeNames, AreOfAllMethods) {
+  EXPECT_EQ("nearest, average, mode, bilinear, bicubic", PyramidTypeNames());
+}
+
 TEST(ResampleTypes, HaveFixedValues) {
   EXPECT_EQ(-1, ResampleInvalid);
   EXPECT_EQ(0, ResampleNearest);

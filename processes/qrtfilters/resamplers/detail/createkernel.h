@@ -1,8 +1,12 @@
-/// Makes a method's kernel for a block's data type, on the processing target that is asked for.
+/// Makes a method's kernels, on the processing target that is asked for, and its factory.
 // SPDX-License-Identifier: MIT
 #pragma once
 
+#include <memory>
+
 #include "basic/core/typedispatch/dispatchtype.h"
+#include "host/model/methods.h"
+#include "processes/qrtfilters/resamplers/resamplerfactory.h"
 #include "processes/qrtfilters/resamplers/resamplerpolicy.h"
 
 namespace orin::resamplers::detail {
@@ -11,12 +15,24 @@ namespace orin::resamplers::detail {
 /// resampler. Says so on standard output when `ORIN_TARGET` asks for the GPU.
 bool RunsOnCpu();
 
-/// All that a factory's `CreateResampler` does; the result is the caller's.
-template <template <class> class Method>
-IRasterResampler* CreateKernel(const gobs::DataType& type) {
-  if (!RunsOnCpu()) return nullptr;
-  return typedispatch::DispatchType<typedispatch::PixelTypes,
-                                    ResamplerPolicy<Method>::template Factory>::Dispatch(type);
-}
+/// A new factory of the method `kType`; defined in the source of the method's kernel.
+template <QRTOverviewResampleType kType>
+std::unique_ptr<IResamplerFactory> NewFactory();
 
 }  // namespace orin::resamplers::detail
+
+namespace orin::resamplers {
+
+template <template <class> class Kernel>
+IRasterResampler* KernelFactory<Kernel>::CreateResampler(const gobs::DataType& type) {
+  if (!detail::RunsOnCpu()) return nullptr;
+  return typedispatch::DispatchType<typedispatch::PixelTypes,
+                                    ResamplerPolicy<Kernel>::template Factory>::Dispatch(type);
+}
+
+template <template <class> class Kernel>
+uint32_t KernelFactory<Kernel>::GetMargin() {
+  return Kernel<uint8_t>().GetMargin();
+}
+
+}  // namespace orin::resamplers

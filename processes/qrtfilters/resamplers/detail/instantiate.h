@@ -1,4 +1,4 @@
-/// Compiles a kernel for the ten pixel types.
+/// Compiles a kernel for the ten pixel types, and its factory.
 // SPDX-License-Identifier: MIT
 #pragma once
 
@@ -6,6 +6,7 @@
 #include <type_traits>
 
 #include "basic/core/typedispatch/pixeltypes.h"
+#include "processes/qrtfilters/resamplers/detail/createkernel.h"
 
 // A macro because an explicit instantiation cannot walk a type list; the check below keeps it the
 // same.
@@ -19,7 +20,8 @@
   template class Kernel<float>;          \
   template class Kernel<double>;         \
   template class Kernel<int64_t>;        \
-  template class Kernel<uint64_t>
+  template class Kernel<uint64_t>;       \
+  template class KernelFactory<Kernel>
 
 static_assert(std::is_same_v<orin::typedispatch::PixelTypes,
                              orin::typedispatch::TypeList<signed char, unsigned char, short,

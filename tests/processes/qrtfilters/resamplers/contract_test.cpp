@@ -54,6 +54,12 @@ using Methods =
                      Method<Bicubic, BicubicResamplerFactory>>;
 TYPED_TEST_SUITE(EveryMethod, Methods);
 
+template <class... Ms>
+constexpr size_t CountOf(::testing::Types<Ms...>) {
+  return sizeof...(Ms);
+}
+static_assert(CountOf(Methods()) == model::kMethods.size(), "a method of the table is not tested");
+
 template <class M, class... Ts>
 void ExpectOneClassForRealAndComplex(typedispatch::TypeList<Ts...>) {
   const auto expect = []<class T>(std::type_identity<T>) {

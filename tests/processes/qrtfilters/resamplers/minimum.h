@@ -39,12 +39,6 @@ class Minimum final : public Resampler {
   uint32_t GetMargin() override { return 1; }
 };
 
-class MinimumResamplerFactory final : public IResamplerFactory {
- public:
-  IRasterResampler* CreateResampler(const gobs::DataType& type) override {
-    return detail::CreateKernel<Minimum>(type);
-  }
-  uint32_t GetMargin() override { return 1; }
-};
+class MinimumResamplerFactory final : public KernelFactory<Minimum> {};
 
 }  // namespace orin::resamplers

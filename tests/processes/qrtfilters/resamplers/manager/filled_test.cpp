@@ -29,12 +29,8 @@ class OwnValidity final : public gobs::IMaskDecision {
 
 std::vector<std::unique_ptr<IResamplerFactory>> Methods(bool isComplex) {
   std::vector<std::unique_ptr<IResamplerFactory>> methods;
-  methods.push_back(std::make_unique<NearestNeighbourResamplerFactory>());
-  methods.push_back(std::make_unique<AverageResamplerFactory>());
-  if (isComplex) return methods;
-  methods.push_back(std::make_unique<ModeResamplerFactory>());
-  methods.push_back(std::make_unique<BilinearResamplerFactory>());
-  methods.push_back(std::make_unique<BicubicResamplerFactory>());
+  for (const model::Method& method : model::kMethods)
+    if (!isComplex || method.takesComplex) methods.push_back(MakeResamplerFactory(method.type));
   return methods;
 }
 
