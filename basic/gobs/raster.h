@@ -64,7 +64,8 @@ class Raster : public RasterInfo, public RasterContext, public ThrowsOutOfMemory
 
   /// What is known of the pixels beside their values, geometry of the block: in a block that was
   /// read, the masks and the alpha channel of its raster; in one that was computed, where the
-  /// method put data. Null when nothing is known. No kernel reads it.
+  /// method put data. Null when nothing is known. Kernels go by the mask that they are given; ours
+  /// keep the validity of what they compute where the source block carries one.
   std::unique_ptr<Mask> validity;
 };
 

@@ -2,6 +2,7 @@
 #include "basic/gobs/mask/mask.h"
 
 #include <algorithm>
+#include <atomic>
 #include <cstring>
 #include <new>
 
@@ -12,6 +13,11 @@ namespace {
 
 uint64_t BufferPixels(const Mask& mask) {
   return (uint64_t{mask.height} + 2 * uint64_t{mask.marginY}) * mask.stride;
+}
+
+/// A byte may hold the end of one line and the start of the next, which other threads work on.
+void ClearBits(uint8_t& byte, unsigned bits) {
+  std::atomic_ref(byte).fetch_and(static_cast<uint8_t>(~bits), std::memory_order_relaxed);
 }
 
 }  // namespace
@@ -40,15 +46,17 @@ void Mask::SetValid(int64_t pixelX, int64_t pixelY, bool valid) {
 }
 
 void Mask::ClearRun(int64_t pixelX, int64_t pixelY, uint64_t count) {
-  uint64_t index = LayoutOf(*this).Index(pixelX, pixelY);
-  const uint64_t last = index + count;
-  const auto clear = [this](uint64_t n) {
-    begin[n / 8] = static_cast<uint8_t>(begin[n / 8] & ~(0x80u >> (n % 8)));
-  };
-  for (; index < last && index % 8 != 0; ++index) clear(index);
-  const uint64_t bytes = (last - index) / 8;
-  std::fill_n(begin + index / 8, bytes, uint8_t{0});
-  for (index += bytes * 8; index < last; ++index) clear(index);
+  if (count == 0) return;
+  const uint64_t first = LayoutOf(*this).Index(pixelX, pixelY);
+  const uint64_t last = first + count - 1;
+  uint8_t* const firstByte = begin + first / 8;
+  uint8_t* const lastByte = begin + last / 8;
+  const auto behind = static_cast<uint8_t>(0xFFu >> (first % 8));
+  const auto before = static_cast<uint8_t>(0xFFu << (7 - last % 8));
+  if (firstByte == lastByte) return ClearBits(*firstByte, behind & before);
+  ClearBits(*firstByte, behind);
+  std::fill(firstByte + 1, lastByte, uint8_t{0});
+  ClearBits(*lastByte, before);
 }
 
 std::optional<bool> Mask::Uniform() const {

@@ -52,7 +52,8 @@ class Mask : public ThrowsOutOfMemory {
     return MaskBits{begin, LayoutOf(*this)}(pixelX, pixelY);
   }
   void SetValid(int64_t pixelX, int64_t pixelY, bool valid);
-  /// Makes `count` pixels of a line no data, from (x, y) on; the margin is in reach.
+  /// Makes `count` pixels of a line no data, from (x, y) on; the margin is in reach. Several
+  /// threads may do so at once for pixels of their own.
   void ClearRun(int64_t pixelX, int64_t pixelY, uint64_t count);
   /// Whether all of the buffer's pixels are valid, or none is; empty for a mixture.
   std::optional<bool> Uniform() const;

@@ -5,6 +5,7 @@
 #include "processes/qrtfilters/resamplers/detail/checks.h"
 #include "processes/qrtfilters/resamplers/detail/copypixels.h"
 #include "processes/qrtfilters/resamplers/detail/fill.h"
+#include "processes/qrtfilters/resamplers/detail/filledrun.h"
 #include "processes/qrtfilters/resamplers/detail/instantiate.h"
 #include "processes/qrtfilters/resamplers/detail/saturate.h"
 
@@ -35,14 +36,17 @@ void NearestNeighbour<T>::Resample(gobs::Raster* src, gobs::Mask* srcMask, gobs:
   detail::RequireSameChannels(*src, *dst);
   const uint64_t components = uint64_t{src->channelCount} * (state_.isComplex ? 2 : 1);
   const Scratch<T> noData(components, detail::Saturate<T>(state_.noDataValue));
+  gobs::Mask* const validity = detail::KeptValidity(*src, srcMask, *dst);
   if (!detail::HasData(*src, srcMask))
-    return detail::FillBlock(*dst, gobs::ViewOf<T>(*dst, state_.isComplex ? 2 : 1), noData);
+    return detail::FillBlock(*dst, gobs::ViewOf<T>(*dst, state_.isComplex ? 2 : 1), noData,
+                             validity);
   const detail::SourceMapping mapping = detail::MappingOf(state_, *src, *dst);
   const uint64_t pixelBytes = components * sizeof(T);
   detail::CopyPixels({{src->data, gobs::LayoutOf(*src), pixelBytes},
                       {dst->data, gobs::LayoutOf(*dst), pixelBytes},
                       srcMask,
                       reinterpret_cast<const uint8_t*>(noData.data()),
+                      validity,
                       SourceIndices(mapping.x, dst->width, src->width),
                       SourceIndices(mapping.y, dst->height, src->height)});
 }

@@ -16,6 +16,8 @@ class IRasterResampler {
   /// Resamples `src` into `dst`.
   /// \param srcMask  validity of `src`, same geometry and margins; null: every pixel is valid.
   ///                 Not kept.
+  /// A method that knows where it wrote the no-data value may attach that to `dst` as its validity
+  /// where there is a mask and `src` carries a validity.
   /// \throws orin::Exception  what the method cannot take; `dst` is untouched
   virtual void Resample(gobs::Raster* src, gobs::Mask* srcMask, gobs::Raster* dst) = 0;
   /// Pixels that the method reads around the source block, on every side.

@@ -21,7 +21,9 @@ class ResamplerManager {
 
   /// Resamples `in`, which carries the margin that the kernel needs, into `out`; both stay the
   /// caller's. Where `in` carries a validity and there is a mask builder, `out` gets one, too: no
-  /// data exactly where the kernel wrote the no-data value for want of valid pixels.
+  /// data exactly where the kernel wrote the no-data value for want of valid pixels. Of a kernel
+  /// that leaves `out` without a validity that is not known; then no data is what has no valid
+  /// source pixel under it nor within the kernel's margin around that.
   /// \throws orin::Exception  there is no factory, or it gives no kernel; what the factory,
   ///                          the kernel and the mask builder throw passes through
   void ProcessBlock(gobs::Raster* in, gobs::Raster* out);
@@ -37,8 +39,6 @@ class ResamplerManager {
 
  private:
   void RenewKernel(const gobs::DataType& type);
-  void Configure(IRasterResampler& kernel, double fill) const;
-  void FindFilled(const gobs::Raster& in, gobs::Mask& mask, gobs::Raster& out) const;
 };
 
 }  // namespace orin::resamplers

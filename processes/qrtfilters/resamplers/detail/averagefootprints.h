@@ -9,6 +9,7 @@
 #include "basic/gobs/raster.h"
 #include "processes/qrtfilters/resamplers/detail/axismapping.h"
 #include "processes/qrtfilters/resamplers/detail/fill.h"
+#include "processes/qrtfilters/resamplers/detail/filledrun.h"
 #include "processes/qrtfilters/resamplers/detail/parallelrows.h"
 #include "processes/qrtfilters/resamplers/detail/saturate.h"
 
@@ -40,21 +41,24 @@ Scratch<T> NoDataPixel(uint64_t channels, uint32_t componentsPerSample, double n
 template <template <class> class Mean, class T>
 class AverageFootprintsPass {
  public:
+  /// \param validity  of `dst`, where it is kept
   AverageFootprintsPass(const SourceMapping& mapping, const gobs::Raster& src,
-                        const gobs::Raster& dst, double noData)
+                        const gobs::Raster& dst, double noData, gobs::Mask* validity)
       : src_(gobs::ViewOf<const T>(src, kComponents)),
         dst_(gobs::ViewOf<T>(dst, kComponents)),
         channels_(dst.channelCount),
         noData_(NoDataPixel<T>(channels_, kComponents, noData)),
+        validity_(validity),
         lastSample_(src_.data + BufferSamples(src) - kComponents),
         columns_(FootprintsOf(mapping.x, dst.width, RangeOf(src.width, src.marginX))),
         rows_(FootprintsOf(mapping.y, dst.height, RangeOf(src.height, src.marginY))) {}
 
   template <class Valid>
   void RunRow(uint32_t row, const Valid& valid) const {
+    FilledRun filled(validity_, row);
     T* out = dst_.At(0, row);
     for (const Footprint& column : columns_) {
-      WritePixel(out, column, rows_[row], valid);
+      if (!WritePixel(out, column, rows_[row], valid)) filled.Add(&column - columns_.data());
       out += channels_ * kComponents;
     }
   }
@@ -66,15 +70,17 @@ class AverageFootprintsPass {
     return uint64_t{src.stride} * src.bufferLines * src.channelCount * kComponents;
   }
 
+  /// \returns false when the pixel is filled with no data
   template <class Valid>
-  void WritePixel(T* out, const Footprint& x, const Footprint& y, const Valid& valid) const {
+  bool WritePixel(T* out, const Footprint& x, const Footprint& y, const Valid& valid) const {
     if (x.start >= x.end || y.start >= y.end || !valid(x.centre, y.centre)) {
       std::copy(noData_.begin(), noData_.end(), out);
-      return;
+      return false;
     }
     const auto count = static_cast<uint64_t>((x.end - x.start) * (y.end - y.start));
     for (uint64_t channel = 0; channel < channels_; ++channel)
       MeanOf(channel, x, y, valid).Store(out + channel * kComponents, count);
+    return true;
   }
 
   /// Deliberate: a pixel without data is not dropped, the centre takes its place.
@@ -98,6 +104,7 @@ class AverageFootprintsPass {
   gobs::PixelView<T> dst_;
   uint64_t channels_;
   Scratch<T> noData_;
+  gobs::Mask* validity_;
   const T* lastSample_;
   Scratch<Footprint> columns_;
   Scratch<Footprint> rows_;
@@ -107,12 +114,13 @@ class AverageFootprintsPass {
 /// \pre  `src` has a margin
 template <template <class> class Mean, class T>
 void AverageFootprints(const SourceMapping& mapping, const gobs::Raster& src,
-                       const gobs::Mask* srcMask, const gobs::Raster& dst, double noData) {
+                       const gobs::Mask* srcMask, gobs::Raster& dst, double noData) {
+  gobs::Mask* const validity = KeptValidity(src, srcMask, dst);
   constexpr uint32_t kComponents = Mean<T>::kComponents;
   if (!HasData(src, srcMask))
     return FillBlock(dst, gobs::ViewOf<T>(dst, kComponents),
-                     NoDataPixel<T>(dst.channelCount, kComponents, noData));
-  const AverageFootprintsPass<Mean, T> pass(mapping, src, dst, noData);
+                     NoDataPixel<T>(dst.channelCount, kComponents, noData), validity);
+  const AverageFootprintsPass<Mean, T> pass(mapping, src, dst, noData, validity);
   gobs::WithValidity(srcMask, [&](const auto& valid) {
     ParallelRows(dst.height, [&](uint32_t row) { pass.RunRow(row, valid); });
   });

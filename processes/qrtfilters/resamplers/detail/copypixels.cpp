@@ -4,6 +4,7 @@
 #include <cstring>
 
 #include "basic/gobs/mask/validity.h"
+#include "processes/qrtfilters/resamplers/detail/filledrun.h"
 #include "processes/qrtfilters/resamplers/detail/parallelrows.h"
 
 namespace orin::resamplers::detail {
@@ -28,11 +29,22 @@ void CopyRow(const PixelCopy& job, Size pixelBytes, const Valid& valid, uint32_t
   }
 }
 
+/// Marks what `CopyRow` fills: apart from it, so that it stays one loop without a branch.
+template <class Valid>
+void MarkFilled(const PixelCopy& job, const Valid& valid, uint32_t row) {
+  if (Valid::kAlways || !job.dstValidity) return;
+  FilledRun filled(job.dstValidity, row);
+  for (size_t i = 0; i < job.columns.size(); ++i)
+    if (!valid(job.columns[i], job.rows[row])) filled.Add(static_cast<int64_t>(i));
+}
+
 template <class Size>
 void CopyPixelsOf(const PixelCopy& job, Size pixelBytes) {
   gobs::WithValidity(job.srcMask, [&](const auto& valid) {
-    ParallelRows(static_cast<uint32_t>(job.rows.size()),
-                 [&](uint32_t row) { CopyRow(job, pixelBytes, valid, row); });
+    ParallelRows(static_cast<uint32_t>(job.rows.size()), [&](uint32_t row) {
+      CopyRow(job, pixelBytes, valid, row);
+      MarkFilled(job, valid, row);
+    });
   });
 }
 

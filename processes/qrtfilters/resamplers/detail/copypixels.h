@@ -16,6 +16,7 @@ struct PixelCopy {
   gobs::PixelView<uint8_t> dst;
   const gobs::Mask* srcMask;  ///< null: every pixel is valid
   const uint8_t* noData;      ///< the pixel that is written where `srcMask` is clear
+  gobs::Mask* dstValidity;    ///< receives where that is; null: not kept
   Scratch<uint32_t> columns;  ///< inside the source's useful area, one for each destination column
   Scratch<uint32_t> rows;     ///< likewise
 };

@@ -17,10 +17,13 @@ inline bool HasData(const gobs::RasterInfo& src, const gobs::Mask* srcMask) {
   return !srcMask || srcMask->Uniform() != false;
 }
 
-/// Fills the useful area of `dst` with copies of `pixel`.
+/// Fills the useful area of `dst` with copies of `pixel`, which are no data.
+/// \param validity  of `dst`, where it is kept
 template <class T>
-void FillBlock(const gobs::Raster& dst, const gobs::PixelView<T>& out, const Scratch<T>& pixel) {
+void FillBlock(const gobs::Raster& dst, const gobs::PixelView<T>& out, const Scratch<T>& pixel,
+               gobs::Mask* validity) {
   ParallelRows(dst.height, [&](uint32_t row) {
+    if (validity) validity->ClearRun(0, row, dst.width);
     T* at = out.At(0, row);
     if (pixel.size() == 1) std::fill_n(at, dst.width, pixel.front());
     else

@@ -10,6 +10,7 @@
 #include "basic/gobs/raster.h"
 #include "processes/qrtfilters/resamplers/detail/axismapping.h"
 #include "processes/qrtfilters/resamplers/detail/fill.h"
+#include "processes/qrtfilters/resamplers/detail/filledrun.h"
 #include "processes/qrtfilters/resamplers/detail/parallelrows.h"
 #include "processes/qrtfilters/resamplers/detail/saturate.h"
 
@@ -51,11 +52,14 @@ inline Between LocateBetween(const AxisMapping& mapping, uint32_t i) {
 template <class Method, class T>
 class NeighbourhoodPass {
  public:
-  NeighbourhoodPass(const ResamplerState& state, const gobs::Raster& src, const gobs::Raster& dst)
+  /// \param validity  of `dst`, where it is kept
+  NeighbourhoodPass(const ResamplerState& state, const gobs::Raster& src, const gobs::Raster& dst,
+                    gobs::Mask* validity)
       : src_(gobs::ViewOf<const T>(src, 1)),
         dst_(gobs::ViewOf<T>(dst, 1)),
         channels_(src.channelCount),
-        noData_(Saturate<T>(state.noDataValue)) {
+        noData_(Saturate<T>(state.noDataValue)),
+        validity_(validity) {
     const SourceMapping mapping = MappingOf(state, src, dst);
     columns_ = LinesOf(mapping.x, dst.width, RangeOf(src.width, src.marginX));
     rows_ = LinesOf(mapping.y, dst.height, RangeOf(src.height, src.marginY));
@@ -64,9 +68,10 @@ class NeighbourhoodPass {
   template <class Valid>
   void Run(const Valid& valid) const {
     ParallelRows(static_cast<uint32_t>(rows_.size()), [&](uint32_t row) {
+      FilledRun filled(validity_, row);
       T* out = dst_.At(0, row);
       for (const Line& column : columns_) {
-        WritePixel(out, column, rows_[row], valid);
+        if (!WritePixel(out, column, rows_[row], valid)) filled.Add(&column - columns_.data());
         out += channels_;
       }
     });
@@ -95,11 +100,12 @@ class NeighbourhoodPass {
     return lines;
   }
 
+  /// \returns false when the pixel is filled with no data
   template <class Valid>
-  void WritePixel(T* out, const Line& column, const Line& row, const Valid& valid) const {
+  bool WritePixel(T* out, const Line& column, const Line& row, const Valid& valid) const {
     if (!valid(column.at[kCentre], row.at[kCentre])) {
       std::fill_n(out, channels_, noData_);
-      return;
+      return false;
     }
     const Pixels pixels = Gather(column, row, valid);
     for (uint64_t channel = 0; channel < channels_; ++channel) {
@@ -108,6 +114,7 @@ class NeighbourhoodPass {
         samples[n] = static_cast<typename Method::Sample>(pixels[n][channel]);
       out[channel] = Method::Blend(samples, column.weights, row.weights);
     }
+    return true;
   }
 
   /// Column by column, top to bottom. Deliberate: a pixel without data is not dropped, the centre
@@ -127,19 +134,21 @@ class NeighbourhoodPass {
   gobs::PixelView<T> dst_;
   uint64_t channels_;
   T noData_;
+  gobs::Mask* validity_;
   Scratch<Line> columns_;
   Scratch<Line> rows_;
 };
 
-/// Fills `dst` by `Method`. \param srcMask  null: every pixel is valid
+/// Fills `dst` by `Method`, and keeps its validity. \param srcMask  null: every pixel is valid
 /// \pre the channel counts are equal, and `src` has a margin
 template <class Method, class T>
 void ResampleNeighbourhoods(const ResamplerState& state, const gobs::Raster& src,
-                            const gobs::Mask* srcMask, const gobs::Raster& dst) {
+                            const gobs::Mask* srcMask, gobs::Raster& dst) {
+  gobs::Mask* const validity = KeptValidity(src, srcMask, dst);
   if (!HasData(src, srcMask))
     return FillBlock(dst, gobs::ViewOf<T>(dst, 1),
-                     Scratch<T>(dst.channelCount, Saturate<T>(state.noDataValue)));
-  const NeighbourhoodPass<Method, T> pass(state, src, dst);
+                     Scratch<T>(dst.channelCount, Saturate<T>(state.noDataValue)), validity);
+  const NeighbourhoodPass<Method, T> pass(state, src, dst, validity);
   gobs::WithValidity(srcMask, [&](const auto& valid) { pass.Run(valid); });
 }
 

@@ -1,10 +1,12 @@
-/// Runs a resampler and its slow twin on the same blocks and compares every byte.
+/// Runs a resampler and its slow twin on the same blocks and compares every byte, and where they
+/// fill.
 // SPDX-License-Identifier: MIT
 #pragma once
 
 #include <gtest/gtest.h>
 #include <omp.h>
 
+#include <algorithm>
 #include <cstdint>
 #include <cstring>
 #include <memory>
@@ -42,6 +44,9 @@ struct CaseData {
     Random random(~c.seed);
     FillRandomly(random, c.values, src.Values(), src.ValueCount());
     if (c.mask != MaskKind::kNone) mask.emplace(c.src, MaskBytes(random, c.mask, c.src));
+    if (c.seed % 3 != 0)
+      src.Get()->validity =
+          std::make_unique<gobs::Mask>(c.src.width, c.src.height, src.Get()->Window());
     before.assign(src.Values(), src.Values() + src.ValueCount());
   }
 
@@ -89,6 +94,36 @@ void RunProduct(resamplers::IResamplerFactory& factory, const Case& c, CaseData<
   resampler->Resample(data.src.Get(), data.mask ? data.mask->Get() : nullptr, data.actual.Get());
 }
 
+/// Where the twin fills, whatever the pixel type: it writes 7 among zeros there.
+inline std::vector<bool> FilledBy(Twin<double> twin, const Case& c, const reference::Bits* bits) {
+  TestRaster<double> zeros(c.src, c.srcChannels, c.settings.isComplex);
+  TestRaster<double> out(c.dst, c.dstChannels, c.settings.isComplex);
+  std::fill_n(zeros.Values(), zeros.ValueCount(), 0.0);
+  reference::Settings settings = c.settings;
+  settings.noDataValue = 7;
+  twin(BlockOf(zeros, c.src, c.srcChannels, settings.isComplex), bits,
+       BlockOf(out, c.dst, c.dstChannels, settings.isComplex), settings);
+  std::vector<bool> filled;
+  for (uint32_t y = 0; y < c.dst.height; ++y)
+    for (uint32_t x = 0; x < c.dst.width; ++x) filled.push_back(out.At(x, y) == 7);
+  return filled;
+}
+
+/// The product tells where it filled exactly where somebody asks for it.
+template <class T>
+void ExpectValidityOf(Twin<double> twin, const Case& c, CaseData<T>& data) {
+  const gobs::Mask* const validity = data.actual.Get()->validity.get();
+  ASSERT_EQ(data.mask && data.src.Get()->validity, validity != nullptr);
+  if (!validity) return;
+  const reference::Bits bits{c.src.width, c.src.height, c.src.marginX, c.src.marginY,
+                             data.mask->Bytes()};
+  const std::vector<bool> filled = FilledBy(twin, c, &bits);
+  size_t n = 0;
+  for (uint32_t y = 0; y < c.dst.height; ++y)
+    for (uint32_t x = 0; x < c.dst.width; ++x)
+      ASSERT_EQ(!filled[n++], validity->IsValid(x, y)) << "at " << x << ", " << y;
+}
+
 template <class T>
 void ExpectEqualAndClean(CaseData<T>& data, NotANumber nan) {
   EXPECT_TRUE(SamePixels(data.expected, data.actual, nan));
@@ -103,9 +138,10 @@ void ExpectEqualAndClean(CaseData<T>& data, NotANumber nan) {
 template <class T>
 class Differential {
  public:
-  Differential(resamplers::IResamplerFactory& factory, Twin<T> twin, const Abilities& can,
-               NotANumber nan)
-      : factory_(factory), twin_(twin), can_(can), nan_(nan) {}
+  /// \param fills  the same twin, to tell where it fills
+  Differential(resamplers::IResamplerFactory& factory, Twin<T> twin, Twin<double> fills,
+               const Abilities& can, NotANumber nan)
+      : factory_(factory), twin_(twin), fills_(fills), can_(can), nan_(nan) {}
 
   /// Other pixels and sizes for each number of threads.
   void CheckEveryCombination() {
@@ -136,6 +172,7 @@ class Differential {
       if (!RunTwin(twin_, c, data)) continue;
       RunProduct(factory_, c, data);
       ExpectEqualAndClean(data, nan_);
+      ExpectValidityOf(fills_, c, data);
       if (::testing::Test::HasFailure()) ADD_FAILURE() << c;
       return;
     }
@@ -144,6 +181,7 @@ class Differential {
 
   resamplers::IResamplerFactory& factory_;
   Twin<T> twin_;
+  Twin<double> fills_;
   Abilities can_;
   NotANumber nan_;
   uint64_t seed_ = 0;

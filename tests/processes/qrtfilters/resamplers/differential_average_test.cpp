@@ -15,7 +15,8 @@ TYPED_TEST_SUITE(AverageAndItsTwin, EveryPixelType, PixelTypeNames);
 TYPED_TEST(AverageAndItsTwin, WriteTheSameBytes) {
   resamplers::AverageResamplerFactory factory;
   const Abilities can{.leastMargin = 0, .complexData = true, .fewerChannelsOut = true};
-  Differential<TypeParam>(factory, reference::Average<TypeParam>, can, NotANumber::kAnyPayload)
+  Differential<TypeParam>(factory, reference::Average<TypeParam>, reference::Average<double>, can,
+                          NotANumber::kAnyPayload)
       .CheckEveryCombination();
 }
 

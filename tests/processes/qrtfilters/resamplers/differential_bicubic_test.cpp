@@ -15,7 +15,8 @@ TYPED_TEST_SUITE(BicubicAndItsTwin, EveryPixelType, PixelTypeNames);
 TYPED_TEST(BicubicAndItsTwin, WriteTheSameBytes) {
   resamplers::BicubicResamplerFactory factory;
   const Abilities can{.leastMargin = 3};
-  Differential<TypeParam>(factory, reference::Bicubic<TypeParam>, can, NotANumber::kAnyPayload)
+  Differential<TypeParam>(factory, reference::Bicubic<TypeParam>, reference::Bicubic<double>, can,
+                          NotANumber::kAnyPayload)
       .CheckEveryCombination();
 }
 

@@ -15,7 +15,8 @@ TYPED_TEST_SUITE(BilinearAndItsTwin, EveryPixelType, PixelTypeNames);
 TYPED_TEST(BilinearAndItsTwin, WriteTheSameBytes) {
   resamplers::BilinearResamplerFactory factory;
   const Abilities can{.leastMargin = 1};
-  Differential<TypeParam>(factory, reference::Bilinear<TypeParam>, can, NotANumber::kAnyPayload)
+  Differential<TypeParam>(factory, reference::Bilinear<TypeParam>, reference::Bilinear<double>, can,
+                          NotANumber::kAnyPayload)
       .CheckEveryCombination();
 }
 

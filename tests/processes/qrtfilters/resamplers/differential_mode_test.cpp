@@ -15,7 +15,8 @@ TYPED_TEST_SUITE(ModeAndItsTwin, EveryPixelType, PixelTypeNames);
 TYPED_TEST(ModeAndItsTwin, WriteTheSameBytes) {
   resamplers::ModeResamplerFactory factory;
   const Abilities can{.leastMargin = 1};
-  Differential<TypeParam>(factory, reference::Mode<TypeParam>, can, NotANumber::kBitForBit)
+  Differential<TypeParam>(factory, reference::Mode<TypeParam>, reference::Mode<double>, can,
+                          NotANumber::kBitForBit)
       .CheckEveryCombination();
 }
 

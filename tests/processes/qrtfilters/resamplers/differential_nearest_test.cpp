@@ -15,7 +15,8 @@ TYPED_TEST_SUITE(NearestAndItsTwin, EveryPixelType, PixelTypeNames);
 TYPED_TEST(NearestAndItsTwin, WriteTheSameBytes) {
   resamplers::NearestNeighbourResamplerFactory factory;
   const Abilities can{.leastMargin = 0, .complexData = true, .farAway = true};
-  Differential<TypeParam>(factory, reference::Nearest<TypeParam>, can, NotANumber::kBitForBit)
+  Differential<TypeParam>(factory, reference::Nearest<TypeParam>, reference::Nearest<double>, can,
+                          NotANumber::kBitForBit)
       .CheckEveryCombination();
 }
 
