@@ -10,7 +10,6 @@
 #include "basic/core/typedispatch/pixeltypes.h"
 #include "basic/gobs/cancelled.h"
 #include "host/datasources/nodatastandin.h"
-#include "host/datasources/nodatavalue.h"
 #include "host/services/text.h"
 
 namespace orin::datasources {
@@ -21,17 +20,16 @@ std::string TextOf(double value) {
   return {text.data(), std::to_chars(text.data(), text.data() + text.size(), value).ptr};
 }
 
-/// Whether a run that reads this text as a double fills with `value`.
+/// Whether a run that reads the decimal number as a double fills with `value`.
 template <class T>
-bool Survives(const std::string& text, T value) {
-  const double number = ParseNoData(text).value_or(0);
+bool Survives(const model::NoData& noData, T value) {
   if constexpr (std::is_floating_point_v<T>) return std::isfinite(value);
   else if constexpr (sizeof(T) < 8) return true;
   else {
     constexpr double kMax = static_cast<double>(std::numeric_limits<T>::max());  // one above it
     if (value < 0) return false;
-    return number >= kMax ? value == std::numeric_limits<T>::max()
-                          : static_cast<T>(number) == value;
+    return noData.Number() >= kMax ? value == std::numeric_limits<T>::max()
+                                   : static_cast<T>(noData.Number()) == value;
   }
 }
 
@@ -50,40 +48,41 @@ std::string NoDataAnswers::StandInFor(const gobs::DataType& type) {
   return text;
 }
 
-/// Empty for what is no number and for what no pixel can equal but by being a decimal number.
+/// Nothing for what no pixel can equal, unless it is a decimal number.
 template <class T>
-std::string NoDataAnswers::AnswerTo(const std::string& declared, const gobs::DataType& type) {
-  const std::string plain = PlainNoDataText(declared);
-  const auto value = NoDataValueOf<T>(declared);
-  if (!value || Survives(plain, value->stored)) return plain;
-  return StandInFor(type);
+std::optional<model::NoData> NoDataAnswers::AnswerTo(const std::optional<model::NoData>& declared,
+                                                     const gobs::DataType& type) {
+  if (!declared) return std::nullopt;
+  const auto value = declared->As<T>();
+  if (value && !Survives(*declared, value->stored))
+    return model::NoData::Parse(StandInFor(type), declared->Origin());
+  return declared->Decimal().empty() ? std::nullopt : declared;
 }
 
 template <class T>
 void NoDataAnswers::AnswerAs(AuxiliaryData& data, const std::vector<unsigned>& channels,
                              const gobs::DataType& type) {
-  NoDataTexts texts;
-  const std::string file = data.GetFileMetadataValue(kNoDataKey);
-  const std::string fileAnswer = AnswerTo<T>(file, type);
-  data.SetFileMetadataValue(kNoDataKey, fileAnswer);
-  const auto declared = [](const std::string& text, const std::string& answer) {
-    return answer == PlainNoDataText(text) ? "" : text;
+  const auto textOf = [](const std::optional<model::NoData>& answer) {
+    return answer ? answer->Decimal() : "";
   };
-  data.SetFileMetadataValue(kDeclaredNoDataKey, declared(file, fileAnswer));
-  texts.answered = fileAnswer;
-  texts.fill = file;
+  model::SourceFacts& facts = data.Facts();
+  facts.channels.resize(channels.size());
+  const auto file = AnswerTo<T>(facts.noData, type);
+  data.SetFileMetadataValue(kNoDataKey, textOf(file));
+  if (!file) facts.noData.reset();
+  NoDataOfPass pass{file, facts.noData, {}};
   for (unsigned channel = 1; channel <= channels.size(); ++channel) {
-    const std::string own = data.GetChanMetadataValue(kNoDataKey, channel);
-    const std::string answer = AnswerTo<T>(own, type);
-    data.SetChanMetadataValue(kNoDataKey, channel, answer);
-    data.SetChanMetadataValue(kDeclaredNoDataKey, channel, declared(own, answer));
-    texts.declared.push_back(answer.empty() ? file : own);
-    if (channel == 1 && fileAnswer.empty()) {
-      texts.answered = answer;
-      texts.fill = own;
+    std::optional<model::NoData>& declared = facts.channels[channel - 1].noData;
+    const auto own = AnswerTo<T>(declared, type);
+    data.SetChanMetadataValue(kNoDataKey, channel, textOf(own));
+    if (!own) declared.reset();
+    pass.declared.push_back(own ? declared : facts.noData);
+    if (channel == 1 && !file) {
+      pass.answered = own;
+      pass.fill = declared;
     }
   }
-  fills_[channels] = MakeNoDataFill(texts, type);
+  fills_[channels] = MakeNoDataFill(pass, type);
 }
 
 AuxiliaryData NoDataAnswers::Answer(AuxiliaryData declared, const std::vector<unsigned>& channels,

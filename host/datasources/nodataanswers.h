@@ -16,9 +16,6 @@
 
 namespace orin::datasources {
 
-/// Beside an answered no-data value that is not the declared one: the declared one's text.
-inline constexpr char kDeclaredNoDataKey[] = "DECLARED_NO_DATA_VALUE";
-
 /// Drivers hand the declared text on as it stands. A run takes a decimal number, holds it as a
 /// double, and converts that to the pixel type, where a negative 64-bit integer becomes 0. Values
 /// that do not survive this (NaN, infinities, some 64-bit integers) get a stand-in that does not
@@ -28,9 +25,10 @@ class NoDataAnswers {
   /// \param source  outlives the answers
   explicit NoDataAnswers(IRasterSource& source) : source_(source) {}
 
-  /// `declared` with decimal numbers as no-data values, or none where the text is no number or no
-  /// value of the type. Remembers, for `ForLevel`, what was answered for these channels. The image
-  /// is searched for a stand-in once for each type that needs one.
+  /// `declared` with decimal numbers as the texts of no-data values, or none, not in the facts
+  /// either, where the declared one is no value of the type. Remembers, for `ForLevel`, what was
+  /// answered for these channels. The image is searched for a stand-in once for each type that
+  /// needs one.
   /// \param declared  of a reader of `channels`, which are all of type `type`
   /// \throws orin::Exception  the image cannot be opened for the search
   /// \throws orin::Cancelled  the user asked to stop it
@@ -46,7 +44,8 @@ class NoDataAnswers {
   void AnswerAs(AuxiliaryData& data, const std::vector<unsigned>& channels,
                 const gobs::DataType& type);
   template <class T>
-  std::string AnswerTo(const std::string& declared, const gobs::DataType& type);
+  std::optional<model::NoData> AnswerTo(const std::optional<model::NoData>& declared,
+                                        const gobs::DataType& type);
   std::string StandInFor(const gobs::DataType& type);
 
   IRasterSource& source_;

@@ -10,9 +10,11 @@
 #include <type_traits>
 #include <vector>
 
-#include "host/datasources/nodatavalue.h"
+#include "host/model/nodata.h"
 
 namespace orin::datasources {
+
+using model::NoDataValue;
 
 /// A channel's value in its type.
 template <class T>

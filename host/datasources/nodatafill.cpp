@@ -9,12 +9,12 @@
 #include "basic/core/typedispatch/pixeltypes.h"
 #include "basic/gobs/mask/mask.h"
 #include "host/datasources/forwardingwriter.h"
-#include "host/datasources/nodatavalue.h"
 
 namespace orin::datasources {
 namespace {
 
 using gobs::Raster;
+using model::NoDataValue;
 
 template <class T>
 class NoDataFill final : public INoDataFill {
@@ -111,13 +111,18 @@ class NoDataFill final : public INoDataFill {
 };
 
 template <class T>
-std::shared_ptr<const INoDataFill> MakeOf(const NoDataTexts& texts, uint32_t componentsPerSample) {
-  const auto arriving = NoDataValueOf<T>(texts.answered);
-  const auto fill = NoDataValueOf<T>(texts.fill);
+std::optional<NoDataValue<T>> ValueOf(const std::optional<model::NoData>& noData) {
+  return noData ? noData->As<T>() : std::nullopt;
+}
+
+template <class T>
+std::shared_ptr<const INoDataFill> MakeOf(const NoDataOfPass& pass, uint32_t componentsPerSample) {
+  const auto arriving = ValueOf<T>(pass.answered);
+  const auto fill = ValueOf<T>(pass.fill);
   if (!arriving || !fill) return nullptr;
   std::vector<NoDataValue<T>> declared;
-  for (const std::string& text : texts.declared) {
-    const auto value = NoDataValueOf<T>(text);
+  for (const std::optional<model::NoData>& own : pass.declared) {
+    const auto value = ValueOf<T>(own);
     if (!value) return nullptr;  // no pixel is no data
     declared.push_back(*value);
   }
@@ -147,11 +152,11 @@ class FilledLevel final : public ForwardingWriter {
 
 }  // namespace
 
-std::shared_ptr<const INoDataFill> MakeNoDataFill(const NoDataTexts& texts,
+std::shared_ptr<const INoDataFill> MakeNoDataFill(const NoDataOfPass& pass,
                                                   const gobs::DataType& type) {
   std::shared_ptr<const INoDataFill> made;
   typedispatch::WithPixelType(type, [&]<class T>(std::type_identity<T>) {
-    made = MakeOf<T>(texts, ComponentsPerSample(type));
+    made = MakeOf<T>(pass, ComponentsPerSample(type));
   });
   return made;
 }

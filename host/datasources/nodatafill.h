@@ -3,20 +3,21 @@
 #pragma once
 
 #include <memory>
-#include <string>
+#include <optional>
 #include <vector>
 
 #include "basic/gobs/datatype.h"
 #include "basic/gobs/raster.h"
 #include "host/datasources/rasterwriter.h"
+#include "host/model/nodata.h"
 
 namespace orin::datasources {
 
-/// The texts of one pass over some channels.
-struct NoDataTexts {
-  std::string answered;               ///< what the run was told to fill with: a decimal number
-  std::string fill;                   ///< the declared value that this stands for
-  std::vector<std::string> declared;  ///< one for each of the pass's channels
+/// The no-data values of one pass over some channels.
+struct NoDataOfPass {
+  std::optional<model::NoData> answered;               ///< what the run was told to fill with
+  std::optional<model::NoData> fill;                   ///< the declared value that this stands for
+  std::vector<std::optional<model::NoData>> declared;  ///< one for each of the pass's channels
 };
 
 /// Changes the pixels without data of a level's blocks.
@@ -32,7 +33,7 @@ class INoDataFill {
 };
 
 /// Null when the level can store what the run writes, and the decision knows it: mostly.
-std::shared_ptr<const INoDataFill> MakeNoDataFill(const NoDataTexts& texts,
+std::shared_ptr<const INoDataFill> MakeNoDataFill(const NoDataOfPass& pass,
                                                   const gobs::DataType& type);
 
 /// `level` with its blocks changed by `fill` on their way in and out.

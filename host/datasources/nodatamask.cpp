@@ -4,14 +4,11 @@
 #include <algorithm>
 #include <memory>
 #include <optional>
-#include <string>
 #include <utility>
 #include <vector>
 
 #include "basic/core/typedispatch/pixeltypes.h"
-#include "host/datasources/nodataanswers.h"
 #include "host/datasources/nodatacompare.h"
-#include "host/datasources/nodatavalue.h"
 
 namespace {
 
@@ -21,20 +18,18 @@ using orin::datasources::CompareChunk;
 using orin::datasources::HasHits;
 using orin::datasources::Hits;
 using orin::datasources::IRasterReader;
-using orin::datasources::kAlphaKey;
 using orin::datasources::kChunk;
-using orin::datasources::kDeclaredNoDataKey;
-using orin::datasources::kFillOnlyKey;
-using orin::datasources::kNoDataKey;
-using orin::datasources::NoDataValue;
 using orin::datasources::PackHits;
 using orin::gobs::IMaskDecision;
 using orin::gobs::Mask;
 using orin::gobs::Raster;
+using orin::model::NoData;
+using orin::model::NoDataValue;
+using orin::model::SourceFacts;
 
 /// What one channel declares.
-struct ChannelText {
-  std::string text;      ///< empty without a value
+struct ChannelNoData {
+  std::optional<NoData> noData;
   bool isAlpha = false;  ///< may hold anything in a pixel without data
 };
 
@@ -42,10 +37,10 @@ struct ChannelText {
 template <class T>
 class EqualsNoData final : public IMaskDecision {
  public:
-  EqualsNoData(const std::vector<ChannelText>& channels, uint32_t componentsPerSample)
+  EqualsNoData(const std::vector<ChannelNoData>& channels, uint32_t componentsPerSample)
       : components_(componentsPerSample) {
-    for (const ChannelText& channel : channels) {
-      const auto value = orin::datasources::NoDataValueOf<T>(channel.text);
+    for (const ChannelNoData& channel : channels) {
+      const auto value = channel.noData ? channel.noData->As<T>() : std::nullopt;
       possible_ = possible_ && (value || channel.isAlpha);
       channels_.push_back({value.value_or(NoDataValue<T>()), !channel.isAlpha});
     }
@@ -86,40 +81,30 @@ class WithBlockValidity final : public IMaskDecision {
   std::unique_ptr<IMaskDecision> declared_;
 };
 
-/// The declared text where another one is answered for it.
-std::string Declared(const std::string& answered, const std::string& declared) {
-  return declared.empty() ? answered : declared;
-}
-
-/// What the reader's channels declare; nothing when none of those that count declares a number.
-std::optional<std::vector<ChannelText>> DeclaredTexts(const AuxiliaryData& metadata,
-                                                      unsigned channels) {
-  const bool isFillOnly = !metadata.GetFileMetadataValue(kFillOnlyKey).empty();
-  const std::string file = isFillOnly ? ""
-                                      : Declared(metadata.GetFileMetadataValue(kNoDataKey),
-                                                 metadata.GetFileMetadataValue(kDeclaredNoDataKey));
-  std::vector<ChannelText> texts;
+/// What the reader's channels declare; nothing when none of those that count declares a value.
+std::optional<std::vector<ChannelNoData>> DeclaredBy(const SourceFacts& facts, unsigned channels) {
+  const std::optional<NoData> file = facts.noDataIsFill ? std::nullopt : facts.noData;
+  std::vector<ChannelNoData> declared;
   bool any = false;
   for (unsigned channel = 1; channel <= channels; ++channel) {
-    const std::string own = Declared(metadata.GetChanMetadataValue(kNoDataKey, channel),
-                                     metadata.GetChanMetadataValue(kDeclaredNoDataKey, channel));
-    const bool isAlpha = !metadata.GetChanMetadataValue(kAlphaKey, channel).empty();
-    texts.push_back({own.empty() ? file : own, isAlpha});
-    any = any || (!isAlpha && orin::datasources::ParseNoData(texts.back().text));
+    const std::optional<NoData>& own = facts.OfChannel(channel);
+    const bool isAlpha = channel <= facts.channels.size() && facts.channels[channel - 1].isAlpha;
+    declared.push_back({own ? own : file, isAlpha});
+    any = any || (!isAlpha && declared.back().noData);
   }
   if (!any) return std::nullopt;
-  return texts;
+  return declared;
 }
 
 /// The decision of the values that the reader's file declares, or null.
 std::unique_ptr<IMaskDecision> DeclaredDecision(const IRasterReader& reader,
-                                                const AuxiliaryData& metadata) {
-  const auto texts = DeclaredTexts(metadata, reader.GetChannelCount());
-  if (!texts) return nullptr;
+                                                const SourceFacts& facts) {
+  const auto declared = DeclaredBy(facts, reader.GetChannelCount());
+  if (!declared) return nullptr;
   const orin::gobs::DataType type = reader.GetDataType();
   std::unique_ptr<IMaskDecision> decision;
   orin::typedispatch::WithPixelType(type, [&]<class T>(std::type_identity<T>) {
-    decision = std::make_unique<EqualsNoData<T>>(*texts, ComponentsPerSample(type));
+    decision = std::make_unique<EqualsNoData<T>>(*declared, ComponentsPerSample(type));
   });
   return decision;
 }
@@ -128,8 +113,8 @@ std::unique_ptr<IMaskDecision> DeclaredDecision(const IRasterReader& reader,
 
 IMaskDecision* GetFileMetadataSrcMask(IRasterReader* reader) {
   const AuxiliaryData metadata = reader->GetAuxiliaryData();
-  std::unique_ptr<IMaskDecision> decision = DeclaredDecision(*reader, metadata);
-  if (!metadata.GetFileMetadataValue(orin::datasources::kValidityKey).empty())
+  std::unique_ptr<IMaskDecision> decision = DeclaredDecision(*reader, metadata.Facts());
+  if (metadata.Facts().carriesValidity)
     decision = std::make_unique<WithBlockValidity>(std::move(decision));
   return decision.release();
 }

@@ -6,8 +6,6 @@
 #include <utility>
 #include <vector>
 
-#include "host/datasources/nodatavalue.h"
-
 namespace orin::datasources {
 namespace {
 
@@ -42,13 +40,13 @@ class ValidityAddingReader final : public IRasterReader {
 
   AuxiliaryData GetAuxiliaryData() const override {
     AuxiliaryData metadata = pixels_->GetAuxiliaryData();
-    metadata.SetFileMetadataValue(kValidityKey, "YES");
-    if (alphaPosition_) metadata.SetChanMetadataValue(kAlphaKey, *alphaPosition_ + 1, "YES");
-    const bool isDeclared = ParseNoData(metadata.GetFileMetadataValue(kNoDataKey)) ||
-                            ParseNoData(metadata.GetChanMetadataValue(kNoDataKey, 1));
-    if (isDeclared) return metadata;
-    metadata.SetFileMetadataValue(kNoDataKey, "0");
-    metadata.SetFileMetadataValue(kFillOnlyKey, "YES");
+    model::SourceFacts& facts = metadata.Facts();
+    facts.carriesValidity = true;
+    facts.channels.resize(GetChannelCount());
+    if (alphaPosition_) facts.channels[*alphaPosition_].isAlpha = true;
+    if (facts.First()) return metadata;
+    metadata.DeclareNoData(*model::NoData::Parse("0", model::NoDataOrigin::kNowhere));
+    facts.noDataIsFill = true;
     return metadata;
   }
 

@@ -9,7 +9,7 @@ import numpy
 from osgeo import gdal
 import rasterio
 
-from orin_e2e import Case, info, random_pixels, read_pixels, run, write_tiff
+from orin_e2e import READS_ALL_FORMATS, Case, info, random_pixels, read_pixels, run, write_tiff
 
 METHODS = ("nearest", "average", "mode", "bilinear", "bicubic")
 PLACES = ("--internal", "--external")
@@ -118,6 +118,62 @@ class NotANumber(Case):
         del dataset
         self.assertRan(run("build", file, "--levels", "2", "--method", "nearest"))
         self.assertSamePixels(pixels[:, ::2, ::2], read_pixels(file, 0))
+
+
+class ItemsOfAUser(Case):
+    """Items that are called like facts of ours are a user's own texts and change nothing."""
+
+    NAMES = ("NO_DATA_VALUE_IS_FILL", "VALIDITY", "DECLARED_NO_DATA_VALUE", "ALPHA")
+
+    def levels(self, file, method):
+        self.assertRan(run("build", file, "--levels", "2,3", "--method", method))
+        return [read_pixels(file, index) for index in range(2)]
+
+    def with_items(self, file):
+        dataset = gdal.Open(file, gdal.GA_Update)
+        dataset.SetMetadata({name: "YES" for name in self.NAMES})
+        for band in range(1, dataset.RasterCount + 1):
+            dataset.GetRasterBand(band).SetMetadata({name: "YES" for name in self.NAMES})
+        del dataset
+        self.assertEqual("YES", gdal.Open(file).GetMetadataItem("VALIDITY"))
+        return file
+
+    def check(self, make):
+        for method in METHODS:
+            with self.subTest(method=method):
+                expected = self.levels(make("plain" + method), method)
+                actual = self.levels(self.with_items(make("items" + method)), method)
+                for with_none, with_items in zip(expected, actual):
+                    self.assertTrue((with_none == 0).any())
+                    self.assertSamePixels(with_none, with_items)
+
+    def tiff(self, name):
+        pixels = with_holes(random_pixels((2, 120, 144), numpy.uint8, 11) | 1, 0)
+        file = self.path(name + ".tif")
+        write_tiff(file, pixels, "Byte", [], 0)
+        return file
+
+    def vrt(self, name):
+        source = self.tiff(name)
+        file = self.path(name + ".vrt")
+        gdal.Translate(file, source, format="VRT")
+        return file
+
+    def test_in_a_tiff(self):
+        self.check(self.tiff)
+
+    @unittest.skipUnless(READS_ALL_FORMATS, "the build reads TIFF only")
+    def test_in_another_format(self):
+        self.check(self.vrt)
+
+    def test_a_no_data_item_that_is_no_number_does_not_hide_the_tag(self):
+        expected = self.levels(self.tiff("tag"), "average")
+        file = self.tiff("none")
+        dataset = gdal.Open(file, gdal.GA_Update)
+        dataset.SetMetadataItem("NO_DATA_VALUE", "none")
+        del dataset
+        for with_tag, with_item in zip(expected, self.levels(file, "average")):
+            self.assertSamePixels(with_tag, with_item)
 
 
 class FloatText(Case):

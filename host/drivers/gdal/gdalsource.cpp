@@ -24,7 +24,6 @@ namespace orin::drivers {
 namespace {
 
 using datasources::AuxiliaryData;
-using datasources::kNoDataKey;
 
 [[noreturn]] void Refuse(const std::string& text) {
   throw Exception(text, "host/drivers/gdal/gdalsource", "orin::drivers::GdalSource::GdalSource", 0);
@@ -107,20 +106,27 @@ void GdalSource::KeepDecodedRows(const GdalHandle& handle) {
   decoded_ = std::make_shared<DecodedRows>(width_, height_, pixel, rows);
 }
 
+/// One value for the file where all channels agree.
 void GdalSource::DeclareNoData(const std::vector<std::string>& declared) {
-  if (items_.contains(kNoDataKey)) return;
   const bool agree = std::all_of(declared.begin(), declared.end(),
                                  [&](const std::string& text) { return text == declared[0]; });
-  if (agree && !declared[0].empty()) items_[kNoDataKey] = declared[0];
-  if (agree) return;
-  for (size_t i = 0; i < declared.size(); ++i)
-    if (!declared[i].empty()) channelItems_[i].emplace(kNoDataKey, declared[i]);
+  constexpr auto kOrigin = model::NoDataOrigin::kChannel;
+  if (agree) noData_ = model::NoData::Parse(declared[0], kOrigin);
+  for (const std::string& text : declared)
+    channelNoData_.push_back(agree ? std::nullopt : model::NoData::Parse(text, kOrigin));
 }
 
 AuxiliaryData GdalSource::MetadataOf(const std::vector<unsigned>& channels) const {
   std::vector<AuxiliaryData::Items> items;
   for (const unsigned channel : channels) items.push_back(channelItems_.at(channel - 1));
-  return {items_, std::move(items)};
+  AuxiliaryData metadata(items_, std::move(items));
+  if (metadata.Facts().noData) return metadata;  // the item of that name
+  if (noData_) metadata.DeclareNoData(*noData_);
+  for (unsigned n = 1; n <= channels.size(); ++n)
+    if (const auto& own = channelNoData_.at(channels[n - 1] - 1);
+        own && !metadata.Facts().OfChannel(n))
+      metadata.DeclareNoData(n, *own);
+  return metadata;
 }
 
 std::unique_ptr<datasources::IRasterReader> GdalSource::OpenReader(

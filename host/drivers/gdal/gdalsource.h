@@ -58,6 +58,8 @@ class GdalSource final : public datasources::IRasterSource {
   std::vector<unsigned> storedBits_;  ///< one a channel
   datasources::AuxiliaryData::Items items_;
   std::vector<datasources::AuxiliaryData::Items> channelItems_;
+  std::optional<model::NoData> noData_;                      ///< declared alike by all channels
+  std::vector<std::optional<model::NoData>> channelNoData_;  ///< where channels differ
   std::shared_ptr<datasources::ImageWatch> watch_;
   std::unique_ptr<datasources::ILevelStore> levels_;
   std::shared_ptr<DecodedRows> decoded_;  ///< null when readers decode for themselves

@@ -4,30 +4,36 @@
 #include <algorithm>
 
 #include "host/datasources/auxiliarydata.h"
-#include "host/datasources/nodatavalue.h"
 
 namespace orin::drivers {
 namespace {
 
 using datasources::kNoDataKey;
+using model::NoDataOrigin;
 
-bool IsNoData(const MetadataItem& item) { return item.domain.empty() && item.name == kNoDataKey; }
+bool IsNumber(const std::string& text) {
+  return model::NoData::Parse(text, NoDataOrigin::kItem).has_value();
+}
 
-std::string NumberOrNone(const std::string& text) {
-  return datasources::ParseNoData(text) ? text : "";
+bool DeclaresNoData(const MetadataItem& item) {
+  return item.domain.empty() && item.name == kNoDataKey && IsNumber(item.text);
 }
 
 }  // namespace
 
-std::string DeclareNoData(std::vector<MetadataItem>& items, PixelFormat& format,
-                          const AuxiliaryFile& auxiliary) {
-  if (std::any_of(items.begin(), items.end(), IsNoData)) return "item";
-  std::vector<std::string> texts(format.samplesPerPixel, NumberOrNone(format.noData));
-  std::string origin = texts.front().empty() ? "" : "tag";
+NoDataOrigin DeclareNoData(std::vector<MetadataItem>& items, PixelFormat& format,
+                           const AuxiliaryFile& auxiliary) {
+  if (std::any_of(items.begin(), items.end(), DeclaresNoData)) return NoDataOrigin::kItem;
+  std::erase_if(items, [](const MetadataItem& item) {
+    return item.domain.empty() && item.name == kNoDataKey;
+  });
+  std::vector<std::string> texts(format.samplesPerPixel,
+                                 IsNumber(format.noData) ? format.noData : "");
+  NoDataOrigin origin = texts.front().empty() ? NoDataOrigin::kNowhere : NoDataOrigin::kTag;
   for (const auto& [channel, text] : auxiliary.noData) {
-    if (channel > texts.size() || NumberOrNone(text).empty()) continue;
+    if (channel > texts.size() || !IsNumber(text)) continue;
     texts[channel - 1] = text;
-    origin = "aux.xml";
+    origin = NoDataOrigin::kAuxFile;
   }
   const bool agree = std::all_of(texts.begin(), texts.end(),
                                  [&](const std::string& text) { return text == texts.front(); });
@@ -35,7 +41,7 @@ std::string DeclareNoData(std::vector<MetadataItem>& items, PixelFormat& format,
     items.push_back({kNoDataKey, std::nullopt, "", "", texts.front()});
   for (unsigned sample = 0; sample < texts.size() && !agree; ++sample)
     if (!texts[sample].empty()) items.push_back({kNoDataKey, sample, "", "", texts[sample]});
-  format.noDataIsBeside = origin == "aux.xml";
+  format.noDataIsBeside = origin == NoDataOrigin::kAuxFile;
   if (format.noDataIsBeside) format.noData = texts.front();
   return origin;
 }

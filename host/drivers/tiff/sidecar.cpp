@@ -61,11 +61,10 @@ LevelCoding CodingOfImage(const IRasterSource& image) {
     if (coding.format.compression == COMPRESSION_LERC && structure.byteOrder.IsSwapped())
       FallBackToDeflate(coding);
   } else {
-    const auto metadata = image.MetadataOf({1});
-    std::string noData = metadata.GetFileMetadataValue(datasources::kNoDataKey);
-    if (noData.empty()) noData = metadata.GetChanMetadataValue(datasources::kNoDataKey, 1);
+    const datasources::AuxiliaryData metadata = image.MetadataOf({1});
+    const std::optional<model::NoData>& noData = metadata.Facts().First();
     coding = PlainCoding(image.Width(), image.Height(), image.ChannelCount(), LevelTypeOf(image),
-                         noData);
+                         noData ? noData->Text() : "");
     KeepBits(image, coding);
     MarkAlpha(image.AlphaChannel(), coding);
   }

@@ -4,14 +4,16 @@
 #include <cstring>
 
 #include "basic/core/typedispatch/pixeltypes.h"
-#include "host/datasources/nodatavalue.h"
+#include "host/model/nodata.h"
 
 namespace orin::drivers {
 namespace {
 
 template <class T>
 T ValueOf(const std::string& text) {
-  return datasources::NoDataValueOf<T>(text).value_or(datasources::NoDataValue<T>()).stored;
+  const auto noData = model::NoData::Parse(text, model::NoDataOrigin::kTag);
+  const auto value = noData ? noData->As<T>() : std::nullopt;
+  return value ? value->stored : T{};
 }
 
 }  // namespace

@@ -140,7 +140,7 @@ AuxiliaryData TiffSource::MetadataOf(const std::vector<unsigned>& channels) cons
     if (item.domain.empty()) bySample[item.sample].emplace(item.name, item.text);
   std::vector<AuxiliaryData::Items> channelItems;
   for (const unsigned channel : channels) channelItems.push_back(bySample[channel - 1]);
-  return {bySample[std::nullopt], std::move(channelItems)};
+  return {bySample[std::nullopt], std::move(channelItems), noDataOrigin_};
 }
 
 bool TiffSource::HoldsClasses() const {

@@ -29,7 +29,7 @@ class TiffSource final : public datasources::IRasterSource {
   unsigned ChannelCount() const override { return format_.samplesPerPixel; }
   gobs::DataType TypeOf(unsigned) const override { return format_.type; }
   /// Items of the default domain. The no-data value is the item of that name, else what the file
-  /// `NAME.EXT.aux.xml` declares, else the no-data tag where that is a number, NaN and infinities
+  /// `NAME.EXT.aux.xml` declares, else the no-data tag, where these are numbers, NaN and infinities
   /// included.
   datasources::AuxiliaryData MetadataOf(const std::vector<unsigned>& channels) const override;
   unsigned StoredBitsOf(unsigned) const override {
@@ -57,7 +57,7 @@ class TiffSource final : public datasources::IRasterSource {
   std::optional<uint64_t> maskOffset_;  ///< of the mask inside the file
   bool hasMaskBeside_ = false;
   bool namesCategories_ = false;
-  std::string noDataOrigin_;  ///< "item", "aux.xml" or "tag"; empty when none is declared
+  model::NoDataOrigin noDataOrigin_ = model::NoDataOrigin::kNowhere;
   std::unique_ptr<datasources::ILevelStore> levels_;
 };
 

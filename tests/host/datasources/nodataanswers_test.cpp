@@ -186,8 +186,8 @@ TEST_F(NoDataAnswersOf, EachChannelHasItsOwnAnswer) {
   Open(raster);
   EXPECT_EQ("-5", Metadata({1}).GetChanMetadataValue("NO_DATA_VALUE", 1));
   EXPECT_EQ(kLowest, std::stod(Metadata({2}).GetChanMetadataValue("NO_DATA_VALUE", 1)));
-  EXPECT_EQ("nan", Metadata({2}).GetChanMetadataValue(kDeclaredNoDataKey, 1));
-  EXPECT_EQ("", Metadata({1}).GetChanMetadataValue(kDeclaredNoDataKey, 1));
+  EXPECT_EQ("nan", Metadata({2}).Facts().OfChannel(1)->Text());
+  EXPECT_EQ("-5", Metadata({1}).Facts().OfChannel(1)->Text());
 }
 
 TEST_F(NoDataAnswersOf, AFillWithTheFirstChannelsValueIsRecognisedInTheNextLevel) {

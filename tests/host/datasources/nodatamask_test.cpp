@@ -10,7 +10,6 @@
 #include <memory>
 #include <vector>
 
-#include "host/datasources/nodataanswers.h"
 #include "tests/testing/fakeraster.h"
 #include "tests/testing/randomvalues.h"
 
@@ -68,15 +67,18 @@ TEST(NoDataMask, ThereIsNoDecisionWithoutANumber) {
   EXPECT_EQ(nullptr, DecisionOf(orin::gobs::eDT_BIT, "0", {""}));
 }
 
+using AuxiliaryItems = std::vector<AuxiliaryData::Items>;
+
 /// The decision of a raster with masks or alpha. \param alpha  1-based channel, 0 for none
 std::unique_ptr<IMaskDecision> DecisionWithValidity(const std::string& noData, bool isFillOnly,
                                                     unsigned channels, unsigned alpha) {
   FakeRaster raster;
   raster.channels = channels;
-  raster.metadata.SetFileMetadataValue("VALIDITY", "YES");
-  if (!noData.empty()) raster.metadata.SetFileMetadataValue("NO_DATA_VALUE", noData);
-  if (isFillOnly) raster.metadata.SetFileMetadataValue("NO_DATA_VALUE_IS_FILL", "YES");
-  if (alpha != 0) raster.metadata.SetChanMetadataValue("ALPHA", alpha, "YES");
+  raster.metadata = AuxiliaryData({{"NO_DATA_VALUE", noData}}, AuxiliaryItems(channels));
+  orin::model::SourceFacts& facts = raster.metadata.Facts();
+  facts.carriesValidity = true;
+  facts.noDataIsFill = isFillOnly;
+  if (alpha != 0) facts.channels[alpha - 1].isAlpha = true;
   return std::unique_ptr<IMaskDecision>(GetFileMetadataSrcMask(&raster));
 }
 
@@ -114,6 +116,18 @@ TEST(NoDataMask, AlphaIsNotComparedWithTheValue) {
 TEST(NoDataMask, AlphaAloneIsMaskedByItsValidityAlone) {
   const auto decision = DecisionWithValidity("7", false, 1, 1);
   EXPECT_THAT(ValidityOfMasked(*decision, {7, 7, 1}, 1), ElementsAre(false, true, true));
+}
+
+TEST(NoDataMask, ItemsOfAUserChangeNothing) {
+  FakeRaster raster;
+  raster.metadata = AuxiliaryData({{"NO_DATA_VALUE", "7"},
+                                   {"NO_DATA_VALUE_IS_FILL", "YES"},
+                                   {"DECLARED_NO_DATA_VALUE", "5"},
+                                   {"VALIDITY", "YES"}},
+                                  {{{"ALPHA", "YES"}}});
+  const std::unique_ptr<IMaskDecision> decision(GetFileMetadataSrcMask(&raster));
+  ASSERT_NE(nullptr, decision);
+  EXPECT_THAT(ValidityOfMasked(*decision, {1, 7, 5}, 1), ElementsAre(true, false, true));
 }
 
 template <class T>
@@ -203,8 +217,8 @@ TEST(NoDataMask, ADecimalCommaIsAPointAsOtherProgramsReadIt) {
 TEST(NoDataMask, TheDeclaredValueDecidesWhereAnotherOneIsAnswered) {
   FakeRaster raster;
   raster.type = DataTypeOf<float>();
-  raster.metadata = AuxiliaryData(
-      {{"NO_DATA_VALUE", "-3"}, {orin::datasources::kDeclaredNoDataKey, "nan"}}, {{}});
+  raster.metadata = AuxiliaryData({{"NO_DATA_VALUE", "nan"}}, {{}});
+  raster.metadata.SetFileMetadataValue("NO_DATA_VALUE", "-3");
   const std::unique_ptr<IMaskDecision> decision(GetFileMetadataSrcMask(&raster));
   EXPECT_THAT(ValidityOf<float>(*decision, {-3.0f, NAN}), ElementsAre(true, false));
 }

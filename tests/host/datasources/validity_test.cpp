@@ -137,10 +137,10 @@ std::unique_ptr<IRasterReader> PixelsDeclaring(const std::string& noData, unsign
 TEST(Validity, AReaderWithAMaskDeclaresAFillWhereItsFileDeclaresNothing) {
   const auto undeclared = WithValidity(PixelsDeclaring("", 3), {Draw({"#"}), 0, {}});
   EXPECT_EQ("0", undeclared->GetAuxiliaryData().GetFileMetadataValue(kNoDataKey));
-  EXPECT_NE("", undeclared->GetAuxiliaryData().GetFileMetadataValue(kFillOnlyKey));
+  EXPECT_TRUE(undeclared->GetAuxiliaryData().Facts().noDataIsFill);
   const auto declared = WithValidity(PixelsDeclaring("9", 3), {Draw({"#"}), 0, {}});
   EXPECT_EQ("9", declared->GetAuxiliaryData().GetFileMetadataValue(kNoDataKey));
-  EXPECT_EQ("", declared->GetAuxiliaryData().GetFileMetadataValue(kFillOnlyKey));
+  EXPECT_FALSE(declared->GetAuxiliaryData().Facts().noDataIsFill);
 }
 
 TEST(Validity, AReaderWithNeitherMaskNorAlphaStaysWhatItIs) {

@@ -149,6 +149,7 @@ TEST_F(TiffFiles, DeclareNoDataByItemBeforeTag) {
   const char* kOfFile = "<GDALMetadata><Item name=\"NO_DATA_VALUE\">7</Item></GDALMetadata>";
   const char* kOfChannel =
       "<GDALMetadata><Item name=\"NO_DATA_VALUE\" sample=\"0\">8</Item></GDALMetadata>";
+  const char* kNone = "<GDALMetadata><Item name=\"NO_DATA_VALUE\">none</Item></GDALMetadata>";
   const char* kOfOther =
       "<GDALMetadata><Item name=\"NO_DATA_VALUE\" domain=\"D\">9</Item></GDALMetadata>";
   EXPECT_EQ(Pair("", ""), NoDataOf(file, nullptr, nullptr));
@@ -156,6 +157,7 @@ TEST_F(TiffFiles, DeclareNoDataByItemBeforeTag) {
   EXPECT_EQ(Pair("7", ""), NoDataOf(file, "5", kOfFile));
   EXPECT_EQ(Pair("", "8"), NoDataOf(file, "5", kOfChannel));
   EXPECT_EQ(Pair("5", ""), NoDataOf(file, "5", kOfOther));
+  EXPECT_EQ(Pair("5", ""), NoDataOf(file, "5", kNone));
   for (const char* number : {"nan", "inf", "-inf", "1e999", "1,5"})  // as it stands
     EXPECT_EQ(Pair(number, ""), NoDataOf(file, number, nullptr)) << number;
   for (const char* noNumber : {"", "x", "1 2", "0x10"})

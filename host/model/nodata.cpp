@@ -1,5 +1,5 @@
 // SPDX-License-Identifier: MIT
-#include "host/datasources/nodatavalue.h"
+#include "host/model/nodata.h"
 
 #include <algorithm>
 #include <array>
@@ -9,8 +9,9 @@
 #include <locale>
 #include <sstream>
 #include <string_view>
+#include <utility>
 
-namespace orin::datasources {
+namespace orin::model {
 namespace {
 
 template <class Number>
@@ -63,29 +64,8 @@ double OutOfRange(const std::string& text) {
                                      : value;
 }
 
-template <class T>
-std::optional<NoDataValue<T>> IntegerOf(const std::string& text, double number) {
-  T value{};
-  if (ParseWhole(PlainNoDataText(text), value) == std::errc()) return NoDataValue<T>{value, value};
-  // 2 to the power of the type's digits is exact in double; the maximum of a 64-bit type is not.
-  const double limit = std::ldexp(1.0, std::numeric_limits<T>::digits);
-  const bool inRange = number < limit && number >= double(std::numeric_limits<T>::min());
-  if (!inRange || number != std::trunc(number)) return std::nullopt;
-  value = static_cast<T>(number);
-  return NoDataValue<T>{value, value};
-}
-
-template <class T>
-NoDataValue<T> FloatOf(const std::string& text, double number) {
-  const auto value = static_cast<T>(number);
-  const bool isBeyond = std::isinf(value) && !PlainNoDataText(text).empty();
-  return {value, isBeyond ? std::copysign(std::numeric_limits<T>::max(), value) : value};
-}
-
-}  // namespace
-
-std::string PlainNoDataText(const std::string& text) {
-  std::string plain = WithPoint(text);
+/// Empty when the text spells no finite number.
+std::string DecimalOf(const std::string& plain) {
   double value = 0;
   const std::errc error = ParseWhole(plain, value);
   const bool isNumber =
@@ -93,8 +73,7 @@ std::string PlainNoDataText(const std::string& text) {
   return isNumber ? plain : "";
 }
 
-std::optional<double> ParseNoData(const std::string& text) {
-  const std::string plain = WithPoint(text);
+std::optional<double> NumberOf(const std::string& plain) {
   double value = 0;
   const std::errc error = ParseWhole(plain, value);
   if (error == std::errc()) return value;
@@ -102,26 +81,76 @@ std::optional<double> ParseNoData(const std::string& text) {
   return ParseHashNumber(plain);
 }
 
-template <class T>
-std::optional<NoDataValue<T>> NoDataValueOf(const std::string& text) {
-  const std::optional<double> number = ParseNoData(text);
-  if (!number) return std::nullopt;
-  if constexpr (std::is_integral_v<T>) return IntegerOf<T>(text, *number);
-  else if (std::isnan(*number)) {
-    constexpr T kNaN = std::numeric_limits<T>::quiet_NaN();  // whatever sign the text gives it
-    return NoDataValue<T>{kNaN, kNaN};
-  } else return FloatOf<T>(text, *number);
+template <class Integer>
+std::optional<Integer> WholeOf(const std::string& text) {
+  Integer value{};
+  return ParseWhole(text, value) == std::errc() ? std::optional(value) : std::nullopt;
 }
 
-template std::optional<NoDataValue<signed char>> NoDataValueOf(const std::string&);
-template std::optional<NoDataValue<unsigned char>> NoDataValueOf(const std::string&);
-template std::optional<NoDataValue<short>> NoDataValueOf(const std::string&);
-template std::optional<NoDataValue<unsigned short>> NoDataValueOf(const std::string&);
-template std::optional<NoDataValue<int>> NoDataValueOf(const std::string&);
-template std::optional<NoDataValue<unsigned int>> NoDataValueOf(const std::string&);
-template std::optional<NoDataValue<float>> NoDataValueOf(const std::string&);
-template std::optional<NoDataValue<double>> NoDataValueOf(const std::string&);
-template std::optional<NoDataValue<int64_t>> NoDataValueOf(const std::string&);
-template std::optional<NoDataValue<uint64_t>> NoDataValueOf(const std::string&);
+/// The value of a text such as "7.0" or "1e3".
+template <class T>
+std::optional<NoDataValue<T>> RoundedInteger(double number) {
+  // 2 to the power of the type's digits is exact in double; the maximum of a 64-bit type is not.
+  const double limit = std::ldexp(1.0, std::numeric_limits<T>::digits);
+  const bool inRange = number < limit && number >= double(std::numeric_limits<T>::min());
+  if (!inRange || number != std::trunc(number)) return std::nullopt;
+  const T value = static_cast<T>(number);
+  return NoDataValue<T>{value, value};
+}
 
-}  // namespace orin::datasources
+template <class T>
+NoDataValue<T> FloatOf(double number, bool isDecimal) {
+  const auto value = static_cast<T>(number);
+  const bool isBeyond = std::isinf(value) && isDecimal;
+  return {value, isBeyond ? std::copysign(std::numeric_limits<T>::max(), value) : value};
+}
+
+}  // namespace
+
+const char* NameOf(NoDataOrigin origin) {
+  constexpr std::array<const char*, 5> kNames = {"item", "tag", "aux.xml", "channel", ""};
+  return kNames.at(static_cast<size_t>(origin));
+}
+
+std::optional<NoData> NoData::Parse(const std::string& text, NoDataOrigin origin) {
+  const std::string plain = WithPoint(text);
+  const std::optional<double> number = NumberOf(plain);
+  if (!number) return std::nullopt;
+  NoData parsed;
+  parsed.text_ = text;
+  parsed.decimal_ = DecimalOf(plain);
+  parsed.origin_ = origin;
+  parsed.number_ = *number;
+  parsed.whole_ = WholeOf<int64_t>(plain);
+  parsed.wholeUnsigned_ = WholeOf<uint64_t>(plain);
+  return parsed;
+}
+
+template <class T>
+std::optional<NoDataValue<T>> NoData::As() const {
+  if constexpr (std::is_integral_v<T>) {
+    const auto exact = [](const auto& whole) { return whole && std::in_range<T>(*whole); };
+    if (exact(whole_)) return NoDataValue<T>{static_cast<T>(*whole_), static_cast<T>(*whole_)};
+    if (exact(wholeUnsigned_))
+      return NoDataValue<T>{static_cast<T>(*wholeUnsigned_), static_cast<T>(*wholeUnsigned_)};
+    return RoundedInteger<T>(number_);
+  } else if (std::isnan(number_)) {
+    constexpr T kNaN = std::numeric_limits<T>::quiet_NaN();  // whatever sign the text gives it
+    return NoDataValue<T>{kNaN, kNaN};
+  } else {
+    return FloatOf<T>(number_, !decimal_.empty());
+  }
+}
+
+template std::optional<NoDataValue<signed char>> NoData::As() const;
+template std::optional<NoDataValue<unsigned char>> NoData::As() const;
+template std::optional<NoDataValue<short>> NoData::As() const;
+template std::optional<NoDataValue<unsigned short>> NoData::As() const;
+template std::optional<NoDataValue<int>> NoData::As() const;
+template std::optional<NoDataValue<unsigned int>> NoData::As() const;
+template std::optional<NoDataValue<float>> NoData::As() const;
+template std::optional<NoDataValue<double>> NoData::As() const;
+template std::optional<NoDataValue<int64_t>> NoData::As() const;
+template std::optional<NoDataValue<uint64_t>> NoData::As() const;
+
+}  // namespace orin::model
