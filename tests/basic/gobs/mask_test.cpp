@@ -3,9 +3,11 @@
 
 #include <gtest/gtest.h>
 
+#include <algorithm>
 #include <random>
 #include <stdexcept>
 #include <string>
+#include <thread>
 #include <vector>
 
 #include "basic/gobs/mask/maskdecision.h"
@@ -62,6 +64,21 @@ TEST(Mask, ARunIsClearedFromItsFirstToItsLastPixel) {
     }
 }
 
+TEST(Mask, ThreadsMayClearRunsOfOneMaskAtOnce) {
+  constexpr uint32_t kWidth = 13, kHeight = 400;  // lines share bytes
+  Mask mask(kWidth, kHeight, {});
+  std::vector<std::thread> threads;
+  for (uint32_t first = 0; first < 8; ++first)
+    threads.emplace_back([&mask, first] {
+      for (uint32_t y = first; y < kHeight; y += 8)
+        for (uint32_t x = 0; x < kWidth; x += 3) mask.ClearRun(x, y, std::min(2u, kWidth - x));
+    });
+  for (std::thread& thread : threads) thread.join();
+  for (uint32_t y = 0; y < kHeight; ++y)
+    for (uint32_t x = 0; x < kWidth; ++x)
+      ASSERT_EQ(x % 3 == 2, mask.IsValid(x, y)) << x << ", " << y;
+}
+
 TEST(Mask, IsUniformWhenAllPixelsAreAlike) {
   Mask mask(5, 3, {});  // 15 pixels: the last bit of the last byte is none
   EXPECT_EQ(true, mask.Uniform());
@@ -98,6 +115,26 @@ TEST(Mask, IntoABitRasterItsBytesAreCopiedVerbatim) {
   mask.RetrieveRaster(&bits);
   EXPECT_EQ(std::vector<uint8_t>(mask.begin, mask.end),
             std::vector<uint8_t>(bits.data, bits.data + (mask.end - mask.begin)));
+}
+
+TEST(Mask, IntoABitRasterThatIsTooSmallOnlyWhatItHoldsIsCopied) {
+  Mask mask(16, 4, {});  // eight bytes
+  std::fill(mask.begin, mask.end, uint8_t{0x5A});
+  uint8_t buffer[12];
+  std::fill(std::begin(buffer), std::end(buffer), uint8_t{77});
+  Raster bits({3, 1, 1, eDT_BIT}, {}, buffer);
+  mask.RetrieveRaster(&bits);
+  for (size_t i = 0; i < std::size(buffer); ++i) EXPECT_EQ(i < 3 ? 0x5A : 77, buffer[i]) << i;
+}
+
+TEST(Mask, IntoABitRasterThatIsLargerNothingBehindTheMaskIsRead) {
+  Mask mask(3, 1, {});  // one byte
+  mask.begin[0] = 0xA5;
+  uint8_t buffer[64];
+  std::fill(std::begin(buffer), std::end(buffer), uint8_t{77});
+  Raster bits({16, 4, 1, eDT_BIT}, {}, buffer);
+  mask.RetrieveRaster(&bits);
+  for (size_t i = 0; i < std::size(buffer); ++i) EXPECT_EQ(i < 1 ? 0xA5 : 77, buffer[i]) << i;
 }
 
 /// 1 and 0 of every buffer pixel, one by one.

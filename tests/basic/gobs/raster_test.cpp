@@ -5,6 +5,7 @@
 
 #include <type_traits>
 
+#include "basic/gobs/blockmemory.h"
 #include "host/services/exception.h"
 
 namespace orin::gobs {
@@ -63,6 +64,19 @@ TEST(Raster, AViewOfSomebodyElsesBufferDoesNotOwnIt) {
     *PixelAddress(raster, 3, 2) = 9;
   }
   EXPECT_EQ(9, buffer[11]);
+}
+
+TEST(Raster, ADestroyedBlockGivesBackWhatItOwnsAndNothingElse) {
+  const int before = LiveBlocks();
+  uint8_t buffer[12] = {};
+  {
+    const Raster small({4, 3, 1, eDT_8U}, {});
+    const Raster large({2048, 1024, 1, eDT_8U}, {});
+    EXPECT_EQ(before + 2, LiveBlocks());
+    const Raster view({4, 3, 1, eDT_8U}, {}, buffer);
+    EXPECT_EQ(before + 2, LiveBlocks());
+  }
+  EXPECT_EQ(before, LiveBlocks());
 }
 
 TEST(Raster, BlocksOfFourGigabytesAreRefused) {

@@ -260,5 +260,55 @@ TEST(AverageComplex, NoDataIsRealInTheExactPathAndFillsComponentsInTheGeneralOne
   EXPECT_EQ((Picture<short>{{-5, -5, 0, 0}}), Resampled<short>(kernel, *two, twoMask.get(), 1, 1));
 }
 
+/// The mean of 300 x 300 equal pixels: their sum takes more than 32 bits.
+template <class T>
+T MeanOfManyPixels(T value) {
+  constexpr uint32_t kSide = 300;
+  Average<T> kernel;
+  kernel.SetRatio(1.0 / kSide, 1.0 / kSide);
+  const auto src = testing::EmptyBlock<T>(kSide, kSide, kMargin, value);
+  return Resampled<T>(kernel, *src, nullptr, 1, 1)[0][0];
+}
+
+TEST(AverageOfManyPixels, SumsOfSmallIntegersTakeMoreThan32Bits) {
+  EXPECT_EQ(65535, MeanOfManyPixels<uint16_t>(65535));
+  EXPECT_EQ(-32768, MeanOfManyPixels<int16_t>(-32768));
+  EXPECT_EQ(32767, MeanOfManyPixels<int16_t>(32767));
+  EXPECT_EQ(255, MeanOfManyPixels<uint8_t>(255));
+  EXPECT_EQ(-128, MeanOfManyPixels<int8_t>(-128));
+}
+
+/// The general path with these offsets, at origins that are equal: the offsets are the caller's.
+Picture<uint8_t> AveragedAt(double offsetX, double offsetY) {
+  Average<uint8_t> kernel;
+  kernel.SetGeoReference(0, 0, 1, 1, 0, 0, 2, 2);
+  const auto src = BlockOf<uint8_t>({{10, 12, 20, 22},
+                                     {10, 12, 20, 22},
+                                     {30, 32, 40, 42},
+                                     {30, 32, 40, 42}}, kMargin);
+  const auto dst = testing::EmptyBlock<uint8_t>(1, 1, {1, 0, 0, false}, uint8_t{77});
+  kernel.ResampleGeneral(src.get(), nullptr, dst.get(), 0.5, 0.5, offsetX, offsetY);
+  return testing::PictureOf<uint8_t>(*dst);
+}
+
+TEST(AverageGeneral, GoesByTheOffsetsThatItIsGivenNotByItsOwnOrigins) {
+  EXPECT_EQ((Picture<uint8_t>{{11}}), AveragedAt(0, 0));
+  EXPECT_EQ((Picture<uint8_t>{{21}}), AveragedAt(2, 0));
+  EXPECT_EQ((Picture<uint8_t>{{31}}), AveragedAt(0, 2));
+  EXPECT_EQ((Picture<uint8_t>{{41}}), AveragedAt(2, 2));
+}
+
+TEST(AverageGeneral, GoesByTheRatiosThatItIsGivenNotByItsOwn) {
+  Average<uint8_t> kernel;
+  kernel.SetRatio(1, 1);
+  const auto src = BlockOf<uint8_t>({{10, 12, 50, 50},
+                                     {30, 32, 50, 50}}, kMargin);
+  const auto dst = testing::EmptyBlock<uint8_t>(1, 1, {1, 0, 0, false}, uint8_t{77});
+  kernel.ResampleGeneral(src.get(), nullptr, dst.get(), 0.5, 1, 0, 0);
+  EXPECT_EQ((Picture<uint8_t>{{11}}), testing::PictureOf<uint8_t>(*dst));
+  kernel.ResampleGeneral(src.get(), nullptr, dst.get(), 1, 0.5, 0, 0);
+  EXPECT_EQ((Picture<uint8_t>{{20}}), testing::PictureOf<uint8_t>(*dst));
+}
+
 }  // namespace
 }  // namespace orin::resamplers

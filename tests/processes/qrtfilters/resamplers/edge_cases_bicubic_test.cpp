@@ -134,5 +134,15 @@ TEST(Bicubic, HalvingReadsOnePixelLeftAndTwoRight) {
   EXPECT_EQ((Picture<double>{{143.4375, -15.9375}}), half);
 }
 
+TEST(Bicubic, SamplesOf64BitsAreNarrowedAtOnceNotThroughDouble) {
+  // Single precision has steps of 2^37 there. Half a step and one is above the middle; double, with
+  // steps of 2^8, loses the one, and the tie goes down.
+  constexpr int64_t kBase = int64_t{1} << 60;
+  constexpr int64_t kValue = kBase + (int64_t{1} << 36) + 1;
+  constexpr int64_t kUp = kBase + (int64_t{1} << 37);
+  EXPECT_EQ(kUp, BetweenOf<int64_t>({kValue, kValue, kValue, kValue}));
+  EXPECT_EQ(uint64_t{kUp}, BetweenOf<uint64_t>({kValue, kValue, kValue, kValue}));
+}
+
 }  // namespace
 }  // namespace orin::resamplers

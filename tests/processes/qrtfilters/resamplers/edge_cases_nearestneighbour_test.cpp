@@ -211,5 +211,21 @@ TEST(NearestNeighbour, SourceWithoutPixelsGivesNoData) {
   EXPECT_EQ((Picture<uint8_t>{{9, 9, 9, 9}}), Resampled<uint8_t>(kernel, *src, nullptr, 2, 1));
 }
 
+TEST(NearestNeighbour, AMaskIsAddressedByItsOwnMargins) {
+  NearestNeighbour<uint8_t> kernel;
+  kernel.SetNoDataValue(99);
+  const auto src = BlockOf<uint8_t>(kSquare);
+  gobs::Mask mask(4, 4, {2, 1, 0, 0});
+  mask.SetValid(2, 0, false);
+  mask.SetValid(0, 2, false);
+  EXPECT_EQ((Picture<uint8_t>{{1, 99},
+                              {99, 11}}), Resampled<uint8_t>(kernel, *src, &mask, 2, 2));
+  const auto wide = BlockOf<uint8_t>(kSquare, {1, 3, 3, false});
+  gobs::Mask narrow(4, 4, {});
+  narrow.SetValid(2, 2, false);
+  EXPECT_EQ((Picture<uint8_t>{{1, 3},
+                              {9, 99}}), Resampled<uint8_t>(kernel, *wide, &narrow, 2, 2));
+}
+
 }  // namespace
 }  // namespace orin::resamplers
