@@ -105,7 +105,8 @@ Declaration Read(std::string_view input) {
   std::vector<AuxiliaryData::Items> channels;
   for (size_t i = 1; i < parts.size(); ++i) {
     channels.push_back({{datasources::kNoDataKey, parts[i]}});
-    declaration.texts.push_back(Trim(parts[i].empty() ? parts[0] : parts[i]));
+    const std::string own = Trim(parts[i]);  // one that is no number leaves the file's in force
+    declaration.texts.push_back(IsDecimal(own) || IsAnotherMatter(own) ? own : Trim(parts[0]));
   }
   declaration.metadata = AuxiliaryData({{datasources::kNoDataKey, parts[0]}}, channels);
   return declaration;
