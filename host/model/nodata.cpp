@@ -87,6 +87,10 @@ std::optional<Integer> WholeOf(const std::string& text) {
   return ParseWhole(text, value) == std::errc() ? std::optional(value) : std::nullopt;
 }
 
+bool HasDigitsOnly(const std::string& decimal) {
+  return !decimal.empty() && decimal.find_first_not_of("-0123456789") == std::string::npos;
+}
+
 /// The value of a text such as "7.0" or "1e3".
 template <class T>
 std::optional<NoDataValue<T>> RoundedInteger(double number) {
@@ -133,6 +137,7 @@ std::optional<NoDataValue<T>> NoData::As() const {
     if (exact(whole_)) return NoDataValue<T>{static_cast<T>(*whole_), static_cast<T>(*whole_)};
     if (exact(wholeUnsigned_))
       return NoDataValue<T>{static_cast<T>(*wholeUnsigned_), static_cast<T>(*wholeUnsigned_)};
+    if (HasDigitsOnly(decimal_)) return std::nullopt;  // beyond the type, however it rounds
     return RoundedInteger<T>(number_);
   } else if (std::isnan(number_)) {
     constexpr T kNaN = std::numeric_limits<T>::quiet_NaN();  // whatever sign the text gives it
