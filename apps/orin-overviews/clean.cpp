@@ -46,6 +46,21 @@ std::vector<unsigned> FactorsOf(const std::vector<LevelDescription>& levels) {
   return factors;
 }
 
+/// Removes what was chosen; where no levels are named, also those that only then show, having
+/// shared a factor with another one.
+void RemoveFrom(ILevelStore& store, const std::vector<LevelDescription>& chosen,
+                const CleanOptions& options) {
+  constexpr int kMaxRounds = 1000;  // one removes all but those that share a factor
+  store.Remove(FactorsOf(chosen));
+  if (!options.levels.empty() || chosen.empty()) return;
+  const LevelPlace place = chosen.front().place;
+  auto rest = Chosen(&store, place, options);
+  for (int round = 0; round < kMaxRounds && !rest.empty(); ++round) {
+    store.Remove(FactorsOf(rest));
+    rest = Chosen(&store, place, options);
+  }
+}
+
 /// Free space that a command left which was killed is given back as well.
 /// \returns what was removed
 std::vector<LevelDescription> CleanInside(const CleanOptions& options, const std::string& file,
@@ -59,7 +74,7 @@ std::vector<LevelDescription> CleanInside(const CleanOptions& options, const std
   dataset.reset();
   ZMBFormatType code = kFormatUnknown;
   datasources::IFormatDriver* driver = datasources::FormatRegistry::Instance().DriverOf(file, code);
-  driver->OpenToRemoveLevels(file)->Levels()->Remove(FactorsOf(chosen));
+  RemoveFrom(*driver->OpenToRemoveLevels(file)->Levels(), chosen, options);
   return chosen;
 }
 
@@ -72,7 +87,7 @@ std::vector<LevelDescription> CleanBeside(const CleanOptions& options, const std
   const auto chosen = Chosen(store, LevelPlace::kSideCar, options);
   const bool reclaims = store && store->HasReclaimableSpace();
   if (store && (reclaims || !chosen.empty() || options.levels.empty()))
-    store->Remove(FactorsOf(chosen));
+    RemoveFrom(*store, chosen, options);
   hasReclaimed = hasReclaimed || reclaims;
   return chosen;
 }

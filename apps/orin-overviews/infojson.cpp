@@ -37,10 +37,11 @@ Json ChannelsOf(const LevelDescription& level) {
 
 Json JsonOf(const LevelDescription& level) {
   const bool inside = level.place == datasources::LevelPlace::kInternal;
+  const char* place = level.isInSubDirectory ? "subifd" : inside ? "internal" : "side-car";
   return {{"level", level.level},
           {"width", level.width},
           {"height", level.height},
-          {"place", inside ? "internal" : "side-car"},
+          {"place", place},
           {"file", level.file},
           {"method", OrNull(level.method)},
           {"sourceLevel", level.sourceLevel ? Json(level.sourceLevel) : Json()},

@@ -44,6 +44,7 @@ std::string ValidityText(const RasterInfo& info) {
 }
 
 std::string PlaceText(const LevelDescription& level) {
+  if (level.isInSubDirectory) return _("inside (SubIFD)");
   if (level.place == datasources::LevelPlace::kInternal) return _("inside");
   return std::filesystem::path(level.file).filename().string();
 }

@@ -34,7 +34,7 @@ class BothPlaces final : public ILevelStore {
     return levels;
   }
   std::vector<LevelDescription> ListHidden() const override {
-    std::vector<LevelDescription> hidden;
+    std::vector<LevelDescription> hidden = sideCar_->ListHidden();
     if (!internal_) return hidden;
     const std::vector<LevelDescription> levels = sideCar_->List();
     for (LevelDescription& entry : internal_->List())

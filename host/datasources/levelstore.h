@@ -48,7 +48,7 @@ class ILevelStore {
   virtual void SetSource(const LevelDescription& /*source*/) {}
 
   /// Levels that `List` leaves out and other programs may read: those inside the file that stand
-  /// beside it, too; those that cannot be managed.
+  /// beside it, too; those that share a factor with another one; those that cannot be managed.
   virtual std::vector<LevelDescription> ListHidden() const { return {}; }
 
   /// Where `List` had to read the whole image to tell what is up to date, keeps the answer with the

@@ -37,6 +37,8 @@ struct LevelDescription {
   LevelStatus status = LevelStatus::kUnverified;
   ImageRecord image = {};  ///< that it was computed from; blank when unknown
   bool hasMask = false;    ///< a mask of its own stands with its pixels
+  /// It stands in a directory inside the image's own (SubIFD): listed, never used or changed.
+  bool isInSubDirectory = false;
 };
 
 /// True when `entries` holds true for every one of `channels` (1-based).

@@ -1,49 +1,14 @@
 // SPDX-License-Identifier: MIT
 #include "host/drivers/tiff/leveldirectories.h"
 
-#include <algorithm>
-#include <cmath>
-#include <limits>
+#include <utility>
 
+#include "host/drivers/tiff/file/levelfactor.h"
 #include "host/model/levelsize.h"
 #include "host/services/exception.h"
 
 namespace orin::drivers {
 namespace {
-
-constexpr size_t kMostCandidates = 1000;  // an image has a dozen levels; a damaged chain is cut off
-
-struct Range {
-  uint64_t low;
-  uint64_t high;
-};
-
-/// The factors that turn `size` into `levelSize`, rounding down or up.
-Range FactorsOf(uint32_t size, uint32_t levelSize) {
-  const uint64_t low =
-      uint64_t{size} / (uint64_t{levelSize} + 1) + 1;  // rounding down gives levelSize
-  if (levelSize <= 1) return {low, std::numeric_limits<uint32_t>::max()};
-  const uint64_t below = levelSize - 1;
-  return {low, (size + below - 1) / below - 1};  // rounding up still gives levelSize
-}
-
-uint32_t Size(const PositionedFile& file, const TiffStructure& structure,
-              const TiffDirectory& directory, uint16_t tag) {
-  return static_cast<uint32_t>(NumberOf(file, structure, directory, tag, 0));
-}
-
-uint64_t Subfile(const PositionedFile& file, const TiffStructure& structure,
-                 const TiffDirectory& directory) {
-  constexpr uint64_t kOldReduced = 2;  // of the older OldSubfileType tag
-  const bool isOldReduced =
-      !directory.Find(TIFFTAG_SUBFILETYPE) &&
-      NumberOf(file, structure, directory, TIFFTAG_OSUBFILETYPE, 0) == kOldReduced;
-  return isOldReduced ? uint64_t{FILETYPE_REDUCEDIMAGE}
-                      : NumberOf(file, structure, directory, TIFFTAG_SUBFILETYPE, 0);
-}
-
-bool IsMask(uint64_t subfile) { return (subfile & FILETYPE_MASK) != 0; }
-bool IsReduced(uint64_t subfile) { return (subfile & FILETYPE_REDUCEDIMAGE) != 0; }
 
 void ReadMetadata(const PositionedFile& file, const TiffStructure& structure,
                   const TiffDirectory& directory, StoredLevel& stored) {
@@ -64,15 +29,13 @@ bool IsOurs(const StoredLevel& stored, const ImageShape& image) {
              model::LevelSize{stored.format.width, stored.format.height};
 }
 
-/// The level that directory `index` holds, if it is one of this image.
+/// The level that `directory` holds, if it is one of this image.
 /// \param factor  of its size
 /// \param handle  of the file, opened when it is needed
 std::optional<StoredLevel> LevelAt(const PositionedFile& file, const TiffStructure& structure,
-                                   const ImageShape& image, size_t index, unsigned factor,
-                                   std::optional<TiffHandle>& handle) {
+                                   const ImageShape& image, const TiffDirectory& directory,
+                                   unsigned factor, std::optional<TiffHandle>& handle) {
   StoredLevel stored;
-  stored.index = index;
-  const TiffDirectory& directory = structure.directories[index];
   try {
     if (!handle) handle = TiffHandle::OpenAt(file.Path(), 0);
     handle->MoveTo(directory.offset);
@@ -93,50 +56,34 @@ std::optional<StoredLevel> LevelAt(const PositionedFile& file, const TiffStructu
 
 }  // namespace
 
-std::optional<unsigned> FactorOf(uint32_t width, uint32_t height, uint32_t levelWidth,
-                                 uint32_t levelHeight) {
-  if (levelWidth == 0 || levelHeight == 0 || levelWidth > width || levelHeight > height)
-    return std::nullopt;
-  const Range x = FactorsOf(width, levelWidth);
-  const Range y = FactorsOf(height, levelHeight);
-  const uint64_t low = std::max<uint64_t>({x.low, y.low, 2});
-  const uint64_t high = std::min(x.high, y.high);
-  if (low > high) return std::nullopt;
-  const double ratio = width >= height ? double(width) / levelWidth : double(height) / levelHeight;
-  std::optional<unsigned> best;
-  for (uint64_t power = 2; power <= high; power *= 2)
-    if (power >= low && (!best || std::abs(double(power) - ratio) < std::abs(*best - ratio)))
-      best = static_cast<unsigned>(power);
-  if (best) return best;
-  return static_cast<unsigned>(
-      std::clamp<uint64_t>(static_cast<uint64_t>(std::llround(ratio)), low, high));
+std::vector<StoredLevel> FindLevels(const PositionedFile& file, const TiffStructure& structure,
+                                    const Catalogue& catalogue, const ImageShape& image) {
+  std::vector<StoredLevel> levels;
+  std::optional<TiffHandle> handle;
+  for (const size_t index : catalogue.Levels()) {
+    const CatalogueEntry& entry = catalogue.At(index);
+    const auto factor = FactorOf(image.width, image.height, entry.width, entry.height);
+    if (!factor) continue;
+    auto stored = LevelAt(file, structure, image, structure.directories[index], *factor, handle);
+    if (!stored) continue;
+    stored->index = index;
+    stored->mask = catalogue.MaskOf(index);
+    const bool isMaskApart = stored->mask && *stored->mask != index + 1;
+    if (stored->isOurs && isMaskApart) stored->mask.reset();  // ours stand right behind
+    levels.push_back(std::move(*stored));
+  }
+  return levels;
 }
 
-std::vector<StoredLevel> FindLevels(const PositionedFile& file, const TiffStructure& structure,
-                                    const ImageShape& image) {
+std::vector<StoredLevel> FindSubLevels(const PositionedFile& file, const TiffStructure& structure,
+                                       const Catalogue& catalogue, const ImageShape& image) {
   std::vector<StoredLevel> levels;
-  std::vector<std::pair<uint32_t, uint32_t>> otherImages;
   std::optional<TiffHandle> handle;
-  size_t candidates = 0;
-  for (size_t i = image.isInFile ? 1 : 0; i < structure.directories.size(); ++i) {
-    const TiffDirectory& directory = structure.directories[i];
-    const uint64_t subfile = Subfile(file, structure, directory);
-    const uint32_t width = Size(file, structure, directory, TIFFTAG_IMAGEWIDTH);
-    const uint32_t height = Size(file, structure, directory, TIFFTAG_IMAGELENGTH);
-    if (IsMask(subfile)) continue;
-    if (image.isInFile && !IsReduced(subfile)) {
-      otherImages.emplace_back(width, height);
-      continue;
-    }
-    const auto factor = FactorOf(image.width, image.height, width, height);
-    if (!factor) continue;
-    if (++candidates > kMostCandidates) break;
-    const bool belongsToOther =
-        std::any_of(otherImages.begin(), otherImages.end(), [&](const auto& other) {
-          return FactorOf(other.first, other.second, width, height).has_value();
-        });
-    if (belongsToOther) continue;
-    if (auto stored = LevelAt(file, structure, image, i, *factor, handle))
+  for (const SubDirectory& sub : catalogue.SubLevels()) {
+    const auto factor = FactorOf(image.width, image.height, sub.width, sub.height);
+    const auto directory = ReadDirectoryAt(file, structure, sub.offset);
+    if (!factor || !directory) continue;
+    if (auto stored = LevelAt(file, structure, image, *directory, *factor, handle))
       levels.push_back(std::move(*stored));
   }
   return levels;
@@ -148,17 +95,15 @@ Place PlaceOf(const TiffStructure& structure, size_t index) {
           directories[index].next};
 }
 
-Place PlaceOfNew(const PositionedFile& file, const TiffStructure& structure,
+Place PlaceOfNew(const TiffStructure& structure, const Catalogue& catalogue,
                  const ImageShape& image, uint32_t width, uint32_t height) {
   const auto& directories = structure.directories;
+  const size_t end = image.isInFile ? catalogue.EndOfFirstImage() : directories.size();
   size_t index = image.isInFile ? 1 : 0;
-  for (; index < directories.size(); ++index) {
-    const uint64_t subfile = Subfile(file, structure, directories[index]);
-    if (IsMask(subfile)) continue;  // of the image or of the level before it
-    if (image.isInFile && !IsReduced(subfile)) break;
-    const uint64_t area = uint64_t{Size(file, structure, directories[index], TIFFTAG_IMAGEWIDTH)} *
-                          Size(file, structure, directories[index], TIFFTAG_IMAGELENGTH);
-    if (area < uint64_t{width} * height) break;
+  for (; index < end; ++index) {
+    const CatalogueEntry& entry = catalogue.At(index);
+    const bool isSmaller = uint64_t{entry.width} * entry.height < uint64_t{width} * height;
+    if (entry.kind == DirectoryKind::kLevel && isSmaller) break;
   }
   if (index == 0)
     return {structure.HeadLinkPosition(), directories.empty() ? 0 : directories[0].offset};

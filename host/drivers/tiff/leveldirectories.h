@@ -7,6 +7,7 @@
 #include <string>
 #include <vector>
 
+#include "host/drivers/tiff/file/catalogue.h"
 #include "host/drivers/tiff/levelmetadata.h"
 #include "host/drivers/tiff/pixelformat.h"
 #include "host/drivers/tiff/structure.h"
@@ -33,15 +34,13 @@ struct StoredLevel {
   uint64_t imagePosition = 0;     ///< of the record of the image, in the file
 };
 
-/// The factor of a level that another program made, from its size, rounded down or up in each axis;
-/// none when the axes do not agree on one of 2 or more. A power of two wins, then the nearest.
-std::optional<unsigned> FactorOf(uint32_t width, uint32_t height, uint32_t levelWidth,
-                                 uint32_t levelHeight);
-
-/// The levels of the image, in the order of the chain; directories that fit no level are left out,
-/// and so is what follows the first thousand of fitting size.
+/// The levels of the image, in the order of the chain; those that differ from it in channels or
+/// type are left out.
 std::vector<StoredLevel> FindLevels(const PositionedFile& file, const TiffStructure& structure,
-                                    const ImageShape& image);
+                                    const Catalogue& catalogue, const ImageShape& image);
+/// The same of those inside the image's directory; their index in the chain means nothing.
+std::vector<StoredLevel> FindSubLevels(const PositionedFile& file, const TiffStructure& structure,
+                                       const Catalogue& catalogue, const ImageShape& image);
 
 /// Where a link is to be changed, and what the directory linked there must link on to.
 struct Place {
@@ -51,7 +50,7 @@ struct Place {
 
 /// The place of a new level of that size: largest first, behind the image and its mask, before the
 /// image's first smaller level and before any other image of the file.
-Place PlaceOfNew(const PositionedFile& file, const TiffStructure& structure,
+Place PlaceOfNew(const TiffStructure& structure, const Catalogue& catalogue,
                  const ImageShape& image, uint32_t width, uint32_t height);
 /// The place of a directory that takes over that of directory `index`.
 Place PlaceOf(const TiffStructure& structure, size_t index);

@@ -50,31 +50,6 @@ LevelCoding MaskCodingOf(const LevelCoding& level) {
   return coding;
 }
 
-void FindLevelMasks(const PositionedFile& file, const TiffStructure& structure,
-                    const ImageShape& image, std::vector<StoredLevel>& levels) {
-  using Size = std::pair<uint64_t, uint64_t>;
-  std::map<size_t, Size> masks;   // by index
-  std::map<Size, size_t> bySize;  // the first of each size
-  for (size_t i = image.isInFile ? 1 : 0; i < structure.directories.size(); ++i) {
-    const uint64_t subfile = SubfileOf(file, structure, i);
-    if (image.isInFile && (subfile & (FILETYPE_MASK | FILETYPE_REDUCEDIMAGE)) == 0) break;
-    if ((subfile & FILETYPE_MASK) == 0) continue;
-    const auto number = [&](uint16_t tag) {
-      return NumberOf(file, structure, structure.directories[i], tag, 0);
-    };
-    const Size size{number(TIFFTAG_IMAGEWIDTH), number(TIFFTAG_IMAGELENGTH)};
-    masks.emplace(i, size);
-    bySize.emplace(size, i);
-  }
-  for (StoredLevel& level : levels) {
-    const Size size{level.format.width, level.format.height};
-    const auto behind = masks.find(level.index + 1);
-    const auto any = bySize.find(size);
-    if (behind != masks.end() && behind->second == size) level.mask = behind->first;
-    else if (!level.isOurs && any != bySize.end()) level.mask = any->second;
-  }
-}
-
 std::vector<NewEntry> MaskEntriesOf(const LevelBuild& mask, bool isBig, bool isFirst) {
   LevelCoding coding = mask.Coding();
   if (isFirst) coding.subfileType = FILETYPE_MASK;

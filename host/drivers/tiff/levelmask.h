@@ -43,11 +43,6 @@ struct LevelValidity {
 /// How the mask of a level is stored: its size and grid, one bit a pixel, DEFLATE.
 LevelCoding MaskCodingOf(const LevelCoding& level);
 
-/// Finds the masks of `levels`: right behind a level, or for one of another program the first mask
-/// of its size that stands before the next image.
-void FindLevelMasks(const PositionedFile& file, const TiffStructure& structure,
-                    const ImageShape& image, std::vector<StoredLevel>& levels);
-
 /// The entries of a mask's directory.
 /// \param isFirst  it stands behind the first directory of a side-car
 std::vector<NewEntry> MaskEntriesOf(const LevelBuild& mask, bool isBig, bool isFirst);

@@ -2,45 +2,24 @@
 /// end is given back.
 // SPDX-License-Identifier: MIT
 #include <algorithm>
+#include <set>
 
 #include "host/drivers/tiff/references.h"
 #include "host/drivers/tiff/tifflevelstore.h"
 #include "host/services/text.h"
 
 namespace orin::drivers {
-namespace {
-
-/// True for the mask of a level: of its size, and inside an image's file reduced as well. The first
-/// mask of a side-car is not.
-bool IsMaskOf(const LevelFile& file, size_t index, const PixelFormat& level, bool isInImage) {
-  const TiffDirectory& directory = file.Structure().directories[index];
-  const auto number = [&](uint16_t tag) {
-    return NumberOf(file.File(), file.Structure(), directory, tag, 0);
-  };
-  const uint64_t kind = number(TIFFTAG_SUBFILETYPE);
-  return (kind & FILETYPE_MASK) != 0 && (!isInImage || (kind & FILETYPE_REDUCEDIMAGE) != 0) &&
-         number(TIFFTAG_IMAGEWIDTH) == level.width && number(TIFFTAG_IMAGELENGTH) == level.height;
-}
-
-}  // namespace
-
-/// The directories of the levels and of their masks, ascending.
+/// The directories of the levels and of their masks, ascending. Of levels that share a factor, the
+/// one that is listed.
 std::vector<size_t> TiffLevelStore::DirectoriesOf(const std::vector<unsigned>& levels) const {
-  std::vector<size_t> indices;
-  for (const StoredLevel& stored : levels_) {
-    if (std::find(levels.begin(), levels.end(), stored.level) == levels.end()) continue;
-    indices.push_back(stored.index);
-    const bool isLastOfSize = std::none_of(levels_.begin(), levels_.end(), [&](const auto& other) {
-      return other.format.width == stored.format.width &&
-             other.format.height == stored.format.height &&
-             std::find(levels.begin(), levels.end(), other.level) == levels.end();
-    });
-    for (size_t i = 0; i < file_->Structure().directories.size() && isLastOfSize; ++i)
-      if (IsMaskOf(*file_, i, stored.format, settings_.image.isInFile)) indices.push_back(i);
+  std::set<size_t> indices;
+  for (const unsigned level : levels) {
+    const StoredLevel* stored = Find(level);
+    if (!stored) continue;
+    indices.insert(stored->index);
+    for (const size_t mask : catalogue_->MasksOf(stored->index)) indices.insert(mask);
   }
-  std::sort(indices.begin(), indices.end());
-  indices.erase(std::unique(indices.begin(), indices.end()), indices.end());
-  return indices;
+  return {indices.begin(), indices.end()};
 }
 
 /// Takes directories out of the chain, by one link for those that follow one another. The last ones

@@ -57,6 +57,13 @@ LevelMetadata TiffLevelStore::MetadataFor(unsigned level, const Pending& pending
   return metadata;
 }
 
+/// Of a level that the file does not hold.
+Place TiffLevelStore::NewPlace(const PixelFormat& format) const {
+  const TiffStructure& structure = file_->Structure();
+  if (!catalogue_) return {structure.HeadLinkPosition(), 0};
+  return PlaceOfNew(structure, *catalogue_, settings_.image, format.width, format.height);
+}
+
 /// \param mask  of the level, complete; null for none
 void TiffLevelStore::AddDirectory(const Pending& pending, const LevelMetadata& metadata,
                                   const std::vector<uint32_t>& planes, const LevelBuild* mask) {
@@ -78,9 +85,7 @@ void TiffLevelStore::AddDirectory(const Pending& pending, const LevelMetadata& m
   }
   entries.push_back(TextEntry(TIFFTAG_GDAL_METADATA, ComposeLevelMetadata(metadata)));
   const PixelFormat& format = build.Coding().format;
-  Place place =
-      before ? PlaceOf(structure, before->index)
-             : PlaceOfNew(file_->File(), structure, settings_.image, format.width, format.height);
+  Place place = before ? PlaceOf(structure, before->index) : NewPlace(format);
   std::optional<uint64_t> strayMask;
   if (before && before->mask) {
     const TiffDirectory& there = structure.directories[*before->mask];

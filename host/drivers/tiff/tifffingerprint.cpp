@@ -8,6 +8,7 @@
 #include <tiff.h>
 
 #include "host/datasources/fingerprint.h"
+#include "host/drivers/tiff/file/catalogue.h"
 #include "host/drivers/tiff/structure.h"
 #include "host/drivers/tiff/tiffhandle.h"
 #include "host/services/text.h"
@@ -110,23 +111,6 @@ bool AddTiles(const PositionedFile& file, const TileTables& tables, Fingerprinte
   return true;
 }
 
-/// The mask of the file's first image, or null.
-const TiffDirectory* MaskOf(const PositionedFile& file, const TiffStructure& structure) {
-  const auto number = [&](const TiffDirectory& directory, uint16_t tag) {
-    return NumberOf(file, structure, directory, tag, 0);
-  };
-  const TiffDirectory& image = structure.directories[0];
-  for (size_t i = 1; i < structure.directories.size(); ++i) {
-    const TiffDirectory& directory = structure.directories[i];
-    const uint64_t subfile = number(directory, TIFFTAG_SUBFILETYPE);
-    if ((subfile & FILETYPE_MASK) == 0 || (subfile & FILETYPE_REDUCEDIMAGE) != 0) continue;
-    if (number(directory, TIFFTAG_IMAGEWIDTH) == number(image, TIFFTAG_IMAGEWIDTH) &&
-        number(directory, TIFFTAG_IMAGELENGTH) == number(image, TIFFTAG_IMAGELENGTH))
-      return &directory;
-  }
-  return nullptr;
-}
-
 }  // namespace
 
 std::string FingerprintOfTiff(const std::string& path, const std::stop_token& stop) {
@@ -139,8 +123,10 @@ std::string FingerprintOfTiff(const std::string& path, const std::stop_token& st
     fingerprint.Add(bytes.data(), bytes.size());
   }
   if (!AddTiles(file, TablesOf(file, structure, image), fingerprint, stop)) return {};
-  const TiffDirectory* mask = MaskOf(file, structure);
-  if (mask && !AddTiles(file, TablesOf(file, structure, *mask), fingerprint, stop)) return {};
+  const auto mask = Catalogue(file, structure, true).MaskOf(0);
+  if (mask &&
+      !AddTiles(file, TablesOf(file, structure, structure.directories[*mask]), fingerprint, stop))
+    return {};
   return fingerprint.Text();
 }
 

@@ -49,9 +49,11 @@ TiffLevelStore::~TiffLevelStore() {
 
 void TiffLevelStore::Reload() {
   levels_.clear();
+  catalogue_.reset();
   if (!file_->Exists()) return;
-  levels_ = FindLevels(file_->File(), file_->Structure(), settings_.image);
-  FindLevelMasks(file_->File(), file_->Structure(), settings_.image, levels_);
+  const TiffStructure& structure = file_->Structure();
+  catalogue_.emplace(file_->File(), structure, settings_.image.isInFile);
+  levels_ = FindLevels(file_->File(), structure, *catalogue_, settings_.image);
 }
 
 bool TiffLevelStore::HasReclaimableSpace() const {
@@ -160,6 +162,21 @@ std::vector<LevelDescription> TiffLevelStore::List() const {
   std::sort(list.begin(), list.end(),
             [](const LevelDescription& a, const LevelDescription& b) { return a.level < b.level; });
   return list;
+}
+
+std::vector<LevelDescription> TiffLevelStore::ListHidden() const {
+  const std::lock_guard lock(mutex_);
+  std::vector<LevelDescription> hidden;
+  for (const StoredLevel& level : levels_)
+    if (Find(level.level) != &level)
+      hidden.push_back(Describe(level, datasources::LevelStatus::kUnverified));
+  if (!catalogue_) return hidden;
+  for (const StoredLevel& level :
+       FindSubLevels(file_->File(), file_->Structure(), *catalogue_, settings_.image)) {
+    hidden.push_back(Describe(level, datasources::LevelStatus::kUnverified));
+    hidden.back().isInSubDirectory = true;
+  }
+  return hidden;
 }
 
 /// Compression and grid are the stored level's; what a directory does not tell is the image's.

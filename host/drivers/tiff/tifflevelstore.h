@@ -54,6 +54,7 @@ class TiffLevelStore final : public datasources::ILevelStore {
   ~TiffLevelStore() override;
 
   std::vector<datasources::LevelDescription> List() const override;
+  std::vector<datasources::LevelDescription> ListHidden() const override;
   void Create(unsigned level, const std::vector<unsigned>& channels,
               const std::string& method) override;
   std::unique_ptr<datasources::IRasterWriter> OpenWriter(
@@ -150,6 +151,7 @@ class TiffLevelStore final : public datasources::ILevelStore {
   void Store(unsigned level, Pending& pending, const std::vector<uint32_t>& planes,
              std::unique_ptr<LevelBuild> mask,
              const std::optional<datasources::ImageRecord>& image);
+  Place NewPlace(const PixelFormat& format) const;
   void AddDirectory(const Pending& pending, const LevelMetadata& metadata,
                     const std::vector<uint32_t>& planes, const LevelBuild* mask);
   StoredMask MaskBefore(unsigned level, const LevelBuild& mask);
@@ -166,6 +168,7 @@ class TiffLevelStore final : public datasources::ILevelStore {
   datasources::LevelOptions options_ = datasources::CurrentLevelOptions();
   mutable LevelFreshness freshness_;
   mutable std::optional<datasources::ImageStamp> kept_;  ///< of the last answer that was kept
+  std::optional<Catalogue> catalogue_;  ///< of the structure that `levels_` were found in
   std::vector<StoredLevel> levels_;
   std::map<unsigned, Pending> pending_;
   std::map<unsigned, std::vector<unsigned>> maskedChannels_;  ///< whose passes a mask has joined

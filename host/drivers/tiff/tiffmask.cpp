@@ -93,22 +93,6 @@ std::unique_ptr<IValidityReader> OpenTiffMask(const std::string& path, uint64_t 
   return reader;
 }
 
-std::optional<uint64_t> FindImageMask(const PositionedFile& file, const TiffStructure& structure) {
-  const auto& directories = structure.directories;
-  const auto number = [&](size_t index, uint16_t tag) {
-    return NumberOf(file, structure, directories[index], tag, 0);
-  };
-  for (size_t i = 1; i < directories.size(); ++i) {
-    const uint64_t subfile = number(i, TIFFTAG_SUBFILETYPE);
-    if ((subfile & (FILETYPE_MASK | FILETYPE_REDUCEDIMAGE)) == 0) break;  // another image
-    const bool isWhole = (subfile & FILETYPE_REDUCEDIMAGE) == 0;
-    if (isWhole && number(i, TIFFTAG_IMAGEWIDTH) == number(0, TIFFTAG_IMAGEWIDTH) &&
-        number(i, TIFFTAG_IMAGELENGTH) == number(0, TIFFTAG_IMAGELENGTH))
-      return directories[i].offset;
-  }
-  return std::nullopt;
-}
-
 std::unique_ptr<IValidityReader> OpenMaskBeside(const std::string& imageFile, unsigned width,
                                                 unsigned height) {
   const std::string path = MaskFileOf(imageFile);

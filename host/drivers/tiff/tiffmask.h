@@ -5,12 +5,10 @@
 
 #include <cstdint>
 #include <memory>
-#include <optional>
 #include <string>
 
 #include "host/datasources/levelstore.h"
 #include "host/datasources/validity.h"
-#include "host/drivers/tiff/structure.h"
 
 namespace orin::drivers {
 
@@ -19,9 +17,6 @@ namespace orin::drivers {
 /// \throws orin::Exception  it cannot be read, or holds several samples a pixel
 std::unique_ptr<datasources::IValidityReader> OpenTiffMask(const std::string& path,
                                                            uint64_t directoryOffset);
-
-/// The offset of the directory that is the mask of the file's first image, none without one.
-std::optional<uint64_t> FindImageMask(const PositionedFile& file, const TiffStructure& structure);
 
 /// A reader of the file `IMAGEFILE.msk` if it says how it applies, and to all channels alike. Null
 /// without one; the user is warned of a file that cannot serve.

@@ -15,6 +15,7 @@
 #include "host/datasources/validityreader.h"
 #include "host/drivers/common/auxiliaryfile.h"
 #include "host/drivers/tiff/declarednodata.h"
+#include "host/drivers/tiff/file/catalogue.h"
 #include "host/drivers/tiff/pixelreader.h"
 #include "host/drivers/tiff/tifffingerprint.h"
 #include "host/drivers/tiff/tifflevelstore.h"
@@ -121,7 +122,9 @@ TiffSource::TiffSource(std::string file, datasources::AccessMode access) : file_
 
 void TiffSource::FindMasks() {
   const PositionedFile file(file_, PositionedFile::Mode::kRead);
-  maskOffset_ = FindImageMask(file, ParseStructure(file));
+  const TiffStructure structure = ParseStructure(file);
+  if (const auto mask = Catalogue(file, structure, true).MaskOf(0))
+    maskOffset_ = structure.directories[*mask].offset;
   hasMaskBeside_ = OpenMaskBeside(file_, format_.width, format_.height) != nullptr;
 }
 

@@ -3,6 +3,7 @@
 #include <random>
 
 #include "host/drivers/tiff/appender.h"
+#include "host/drivers/tiff/file/levelfactor.h"
 #include "host/drivers/tiff/jpegquality.h"
 #include "host/drivers/tiff/leveldirectories.h"
 #include "host/drivers/tiff/levelmetadata.h"
