@@ -114,6 +114,62 @@ class Between(Replayed):
         self.check_states(True)
 
 
+class Rebuilt(Between):
+    """The same of levels that are built again by another method: other programs see the old level
+    or the new one, never channels of both, nor a mask without its pixels."""
+
+    def check_switches(self, *storing):
+        image = os.path.join(self.original, self.image)
+        self.assertRan(run(ARGUMENTS[0], image, *ARGUMENTS[1:]))
+        old = self.seen(image)
+        changes = self.record(*ARGUMENTS[:-1], "average", "--force", *storing)
+        new = self.seen(os.path.join(self.recorded, self.image))
+        for before, after in zip(old, new, strict=True):
+            self.assertFalse(self.are_same(before, after))
+        states = disklog.check_at_once(self, {
+            f"after {stop} calls": functools.partial(self.state, changes[:stop], old, new)
+            for stop in range(len(changes) + 1)})
+        self.assertEqual({("old", "old"), ("new", "old"), ("new", "new")}, set(states.values()))
+
+    @staticmethod
+    def are_same(one, other):
+        (pixels, mask), (other_pixels, other_mask) = one, other
+        if (mask is None) != (other_mask is None):
+            return False
+        return (pixels == other_pixels).all() and (mask is None or (mask == other_mask).all())
+
+    def state(self, changes, old, new):
+        """Which of the two each level is."""
+        with self.replay(changes) as image:
+            there = self.seen(image)
+            self.assertEqual(len(old), len(there))
+            found = []
+            for level, before, after in zip(there, old, new):
+                self.assertTrue(self.are_same(level, before) or self.are_same(level, after))
+                found.append("old" if self.are_same(level, before) else "new")
+            return tuple(found)
+
+    def test_with_a_mask_inside_the_image(self):
+        self.write_image("TIFF", "mask")
+        self.check_switches()
+
+    def test_with_a_mask_file(self):
+        self.write_image("TIFF", "msk")
+        self.check_switches("--co", "COMPRESS=LZW")  # another form: no tile is taken over
+
+    def test_with_alpha(self):
+        self.write_image("TIFF", "alpha")
+        self.check_switches()
+
+    def test_of_a_png_with_a_mask_file(self):
+        self.write_image("PNG", "msk")
+        self.check_switches()
+
+    def test_of_a_jpeg_with_a_mask_file(self):
+        self.write_image("JPEG", "msk")
+        self.check_switches()
+
+
 class Stopped(Replayed):
     """Ctrl-C and a kill in the middle of the second channel, found by the growing file."""
 
@@ -146,6 +202,23 @@ class Stopped(Replayed):
         self.assertEqual(-signal.SIGKILL, self.stop_by(signal.SIGKILL))
         self.assertEqual([], overview_sizes(self.file))
         self.assertEqual([], info(self.file)["levels"])
+
+    def test_readers_meanwhile_see_the_old_level_or_the_new_one(self):
+        self.assertRan(run("build", self.file, *ARGUMENTS[1:-3], "2", *ARGUMENTS[-2:]))
+        old = read_pixels(self.file, 0).tobytes()
+        process = subprocess.Popen(
+            [TOOL, "build", self.file, "--external", "--levels", "2", "--force", "--method",
+             "average"], stdout=subprocess.DEVNULL,
+            env=dict(os.environ, ORIN_PREFERENCES="/dev/null", OMP_NUM_THREADS="1"))
+        seen = []
+        while process.poll() is None:
+            seen.append(read_pixels(self.file, 0).tobytes())
+        self.assertEqual(0, process.returncode)
+        new = read_pixels(self.file, 0).tobytes()
+        self.assertNotEqual(old, new)
+        mixed = [pixels for pixels in seen if pixels not in (old, new)]
+        self.assertGreater(len(seen), 3)
+        self.assertEqual(0, len(mixed), f"{len(mixed)} of {len(seen)} reads")
 
     def test_a_stopped_build_leaves_the_finished_channel_and_its_mask(self):
         self.assertEqual(130, self.stop_by(signal.SIGINT))

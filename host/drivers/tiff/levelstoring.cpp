@@ -117,11 +117,12 @@ void TiffLevelStore::TidyMasks(std::optional<uint64_t> strayMask) {
 }
 
 /// Whether finished channels are kept back, and keeps them and their mask: other programs would
-/// show a level of which the rest is empty. What is kept back is lost when the program is killed.
+/// show a level of which the rest is empty, or of other pixels. What is kept back is lost when the
+/// program is killed.
 /// \param image  that they were computed from
-bool TiffLevelStore::Waits(unsigned level, Pending& pending, const std::vector<unsigned>& channels,
+bool TiffLevelStore::Waits(Pending& pending, const std::vector<unsigned>& channels,
                            const datasources::ImageRecord& image) const {
-  if (!pending.coding.format.planar || FindOurs(level)) return false;
+  if (!pending.coding.format.planar) return false;
   std::set<unsigned> all(pending.waiting.begin(), pending.waiting.end());
   all.insert(channels.begin(), channels.end());
   pending.waiting.assign(all.begin(), all.end());
@@ -131,9 +132,22 @@ bool TiffLevelStore::Waits(unsigned level, Pending& pending, const std::vector<u
   return pending.waiting.size() < settings_.image.samples;
 }
 
+/// Whether storing what waits would make other programs show channels of two computations together,
+/// instead of the whole level that the file holds: of those being rebuilt some are not finished.
+bool TiffLevelStore::WouldMix(unsigned level, const Pending& pending) const {
+  const StoredLevel* before = FindOurs(level);
+  if (!before || before->metadata.validity.find(kAbsent) != std::string::npos) return false;
+  const auto created = std::count(pending.channels.begin(), pending.channels.end(), true);
+  return pending.waiting.size() < static_cast<size_t>(created);
+}
+
 void TiffLevelStore::StoreWaiting(unsigned level) {
   const auto entry = pending_.find(level);
   if (entry == pending_.end() || entry->second.waiting.empty()) return;
+  if (WouldMix(level, entry->second)) {
+    const std::shared_ptr<LevelBuild> build = entry->second.build;
+    return GiveUp(level, *build);
+  }
   lastRead_ = entry->second.waitingSource;
   StoreFinished(level, entry->second, {}, datasources::ImageRecord(entry->second.waitingImage));
 }

@@ -224,10 +224,19 @@ std::unique_ptr<datasources::IRasterWriter> TiffLevelStore::OpenWriter(
   return std::make_unique<LevelWriter>(*this, file_->Path(), level, channels, format);
 }
 
+/// Whether any of the channels is finished and waits for others.
+bool TiffLevelStore::AnyWaits(unsigned level, const std::vector<unsigned>& channels) const {
+  const auto pending = pending_.find(level);
+  if (pending == pending_.end()) return false;
+  const std::vector<unsigned>& waiting = pending->second.waiting;
+  return std::find_first_of(waiting.begin(), waiting.end(), channels.begin(), channels.end()) !=
+         waiting.end();
+}
+
 std::unique_ptr<PixelReader> TiffLevelStore::OpenPixels(unsigned level,
                                                         const std::vector<unsigned>& channels) {
   const std::lock_guard lock(mutex_);
-  if (!Find(level)) StoreWaiting(level);
+  if (AnyWaits(level, channels)) StoreWaiting(level);
   const StoredLevel* stored = Find(level);
   if (!stored) Fail(_("%s: level %u is not finished and cannot be read."), level, "OpenPixels");
   if (!pending_.contains(level)) NoteSource(*stored, channels);
@@ -358,11 +367,11 @@ void TiffLevelStore::SetValid(unsigned level, const std::vector<unsigned>& chann
     if (const LevelBuild* mask = pending->second.build->mask.get(); mask && !mask->IsComplete(0))
       Fail(_("%s: level %u is not complete and cannot be marked valid."), level, "SetValid");
     const datasources::ImageRecord image = RecordOrGiveUp(level, pending->second);
-    if (!Waits(level, pending->second, channels, image))
+    if (!Waits(pending->second, channels, image))
       StoreFinished(level, pending->second, channels, image);
     return;
   }
-  if (!Find(level)) StoreWaiting(level);
+  if (AnyWaits(level, channels) || !Find(level)) StoreWaiting(level);
   if (file_->Exists()) CatchUp();
   MarkStored(level, channels, valid);
 }

@@ -32,9 +32,9 @@ std::unique_ptr<datasources::ILevelStore> OpenInternalLevels(
 
 /// A level appears in the file when it is complete: tiles first, then its directory, then the link
 /// to it, then its validity, each durable before the next. Until then it is pending here; a pending
-/// level that is given up leaves nothing behind. A new level of planes appears with all of its
-/// channels and their mask: finished ones wait for the others, as long as the level is the one
-/// being made.
+/// level that is given up leaves nothing behind. The channels of a level of planes, new or
+/// rebuilt, appear together with their mask: finished ones wait for the others, as long as the
+/// level is the one being made.
 ///
 /// Operations may be called from several threads.
 class TiffLevelStore final : public datasources::ILevelStore {
@@ -141,8 +141,10 @@ class TiffLevelStore final : public datasources::ILevelStore {
   std::vector<uint32_t> CompletePlanes(const LevelBuild& build) const;
   void RequireStored(const StoredLevel* stored, unsigned level,
                      const std::vector<unsigned>& channels) const;
-  bool Waits(unsigned level, Pending& pending, const std::vector<unsigned>& channels,
+  bool Waits(Pending& pending, const std::vector<unsigned>& channels,
              const datasources::ImageRecord& image) const;
+  bool WouldMix(unsigned level, const Pending& pending) const;
+  bool AnyWaits(unsigned level, const std::vector<unsigned>& channels) const;
   void StoreWaiting(unsigned level);
   void StoreAllWaitingBut(unsigned level);
   void StoreFinished(unsigned level, Pending& pending, const std::vector<unsigned>& channels,

@@ -138,6 +138,45 @@ TEST_F(SideCar, KeepsAFinishedChannelWhenTheNextOneFails) {
   EXPECT_EQ("10-", ValidityOf(LevelsOf(*OpenGeneric(file_)).at(0)));
 }
 
+TEST_F(SideCar, ChangesOnceWhenALevelIsRebuilt) {
+  BuildBeside(file_, kImage, 2);
+  const uint64_t before = DirectoriesOf(sideCar_).at(0).offset;
+  const auto dataset = OpenGeneric(file_);
+  for (unsigned channel = 1; channel <= 3; ++channel) {
+    Build(*dataset, kImage, {.level = 2, .method = "AVERAGE", .channels = {channel}});
+    const bool isLast = channel == 3;
+    EXPECT_EQ(isLast, DirectoriesOf(sideCar_).at(0).offset != before);
+    EXPECT_EQ(isLast ? "AVERAGE" : "NEAREST", LevelsOf(*OpenGeneric(file_)).at(0).method);
+    EXPECT_EQ("111", ValidityOf(LevelsOf(*dataset).at(0)));
+  }
+  EXPECT_EQ("111", ValidityOf(LevelsOf(*OpenGeneric(file_)).at(0)));
+}
+
+TEST_F(SideCar, HoldsTheOldLevelWhenARebuildStopsBetweenItsChannels) {
+  BuildBeside(file_, kImage, 2);
+  const uint64_t before = DirectoriesOf(sideCar_).at(0).offset;
+  {
+    const auto dataset = OpenGeneric(file_);
+    Build(*dataset, kImage, {.level = 2, .method = "AVERAGE", .channels = {1}});
+    const auto stopping = [](unsigned block) { return block < 2; };
+    Build(*dataset, kImage,
+          {.level = 2, .edge = 40, .channels = {2}, .goesOn = stopping, .marksValid = false});
+  }
+  EXPECT_EQ(before, DirectoriesOf(sideCar_).at(0).offset);
+  const auto level = LevelsOf(*OpenGeneric(file_)).at(0);
+  EXPECT_EQ("NEAREST", level.method);
+  EXPECT_EQ("001", ValidityOf(level));
+  EXPECT_EQ("", WrongTile(sideCar_, 0, LevelLayout(InPlanes(kImage), 2)));
+}
+
+TEST_F(SideCar, TakesOneRebuiltChannelWhenTheRunEnds) {
+  BuildBeside(file_, kImage, 2);
+  Build(*OpenGeneric(file_), kImage, {.level = 2, .method = "AVERAGE", .channels = {2}});
+  const auto level = LevelsOf(*OpenGeneric(file_)).at(0);
+  EXPECT_EQ("AVERAGE", level.method);
+  EXPECT_EQ("010", ValidityOf(level)) << "the others are of another method";
+}
+
 /// A build of level 2 that ends without any clean-up before its block `stop`.
 void KilledBuild(const std::string& file, unsigned stop) {
   const pid_t child = fork();
