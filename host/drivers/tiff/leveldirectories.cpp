@@ -98,9 +98,8 @@ Place PlaceOf(const TiffStructure& structure, size_t index) {
 Place PlaceOfNew(const TiffStructure& structure, const Catalogue& catalogue,
                  const ImageShape& image, uint32_t width, uint32_t height) {
   const auto& directories = structure.directories;
-  const size_t end = image.isInFile ? catalogue.EndOfFirstImage() : directories.size();
-  size_t index = image.isInFile ? 1 : 0;
-  for (; index < end; ++index) {
+  size_t index = image.isInFile ? catalogue.NewLevelsBegin() : 0;
+  for (; index < directories.size(); ++index) {
     const CatalogueEntry& entry = catalogue.At(index);
     const bool isSmaller = uint64_t{entry.width} * entry.height < uint64_t{width} * height;
     if (entry.kind == DirectoryKind::kLevel && isSmaller) break;

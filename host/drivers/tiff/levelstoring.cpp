@@ -3,6 +3,7 @@
 #include <algorithm>
 #include <set>
 
+#include "host/drivers/tiff/pagerecord.h"
 #include "host/drivers/tiff/tifflevelstore.h"
 
 namespace orin::drivers {
@@ -83,7 +84,9 @@ void TiffLevelStore::AddDirectory(const Pending& pending, const LevelMetadata& m
                      [&](const TilePlace& place) { return place.*table.field; });
     entries.push_back(NumbersEntry(table.tag, structure.isBig ? TIFF_LONG8 : TIFF_LONG, numbers));
   }
-  entries.push_back(TextEntry(TIFFTAG_GDAL_METADATA, ComposeLevelMetadata(metadata)));
+  std::string text = ComposeLevelMetadata(metadata);
+  if (settings_.image.isInFile && catalogue_->HasPages()) text = WithPage(std::move(text), 1);
+  entries.push_back(TextEntry(TIFFTAG_GDAL_METADATA, text));
   const PixelFormat& format = build.Coding().format;
   Place place = before ? PlaceOf(structure, before->index) : NewPlace(format);
   std::optional<uint64_t> strayMask;

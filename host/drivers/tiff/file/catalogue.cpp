@@ -9,6 +9,7 @@
 #include <tiff.h>
 
 #include "host/drivers/tiff/file/levelfactor.h"
+#include "host/drivers/tiff/pagerecord.h"
 
 namespace orin::drivers {
 namespace {
@@ -35,6 +36,7 @@ class Catalogue::Reader {
     for (size_t i = 0; i < structure_.directories.size(); ++i) Add(i, structure_.directories[i]);
     GiveMasksTheirLevels();
     catalogue.entries_ = std::move(entries_);
+    if (!pages_.empty()) catalogue.lastPage_ = pages_.back();
     catalogue.levels_ = std::move(levels_);
     if (holdsImage_) catalogue.subLevels_ = SubLevels(catalogue.entries_[0]);
   }
@@ -47,7 +49,7 @@ class Catalogue::Reader {
   }
   uint64_t Subfile(const TiffDirectory& directory) const;
   void Add(size_t index, const TiffDirectory& directory);
-  std::optional<size_t> ImageOfLevel(const CatalogueEntry& level);
+  std::optional<size_t> ImageOfLevel(const CatalogueEntry& level, const TiffDirectory& directory);
   std::optional<size_t> OwnerOfMask(size_t index, bool isReduced);
   void GiveMasksTheirLevels();
   std::vector<SubDirectory> SubLevels(const CatalogueEntry& image) const;
@@ -87,20 +89,22 @@ void Catalogue::Reader::Add(size_t index, const TiffDirectory& directory) {
     section_ = index;
   } else {
     added.kind = DirectoryKind::kLevel;
-    added.owner = ImageOfLevel(added);
+    added.owner = ImageOfLevel(added, directory);
     const bool isOfFirst = !holdsImage_ || added.owner == size_t{0};
     if (isOfFirst && levels_.size() < kMaxLevels) levels_.push_back(index);
   }
 }
 
-std::optional<size_t> Catalogue::Reader::ImageOfLevel(const CatalogueEntry& level) {
+std::optional<size_t> Catalogue::Reader::ImageOfLevel(const CatalogueEntry& level,
+                                                      const TiffDirectory& directory) {
   if (!holdsImage_) return std::nullopt;
   const bool fitsFirst = Fits(entries_[0], level);
   if (fitsFirst && ++candidates_ > kMaxLevels) return std::nullopt;
   if (!fitsFirst)
     return pages_.empty() || !Fits(entries_[pages_.back()], level) ? std::nullopt
                                                                    : std::optional(pages_.back());
-  for (auto page = pages_.rbegin(); page != pages_.rend(); ++page)
+  const bool isNamed = !pages_.empty() && PageNamedIn(file_, structure_, directory) == 1u;
+  for (auto page = pages_.rbegin(); !isNamed && page != pages_.rend(); ++page)
     if (Fits(entries_[*page], level)) return *page;
   return 0;
 }
@@ -177,12 +181,6 @@ std::vector<size_t> Catalogue::MasksOf(size_t index) const {
 std::optional<size_t> Catalogue::MaskOf(size_t index) const {
   const std::vector<size_t> masks = MasksOf(index);
   return masks.empty() ? std::nullopt : std::optional(masks.front());
-}
-
-size_t Catalogue::EndOfFirstImage() const {
-  for (size_t i = 1; i < entries_.size(); ++i)
-    if (entries_[i].kind == DirectoryKind::kImage) return i;
-  return entries_.size();
 }
 
 }  // namespace orin::drivers

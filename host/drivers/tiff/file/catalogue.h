@@ -35,10 +35,11 @@ struct SubDirectory {
 
 /// Directories are named by their index in the chain.
 ///
-/// A level belongs to the first image where it fits that one and no page before the level;
-/// otherwise to the nearest page before it that it fits. A mask belongs to what stands right before
-/// it and has its size; else a whole one to the last image before it, and a reduced one to the
-/// first level of its size behind that image, those without a mask before others.
+/// A level belongs to the first image where it fits that one and either no page before the level,
+/// or its record names that image; otherwise to the nearest page before it that it fits. A mask
+/// belongs to what stands right before it and has its size; else a whole one to the last image
+/// before it, and a reduced one to the first level of its size behind that image, those without a
+/// mask before others.
 class Catalogue {
  public:
   /// \param holdsImage  the first directory is an image; else all images are levels of one that is
@@ -54,9 +55,11 @@ class Catalogue {
   std::optional<size_t> MaskOf(size_t index) const;
   /// All of them.
   std::vector<size_t> MasksOf(size_t index) const;
-  /// Where the images of the file that are not the first one begin; the number of directories where
-  /// there are none.
-  size_t EndOfFirstImage() const;
+  /// Whether there are images behind the first one.
+  bool HasPages() const { return lastPage_ != 0; }
+  /// Index from which on new levels of the first image stand: behind it or, where other programs
+  /// count the directories as pages, behind the last page.
+  size_t NewLevelsBegin() const { return lastPage_ + 1; }
   /// Reduced images inside the first image's directory (SUBIFD) that fit it.
   const std::vector<SubDirectory>& SubLevels() const { return subLevels_; }
 
@@ -66,6 +69,7 @@ class Catalogue {
   std::vector<CatalogueEntry> entries_;
   std::vector<size_t> levels_;
   std::vector<SubDirectory> subLevels_;
+  size_t lastPage_ = 0;  ///< its index; 0 where there is none
 };
 
 }  // namespace orin::drivers

@@ -68,14 +68,14 @@ TEST_F(Chain, StandsLargestFirstWhateverWasBuiltFirst) {
   } while (std::next_permutation(order.begin(), order.end()));
 }
 
-TEST_F(Chain, HasLevelsBehindTheImagesMaskAndBeforeOtherPages) {
+TEST_F(Chain, HasLevelsBehindTheLastPageWhoseNumberStays) {
   AddDirectory(file_, Sized(401, 301), FILETYPE_MASK);
   AddDirectory(file_, Sized(120, 90), FILETYPE_PAGE);
   AddDirectory(file_, Sized(60, 45), FILETYPE_REDUCEDIMAGE);  // of the page
   Build(file_, kImage, {.level = 4});
   Build(file_, kImage, {.level = 2});
-  EXPECT_EQ("401x301 401x301 200x150 100x75 120x90 60x45", SizesOf(file_));
-  EXPECT_EQ((std::vector<uint32_t>{0, FILETYPE_MASK, 1, 1, FILETYPE_PAGE, 1}), SubfilesOf(file_));
+  EXPECT_EQ("401x301 401x301 120x90 200x150 100x75 60x45", SizesOf(file_));
+  EXPECT_EQ((std::vector<uint32_t>{0, FILETYPE_MASK, FILETYPE_PAGE, 1, 1, 1}), SubfilesOf(file_));
   EXPECT_EQ((std::vector<unsigned>{2, 4}), FactorsOf(file_));
 }
 
