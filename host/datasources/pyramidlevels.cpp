@@ -13,6 +13,9 @@ std::vector<unsigned int> ComputePyramidLevel(double width, double height, unsig
   for (uint64_t before = 1; side / static_cast<double>(before) > kSmallEnough;) {
     before *= factor;
     if (before > std::numeric_limits<unsigned int>::max()) break;
+    const auto level = static_cast<double>(before);
+    // Of a factor beyond both sides one level is asked for, which no image has.
+    if (level <= side && level > std::min(width, height)) break;
     levels.push_back(static_cast<unsigned int>(before));
   }
   return levels;
