@@ -1,128 +1,45 @@
 // SPDX-License-Identifier: MIT
 #include "apps/orin-overviews/build.h"
 
-#include <algorithm>
 #include <filesystem>
 #include <memory>
 #include <system_error>
 
-#include "apps/orin-overviews/buildplan.h"
+#include "apps/orin-overviews/buildnotices.h"
+#include "apps/orin-overviews/buildprogress.h"
 #include "apps/orin-overviews/buildreport.h"
 #include "apps/orin-overviews/interruption.h"
-#include "apps/orin-overviews/numberlist.h"
 #include "apps/orin-overviews/progressdisplay.h"
+#include "apps/orin-overviews/terminaltext.h"
 #include "host/datasources/datasetmanager.h"
-#include "host/services/counter.h"
 #include "host/services/exception.h"
 #include "host/services/text.h"
-#include "host/services/warning.h"
-#include "processes/overviews/createoverviews.h"
 #include "processes/overviews/levelplanning.h"
-#include "processes/overviews/statusqueries.h"
 
 namespace orin::app {
 namespace {
 
-CreateFileOverviews MakeJob(const BuildOptions& options, const std::string& file) {
-  CreateFileOverviews job(file, options.channels);
-  if (!options.levels.empty()) job.SetPyramidLevels(options.levels, options.force);
-  else
-    job.SetPyramidFactor(options.factor ? options.factor : GetDefaultDecimationLevels(),
-                         options.force);
-  job.SetPyramidType(options.method);
-  if (options.placement != Placement::kAutomatic)
-    job.SaveToKvx(options.placement == Placement::kExternal);
-  job.ShowProgress(true);
-  return job;
-}
+using datasources::LevelPlace;
+using datasources::LevelSite;
+using overviews::BuildEnd;
+using overviews::BuildPlan;
+using overviews::BuildRequest;
+using overviews::BuildResult;
+using overviews::RasterFacts;
 
-/// What one run answered.
-struct Outcome {
-  bool built = false;
-  std::vector<unsigned> warningLines;  ///< source lines of the run's own warnings
-};
-
-/// Connects the library's progress and warnings with the tool for the length of one run.
-class RunSinks {
- public:
-  RunSinks(ProgressReporter& reporter, const Interruption& interruption, Console& console,
-           const std::string& file, Outcome& outcome) {
-    progress_ = tarn::Counter::SetSink([&](float fraction, const std::string* message) {
-      reporter.Report(fraction, message != nullptr);
-      return !interruption.Requested();
-    });
-    warnings_ = tarn::Warning::SetSink([&](const tarn::Report& report) {
-      if (report.sourceFile == kRunSource) outcome.warningLines.push_back(report.line);
-      console.Error(AfterFileName(file, report.message));
-    });
-  }
-  ~RunSinks() {
-    tarn::Counter::SetSink(std::move(progress_));
-    tarn::Warning::SetSink(std::move(warnings_));
-  }
-  RunSinks(const RunSinks&) = delete;
-  RunSinks& operator=(const RunSinks&) = delete;
-
- private:
-  static constexpr char kRunSource[] = "processes/overviews/createoverviews";
-
-  tarn::ProgressSink progress_;
-  tarn::ReportSink warnings_;
-};
-
-Outcome RunJob(CreateFileOverviews& job, const BuildPlan& plan, const BuildOptions& options,
-               const std::string& file, const Interruption& interruption, Console& console) {
-  Outcome outcome;
-  const auto display = MakeProgressDisplay(console, file, options.quiet);
-  ProgressReporter reporter(ProgressModel(plan.building, plan.report), *display);
-  const RunSinks sinks(reporter, interruption, console, file, outcome);
-  outcome.built = job.Generate();
-  reporter.Finish(outcome.built);
-  return outcome;
-}
-
-/// Why the channels asked for cannot be treated; empty when they can.
-std::string ChannelProblem(const CreateFileOverviews& job, const BuildPlan& plan,
-                           const BuildOptions& options) {
-  if (!job.ValidChannelList())
-    return FormatString(_("--channels names %s, but the file's channels are 1 to %u."),
-                        JoinNumbers(options.channels).c_str(), plan.channelCount);
-  for (const unsigned channel : options.channels)
-    if (std::binary_search(plan.bitChannels.begin(), plan.bitChannels.end(), channel))
-      return FormatString(
-          _("channel %u is a mask of one bit, which has no levels. Leave it out of --channels."),
-          channel);
-  return "";
-}
-
-/// Warns of a method that makes values which the image does not hold, where they mean something.
-void WarnOfBlending(const BuildPlan& plan, const BuildOptions& options, const std::string& file,
-                    Console& console) {
-  const auto method = options.method == ResampleInvalid ? GetDefaultPyramidType() : options.method;
-  const model::Method* const row = model::FindMethod(method);
-  if (row && row->blends && plan.holdsClasses && !plan.building.empty())
-    console.Warning(AfterFileName(file, BlendedClassesText()));
-}
-
-/// The code of a run that failed; says what is finished and what to do.
-ExitCode ReportFailure(const Outcome& outcome, const BuildPlan& plan, const BuildOptions& options,
-                       const std::string& file, bool interrupted, Console& console) {
-  const LevelState state = LookAtLevels(plan, options, file);
-  if (interrupted && outcome.warningLines.empty()) {
-    console.Error(AfterFileName(file, InterruptedText(state, options)));
-    return kInterrupted;
-  }
-  const unsigned line = outcome.warningLines.empty() ? 0 : outcome.warningLines.front();
-  if (line == 0) console.Error(AfterFileName(file, _("The levels could not be built.")));
-  const std::string advice = AdviceAfterFailure(line, state, options);
-  if (!advice.empty()) console.Error(AfterFileName(file, advice));
-  return CodeOfWarning(line);
-}
-
-/// An image beside which the levels go is not opened for writing.
-void RefuseUpdatesFor(const BuildOptions& options) {
-  datasources::DatasetManager::GetInstance()->RefuseUpdates(options.placement ==
-                                                            Placement::kExternal);
+BuildRequest RequestOf(const BuildOptions& options) {
+  BuildRequest request;
+  request.channels = options.channels;
+  request.levels = options.levels;
+  request.factor = options.factor ? options.factor : GetDefaultDecimationLevels();
+  if (options.method != ResampleInvalid) request.method = options.method;
+  request.usualMethod =
+      options.usualMethod != ResampleInvalid ? options.usualMethod : GetDefaultPyramidType();
+  if (options.placement == Placement::kInternal) request.place = LevelPlace::kInternal;
+  if (options.placement == Placement::kExternal) request.place = LevelPlace::kSideCar;
+  request.storing = options.storing;
+  request.force = options.force;
+  return request;
 }
 
 /// True also for two names of one file.
@@ -131,89 +48,127 @@ bool IsSameFile(const std::string& one, const std::string& other) {
   return one == other || (std::filesystem::equivalent(one, other, unknown) && !unknown);
 }
 
-/// The plan where its levels fit: beside a file that could not hold them, if the user leaves the
-/// choice. \throws orin::Exception  they fit nowhere, or not where the user wants them
-BuildPlan PlanWithRoom(BuildOptions& options, const std::string& file, Console& console) {
-  BuildPlan plan = PlanBuild(options, file);
-  if (!plan.room.obstacle.empty() && options.placement == Placement::kAutomatic &&
-      IsSameFile(plan.room.file, file)) {
-    const std::string reason = plan.room.obstacle;
-    options.placement = Placement::kExternal;
-    RefuseUpdatesFor(options);
-    plan = PlanBuild(options, file);
-    if (!plan.building.empty())
-      console.Notice(AfterFileName(file, reason + " " + _("They go to a file beside it instead.")));
-  }
-  datasources::RequireRoom(plan.room);
-  return plan;
+/// One file, opened once: plan, build and summary.
+class FileBuild {
+ public:
+  FileBuild(LevelSite& site, const BuildOptions& options, const Interruption& interruption,
+            Console& console)
+      : site_(site),
+        options_(options),
+        interruption_(interruption),
+        console_(console),
+        request_(RequestOf(options)),
+        facts_(overviews::FactsOf(site, request_.storing)) {}
+
+  /// \throws orin::Exception  the levels fit nowhere, or not where the user wants them
+  ExitCode Run();
+
+ private:
+  void Error(const std::string& text) { console_.Error(AfterFileName(site_.File(), text)); }
+  void Notice(const std::string& text) { console_.Notice(AfterFileName(site_.File(), text)); }
+  void Result(const std::string& text) { console_.Result(AfterFileName(site_.File(), text)); }
+
+  void Plan();
+  datasources::LevelRoom Space();
+  void TellBefore();
+  BuildResult Build();
+  ExitCode ReportEnd(const BuildResult& result);
+
+  LevelSite& site_;
+  const BuildOptions& options_;
+  const Interruption& interruption_;
+  Console& console_;
+  BuildRequest request_;
+  RasterFacts facts_;
+  BuildPlan plan_;
+  bool blursAlpha_ = false;
+};
+
+/// What the levels to be built take.
+datasources::LevelRoom FileBuild::Space() {
+  std::vector<unsigned> levels;
+  for (const auto& planned : plan_.building) levels.push_back(planned.level);
+  const datasources::ILevelStore* store = site_.LevelsIn(plan_.place);
+  return store && !levels.empty() ? store->RoomFor(levels, plan_.channels)
+                                  : datasources::LevelRoom();
 }
 
-/// \param options  those of the command line; the placement is decided here
-ExitCode BuildFile(BuildOptions options, const std::string& file, const Interruption& interruption,
-                   Console& console) {
-  const BuildPlan plan = PlanWithRoom(options, file, console);
-  CreateFileOverviews job = MakeJob(options, file);
-  if (const std::string problem = ChannelProblem(job, plan, options); !problem.empty()) {
-    console.Error(AfterFileName(file, problem));
-    return kWrongUsage;
+/// Plans where the levels fit: beside a file that could not hold them, if the user leaves the
+/// choice.
+void FileBuild::Plan() {
+  plan_ = overviews::PlanBuild(facts_, request_);
+  if (plan_.fault != overviews::Fault::kNone) return;
+  datasources::LevelRoom space = Space();
+  if (!space.obstacle.empty() && !request_.place && IsSameFile(space.file, site_.File())) {
+    const std::string reason = space.obstacle;
+    request_.place = LevelPlace::kSideCar;
+    plan_ = overviews::PlanBuild(facts_, request_);
+    space = Space();
+    if (!plan_.building.empty()) Notice(reason + " " + _("They go to a file beside it instead."));
   }
-  if (plan.requested.empty() || plan.channels.empty()) {
-    console.Result(file + ": " + NothingToDoText(plan));
-    return kDone;
-  }
-  if (!options.force)
-    for (const PlannedLevel& planned : plan.building)
-      if (planned.empty) console.Notice(AfterFileName(file, LeftOutText(plan, planned.level)));
-  if (const std::string stale = StaleText(plan); !stale.empty())
-    console.Notice(AfterFileName(file, stale));
-  WarnOfBlending(plan, options, file, console);
-  if (plan.room.blursAlpha) console.Warning(AfterFileName(file, BlurredAlphaText()));
-  const Outcome outcome = RunJob(job, plan, options, file, interruption, console);
-  if (!outcome.built)
-    return ReportFailure(outcome, plan, options, file, interruption.Requested(), console);
-  const LevelState state = LookAtLevels(plan, options, file);
-  console.Result(file + ": " + SummaryText(plan, state));
-  if (const std::string hidden = HiddenLevelsText(state); !hidden.empty())
-    console.Notice(AfterFileName(file, hidden));
-  return kDone;
+  datasources::RequireRoom(space);
+  blursAlpha_ = space.blursAlpha;
 }
 
-/// Levels that are to stand inside need a file that takes them. The run would say that it does not;
-/// only the file's driver says why.
-/// \throws orin::Exception  with its reason
-void RequireRoomInside(datasources::IDataset& dataset, const std::string& file) {
-  if (dataset.GetAccessMode() != datasources::kReadOnly || !SupportsInternalOverviews(&dataset))
-    return;
-  try {
-    const std::unique_ptr<datasources::IDataset> forUpdate(
-        datasources::DatasetManager::GetInstance()->Open(file, datasources::kUpdate));
-  } catch (const Exception& reason) {
-    const std::string advice =
-        _("Use --external instead of --internal: the levels go to a file beside it.");
-    throw Exception(reason.GetMessage() + " " + advice, "apps/orin-overviews/build",
-                    "orin::app::RequireRoomInside", 0);
+void FileBuild::TellBefore() {
+  for (const std::string& text : NoticesOf(plan_, request_, facts_, site_.File())) Notice(text);
+  for (const std::string& text : WarningsOf(plan_, facts_, blursAlpha_))
+    console_.Warning(AfterFileName(site_.File(), text));
+}
+
+BuildResult FileBuild::Build() {
+  if (plan_.building.empty()) return {};
+  const auto dataset = site_.DatasetFor(plan_.place);
+  const auto display = MakeProgressDisplay(console_, site_.File(), options_.quiet);
+  BuildProgress progress(*display, interruption_, console_, site_.File(),
+                         PlaceText(plan_.place, site_.File() + ".ovr"));
+  const BuildResult result = overviews::ExecuteBuild(*dataset, plan_, progress);
+  display->Clear();
+  return result;
+}
+
+ExitCode FileBuild::ReportEnd(const BuildResult& result) {
+  const LevelState state = StateOf(site_, plan_);
+  switch (result.end) {
+    case BuildEnd::kCancelled:
+      Error(InterruptedText(state, request_.force));
+      return kInterrupted;
+    case BuildEnd::kFailed:
+      Error(result.reason);
+      if (const std::string advice = RetryText(state, request_.force); !advice.empty())
+        Error(advice);
+      return kCannotBuild;
+    case BuildEnd::kComplete:
+      break;
   }
+  Result(SummaryText(plan_, facts_, state));
+  if (const std::string both = BothPlacesText(state); !both.empty() && !plan_.building.empty())
+    Notice(both);
+  for (const unsigned level : plan_.empty) Error(EmptyLevelText(level, facts_));
+  return plan_.empty.empty() ? kDone : kWrongUsage;
 }
 
-/// Opens the file to see that it can be built, and closes it: space is given back only where nobody
-/// has the file open, this program included.
-/// \param code  receives what a failure means
-/// \throws orin::Exception  it cannot be opened, or takes no levels inside where they must go
-void RequireFile(const BuildOptions& options, const std::string& file, ExitCode& code) {
-  code = kCannotOpen;
-  const auto dataset = OpenForBuild(file, options.placement);
-  code = kCannotBuild;
-  if (options.placement == Placement::kInternal) RequireRoomInside(*dataset, file);
+ExitCode FileBuild::Run() {
+  Plan();
+  if (plan_.fault != overviews::Fault::kNone) {
+    Error(FaultText(plan_, facts_, site_));
+    return CodeOf(plan_.fault);
+  }
+  TellBefore();
+  return ReportEnd(Build());
 }
 
-/// The same as BuildFile with every failure reported.
+/// The same with every failure reported.
 ExitCode TryFile(const BuildOptions& options, const std::string& file,
                  const Interruption& interruption, Console& console) {
-  ExitCode code = kCannotBuild;
-  RefuseUpdatesFor(options);
+  ExitCode code = kCannotOpen;
   try {
-    RequireFile(options, file, code);
-    return BuildFile(options, file, interruption, console);
+    // An image beside which the levels go is not opened for writing.
+    const auto access =
+        options.placement == Placement::kExternal ? datasources::kReadOnly : datasources::kUpdate;
+    const auto site = datasources::DatasetManager::GetInstance()->OpenSite(file, access);
+    code = kCannotBuild;
+    return FileBuild(*site, options, interruption, console).Run();
   } catch (const datasources::OptionException& error) {
     console.Error(AfterFileName(file, error.GetMessage()));
     code = kWrongUsage;
@@ -229,7 +184,6 @@ ExitCode TryFile(const BuildOptions& options, const std::string& file,
 
 ExitCode RunBuild(const BuildOptions& options, Console& console) {
   const Interruption interruption;
-  datasources::SetLevelOptions(options.storing);
   ExitCode result = kDone;
   for (size_t i = 0; i < options.files.size(); ++i) {
     if (interruption.Requested()) return kInterrupted;

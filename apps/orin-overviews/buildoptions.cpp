@@ -2,6 +2,7 @@
 #include "apps/orin-overviews/buildoptions.h"
 
 #include "apps/orin-overviews/numberlist.h"
+#include "host/services/environment.h"
 #include "host/services/text.h"
 
 namespace orin::app {
@@ -41,6 +42,12 @@ std::string ReadMethod(const std::string& text, QRTOverviewResampleType& method)
                       PyramidTypeNames().c_str());
 }
 
+/// What counts where neither the command line nor the file's levels name a method.
+void ReadEnvironment(BuildOptions& options) {
+  const std::string name = core::QRTGetEnvironmentVariable("ORIN_OVERVIEW_METHOD");
+  if (!name.empty()) options.usualMethod = GetPyramidType(name);
+}
+
 /// Reads every KEY=VALUE.
 void AddStoring(CLI::App& command, datasources::LevelOptions& storing) {
   command
@@ -59,9 +66,9 @@ void AddStoring(CLI::App& command, datasources::LevelOptions& storing) {
       ->type_name(_("KEY=VALUE"));
 }
 
-/// With --force levels take the form asked for, which is one for all channels of a level.
+/// Levels take the form asked for, which is one for all channels of a level.
 void FinishStoring(BuildOptions& options) {
-  options.storing.restores = options.force;
+  options.storing.restores = options.storing.SayCoding();
   if (options.force && options.storing.SayCoding() && !options.channels.empty())
     throw CLI::ValidationError(
         "--co", _("cannot be used together with --force and --channels: all channels of a level "
@@ -87,6 +94,7 @@ CLI::App* AddBuildCommand(CLI::App& app, BuildOptions& options) {
       [&](const std::string& text) { return ReadFactor(text, options.factor); });
   AddText(*command, "--method", _("METHOD"), PyramidTypeNames(),
           [&](const std::string& text) { return ReadMethod(text, options.method); });
+  ReadEnvironment(options);
   AddText(*command, "--channels", _("LIST"), _("Channels to treat, such as 1,3-5"),
           [&](const std::string& text) { return ReadList(ParseChannels(text), options.channels); });
   const auto* internal = command->add_flag_callback(

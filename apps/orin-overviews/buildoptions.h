@@ -15,10 +15,11 @@ enum class Placement { kAutomatic, kInternal, kExternal };
 
 struct BuildOptions {
   std::vector<std::string> files;
-  std::vector<unsigned> levels;                      ///< empty: the whole pyramid of `factor`
-  unsigned factor = 0;                               ///< 2 or 3; 0: the user's preference
-  QRTOverviewResampleType method = ResampleInvalid;  ///< ResampleInvalid: the user's preference
-  std::vector<unsigned> channels;                    ///< empty: all that are wider than one bit
+  std::vector<unsigned> levels;                           ///< empty: the whole pyramid of `factor`
+  unsigned factor = 0;                                    ///< 2 or 3; 0: the user's preference
+  QRTOverviewResampleType method = ResampleInvalid;       ///< ResampleInvalid: none is named
+  QRTOverviewResampleType usualMethod = ResampleInvalid;  ///< of the environment; likewise
+  std::vector<unsigned> channels;  ///< empty: all that are wider than one bit
   Placement placement = Placement::kAutomatic;
   datasources::LevelOptions storing;  ///< how new levels are stored
   bool force = false;

@@ -10,43 +10,55 @@
 namespace orin::app {
 namespace {
 
-/// Lines at which a run reports, see the messages there.
-enum WarningLine : unsigned {
-  kChannelOutside = 609,
-  kLevelTooSmall = 625,
-  kLevelLargerThanImage = 641,
-  kFormatHoldsNoLevels = 658,
-  kFileIsReadOnly = 670,
-  kComplexNotSupported = 698,
-  kRunFailed = 913,
-};
+using datasources::LevelDescription;
+using datasources::LevelPlace;
+using datasources::LevelStatus;
+using overviews::BuildPlan;
+using overviews::RasterFacts;
 
-/// The levels that this run built: valid now and not kept.
-std::vector<unsigned> BuiltLevels(const BuildPlan& plan, const LevelState& state) {
-  std::vector<unsigned> built;
-  for (const unsigned level : state.valid)
-    if (std::find(plan.kept.begin(), plan.kept.end(), level) == plan.kept.end())
-      built.push_back(level);
-  return built;
-}
-
-std::string PlaceText(const datasources::LevelDescription& level) {
-  return level.place == datasources::LevelPlace::kInternal
-             ? std::string(_("inside the file"))
-             : FormatString(_("in %s"), level.file.c_str());
+const LevelDescription* FindIn(const std::vector<LevelDescription>& levels, unsigned level) {
+  const auto found = std::find_if(levels.begin(), levels.end(),
+                                  [&](const LevelDescription& l) { return l.level == level; });
+  return found == levels.end() ? nullptr : &*found;
 }
 
 /// "already up to date: 2; kept unverified: 4" as far as there are such levels.
-std::string KeptText(const BuildPlan& plan) {
+std::string KeptText(const BuildPlan& plan, const RasterFacts& facts) {
+  const LevelState before{{}, {}, facts.inside.levels, facts.beside.levels};
   std::vector<unsigned> verified;
-  std::set_difference(plan.kept.begin(), plan.kept.end(), plan.unverified.begin(),
-                      plan.unverified.end(), std::back_inserter(verified));
+  std::vector<unsigned> unverified;
+  for (const unsigned level : plan.kept) {
+    const LevelDescription* stored = before.Find(level, plan.place);
+    const bool isProved = stored && stored->status != LevelStatus::kUnverified;
+    (isProved ? verified : unverified).push_back(level);
+  }
   std::string text;
   if (!verified.empty())
     text = FormatString(_("already up to date: %s"), JoinNumbers(verified).c_str());
-  if (plan.unverified.empty()) return text;
+  if (unverified.empty()) return text;
   return text + (text.empty() ? "" : "; ") +
-         FormatString(_("kept unverified: %s"), JoinNumbers(plan.unverified).c_str());
+         FormatString(_("kept unverified: %s"), JoinNumbers(unverified).c_str());
+}
+
+/// "2, 4 (AVERAGE, inside the file); 8 (MODE, inside the file)"
+std::string BuiltText(const BuildPlan& plan, const LevelState& state) {
+  std::string text;
+  std::vector<unsigned> run;
+  std::string manner;
+  const auto flush = [&] {
+    if (!run.empty()) text += (text.empty() ? "" : "; ") + JoinNumbers(run) + " (" + manner + ")";
+    run.clear();
+  };
+  for (const overviews::PlannedLevel& planned : plan.building) {
+    const LevelDescription* level = state.Find(planned.level, plan.place);
+    if (!level) continue;
+    const std::string now = level->method + ", " + PlaceText(level->place, level->file);
+    if (now != manner) flush();
+    manner = now;
+    run.push_back(planned.level);
+  }
+  flush();
+  return text;
 }
 
 /// "Levels finished: 2, 4; still to do: 8." as far as there are such levels.
@@ -60,120 +72,76 @@ std::string StateText(const LevelState& state) {
                       JoinNumbers(state.unfinished).c_str());
 }
 
-std::string ContinueText(const BuildOptions& options) {
-  return options.force ? _("The same command without --force continues there.")
-                       : _("The same command continues there.");
-}
-
-/// After a failure, which comes back unless its cause goes.
-std::string RetryText(const BuildOptions& options) {
-  return options.force
-             ? _("When the cause is removed, the same command without --force continues there.")
-             : _("When the cause is removed, the same command continues there.");
+std::vector<unsigned> FactorsOf(const std::vector<LevelDescription>& levels) {
+  std::vector<unsigned> factors;
+  for (const LevelDescription& level : levels) factors.push_back(level.level);
+  return factors;
 }
 
 }  // namespace
 
-std::string AfterFileName(const std::string& file, const std::string& text) {
-  const std::string name = file + ": ";
-  std::string lines;
-  for (size_t start = 0; start < text.size();) {
-    const size_t end = std::min(text.find('\n', start), text.size());
-    const std::string line = text.substr(start, end - start);
-    start = end + 1;
-    if (line.empty()) continue;
-    if (!lines.empty()) lines += '\n';
-    lines += line.compare(0, name.size(), name) == 0 ? line : name + line;
-  }
-  return lines;
+const LevelDescription* LevelState::Find(unsigned level, LevelPlace place) const {
+  if (place == LevelPlace::kInternal) return FindIn(inside, level);
+  const LevelDescription* stored = FindIn(beside, level);
+  return stored ? stored : FindIn(inside, level);
 }
 
-std::string SummaryText(const BuildPlan& plan, const LevelState& state) {
-  const std::vector<unsigned> built = BuiltLevels(plan, state);
-  if (built.empty()) return NothingToDoText(plan);
-  const auto level = std::find_if(state.descriptions.begin(), state.descriptions.end(),
-                                  [&](const auto& l) { return l.level == built.front(); });
-  std::string text = FormatString(_("levels built: %s (%s, %s)"), JoinNumbers(built).c_str(),
-                                  level->method.c_str(), PlaceText(*level).c_str());
-  if (!plan.kept.empty()) text += "; " + KeptText(plan);
+LevelState StateOf(datasources::LevelSite& site, const BuildPlan& plan) {
+  LevelState state{{},
+                   {},
+                   overviews::LevelsIn(site, LevelPlace::kInternal),
+                   overviews::LevelsIn(site, LevelPlace::kSideCar)};
+  for (const unsigned level : plan.wanted) {
+    const LevelDescription* stored = state.Find(level, plan.place);
+    const bool isValid = stored && datasources::HoldsForAll(stored->validChannels, plan.channels);
+    (isValid ? state.valid : state.unfinished).push_back(level);
+  }
+  return state;
+}
+
+std::string SummaryText(const BuildPlan& plan, const RasterFacts& facts, const LevelState& state) {
+  if (plan.building.empty()) return NothingToDoText(plan, facts);
+  std::string text = FormatString(_("levels built: %s"), BuiltText(plan, state).c_str());
+  if (!plan.kept.empty()) text += "; " + KeptText(plan, facts);
   return text;
 }
 
-std::string NothingToDoText(const BuildPlan& plan) {
+std::string NothingToDoText(const BuildPlan& plan, const RasterFacts& facts) {
   if (plan.channels.empty())
     return _("nothing to do: all channels are masks of one bit, which have no levels");
-  if (!plan.kept.empty()) return FormatString(_("nothing to do; %s"), KeptText(plan).c_str());
-  if (!plan.building.empty())
+  if (!plan.kept.empty())
+    return FormatString(_("nothing to do; %s"), KeptText(plan, facts).c_str());
+  if (!plan.empty.empty())
     return _("nothing to do: every level asked for is larger than the image");
-  return FormatString(_("nothing to do: %u x %u pixels need no levels"), plan.width, plan.height);
+  return FormatString(_("nothing to do: %u x %u pixels need no levels"), facts.width, facts.height);
 }
 
-std::string StaleText(const BuildPlan& plan) {
-  if (plan.stale.empty()) return "";
-  return FormatString(_("the image was changed after these levels were built: %s."),
-                      JoinNumbers(plan.stale).c_str());
+std::string BothPlacesText(const LevelState& state) {
+  if (state.inside.empty() || state.beside.empty()) return "";
+  return FormatString(
+      _("Levels stand inside the file (%s) and in %s (%s). Other programs read those inside only."),
+      JoinNumbers(FactorsOf(state.inside)).c_str(), state.beside.front().file.c_str(),
+      JoinNumbers(FactorsOf(state.beside)).c_str());
 }
 
-std::string LeftOutText(const BuildPlan& plan, unsigned level) {
-  return FormatString(_("level %u is left out: of %u x %u pixels nothing would remain."), level,
-                      plan.width, plan.height);
-}
-
-std::string BlendedClassesText() {
-  return _(
-      "the pixels are numbers of palette colours or classes: this method invents colours and "
-      "classes that the image does not hold. Use --method mode or --method nearest.");
-}
-
-std::string BlurredAlphaText() {
-  return _(
-      "JPEG keeps the alpha channel of the levels roughly: transparent pixels do not stay quite "
-      "transparent, opaque ones not quite opaque. Programs that read the masks of the levels see "
-      "them exactly. Another COMPRESS keeps alpha as it is.");
-}
-
-std::string HiddenLevelsText(const LevelState& state) {
-  const auto stands = [&](datasources::LevelPlace place) {
-    return std::any_of(state.descriptions.begin(), state.descriptions.end(),
-                       [&](const auto& level) { return level.place == place; });
-  };
-  if (!stands(datasources::LevelPlace::kInternal) || !stands(datasources::LevelPlace::kSideCar))
-    return "";
-  return _("many programs see only the levels inside the file when there are some beside it too.");
-}
-
-std::string InterruptedText(const LevelState& state, const BuildOptions& options) {
+std::string InterruptedText(const LevelState& state, bool force) {
   const std::string text = std::string(_("Interrupted.")) + " " + StateText(state);
-  return state.unfinished.empty() ? text : text + " " + ContinueText(options);
+  if (state.unfinished.empty()) return text;
+  return text + " " +
+         (force ? _("Run the same command without --force to resume.")
+                : _("Run the same command again to resume."));
 }
 
-std::string AdviceAfterFailure(unsigned line, const LevelState& state,
-                               const BuildOptions& options) {
-  switch (line) {
-    case kLevelLargerThanImage:
-      return _("Leave out --force, which makes this an error, or name smaller levels.");
-    case kFormatHoldsNoLevels:
-    case kFileIsReadOnly:
-      return _("Use --external instead of --internal: the levels go to a file beside it.");
-    case kComplexNotSupported:
-      return _("Use --method nearest or --method average.");
-    case kRunFailed:
-      return state.unfinished.empty() ? "" : StateText(state) + " " + RetryText(options);
-    default:
-      return "";
-  }
+std::string RetryText(const LevelState& state, bool force) {
+  if (state.unfinished.empty()) return "";
+  return StateText(state) + " " +
+         (force ? _("Fix the problem, then run the same command without --force to resume.")
+                : _("Fix the problem, then run the same command again to resume."));
 }
 
-ExitCode CodeOfWarning(unsigned line) {
-  switch (line) {
-    case kChannelOutside:
-    case kLevelTooSmall:
-    case kLevelLargerThanImage:
-    case kComplexNotSupported:
-      return kWrongUsage;
-    default:
-      return kCannotBuild;
-  }
+std::string PlaceText(LevelPlace place, const std::string& file) {
+  return place == LevelPlace::kInternal ? std::string(_("inside the file"))
+                                        : FormatString(_("in %s"), file.c_str());
 }
 
 }  // namespace orin::app

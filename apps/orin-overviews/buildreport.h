@@ -1,34 +1,39 @@
-/// The sentences that a build ends with, and the exit code of a failed one.
+/// The sentences that a build ends with.
 // SPDX-License-Identifier: MIT
 #pragma once
 
 #include <string>
+#include <vector>
 
-#include "apps/orin-overviews/buildplan.h"
-#include "apps/orin-overviews/exitcode.h"
+#include "host/datasources/levelsite.h"
+#include "processes/overviews/buildplan.h"
 
 namespace orin::app {
 
-/// Every line of `text` after "FILE: ", which stands once however the line begins.
-std::string AfterFileName(const std::string& file, const std::string& text);
+/// The levels of a plan after its build.
+struct LevelState {
+  std::vector<unsigned> valid;       ///< wanted, and valid for the plan's channels
+  std::vector<unsigned> unfinished;  ///< wanted, and not valid
+  std::vector<datasources::LevelDescription> inside;
+  std::vector<datasources::LevelDescription> beside;
 
-std::string SummaryText(const BuildPlan& plan, const LevelState& state);
-std::string NothingToDoText(const BuildPlan& plan);
-/// Which levels are built again because the image was changed; empty without such levels.
-std::string StaleText(const BuildPlan& plan);
-/// Why a level larger than the image is not built.
-std::string LeftOutText(const BuildPlan& plan, unsigned level);
-/// Why a method that computes means does not suit a palette or classes.
-std::string BlendedClassesText();
-/// What becomes of an alpha channel that is stored with loss.
-std::string BlurredAlphaText();
-/// What to know of levels in both places; empty when they stand in one.
-std::string HiddenLevelsText(const LevelState& state);
-std::string InterruptedText(const LevelState& state, const BuildOptions& options);
+  /// The level that the plan's place shows; null when there is none.
+  const datasources::LevelDescription* Find(unsigned level, datasources::LevelPlace place) const;
+};
 
-/// What to do after the run warned at `line` of its source; 0: it did not. Empty when the warning
-/// says all.
-std::string AdviceAfterFailure(unsigned line, const LevelState& state, const BuildOptions& options);
-ExitCode CodeOfWarning(unsigned line);
+LevelState StateOf(datasources::LevelSite& site, const overviews::BuildPlan& plan);
+
+std::string SummaryText(const overviews::BuildPlan& plan, const overviews::RasterFacts& facts,
+                        const LevelState& state);
+std::string NothingToDoText(const overviews::BuildPlan& plan, const overviews::RasterFacts& facts);
+/// What other programs make of levels in both places; empty when they stand in one.
+std::string BothPlacesText(const LevelState& state);
+/// \param force  the request was forced: the rest is built without
+std::string InterruptedText(const LevelState& state, bool force);
+/// After a failure, which comes back unless its cause goes; empty when nothing is left to do.
+std::string RetryText(const LevelState& state, bool force);
+
+/// "inside the file" or "in FILE.ovr"
+std::string PlaceText(datasources::LevelPlace place, const std::string& file);
 
 }  // namespace orin::app

@@ -4,8 +4,8 @@
 #include <algorithm>
 #include <memory>
 
-#include "apps/orin-overviews/buildreport.h"
 #include "apps/orin-overviews/numberlist.h"
+#include "apps/orin-overviews/terminaltext.h"
 #include "host/datasources/datasetmanager.h"
 #include "host/datasources/formats.h"
 #include "host/datasources/levelstore.h"
@@ -107,7 +107,7 @@ ExitCode TryPlace(const auto& clean, const CleanOptions& options, const std::str
     const std::vector<LevelDescription> removed = clean(options, file, hasReclaimed);
     if (removed.empty()) return kDone;
     hasRemoved = true;
-    console.Result(file + ": " + RemovedText(removed));
+    console.Result(AfterFileName(file, RemovedText(removed)));
     return kDone;
   } catch (const Exception& error) {
     console.Error(AfterFileName(file, error.GetMessage()));
@@ -140,10 +140,10 @@ ExitCode CleanFile(const CleanOptions& options, const std::string& file, Console
   if (options.placement != Placement::kInternal)
     code = std::max(code, TryPlace(CleanBeside, options, file, hasRemoved, hasReclaimed, console));
   if (code == kDone && !hasRemoved && hasReclaimed)
-    console.Result(file + ": " + _("no levels to remove; free space was given back"));
+    console.Result(AfterFileName(file, _("no levels to remove; free space was given back")));
   else if (code == kDone && !hasRemoved)
-    console.Result(file + ": " +
-                   (options.levels.empty() ? _("nothing to do: there are no levels")
+    console.Result(AfterFileName(file, options.levels.empty()
+                                           ? _("nothing to do: there are no levels")
                                            : _("nothing to do: there are no such levels")));
   return code;
 }

@@ -8,6 +8,7 @@
 #include <cstdio>
 #include <string_view>
 
+#include "apps/orin-overviews/terminaltext.h"
 #include "host/services/exception.h"
 #include "host/services/logger.h"
 #include "host/services/text.h"
@@ -58,15 +59,16 @@ Console::Console(const Settings& settings)
 void Console::Say(spdlog::level::level_enum level, bool shown, const std::string& text) {
   if (shown && makeRoom_) makeRoom_();
   ForEachLine(text, [&](std::string_view line) {
-    if (shown) terminal_->log(level, line);
-    if (log_) log_->log(level, line);
+    const std::string printable = Printable(line);
+    if (shown) terminal_->log(level, printable);
+    if (log_) log_->log(level, printable);
   });
 }
 
 void Console::Result(const std::string& text) {
   if (!settings_.quiet) {
     if (makeRoom_) makeRoom_();
-    fmt::print("{}\n", text);
+    ForEachLine(text, [](std::string_view line) { fmt::print("{}\n", Printable(line)); });
     std::fflush(stdout);  // a reader at the other end of a pipe sees it when it happens
   }
   Say(spdlog::level::info, false, text);

@@ -5,8 +5,8 @@
 
 #include <algorithm>
 
-#include "apps/orin-overviews/buildreport.h"
 #include "apps/orin-overviews/rasterinfo.h"
+#include "apps/orin-overviews/terminaltext.h"
 #include "host/services/exception.h"
 
 namespace orin::app {

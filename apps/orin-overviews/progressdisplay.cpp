@@ -9,6 +9,7 @@
 #include <cstdio>
 #include <filesystem>
 
+#include "apps/orin-overviews/terminaltext.h"
 #include "host/services/environment.h"
 #include "host/services/text.h"
 
@@ -36,7 +37,7 @@ std::string LastCharacters(const std::string& text, size_t count) {
 }
 
 std::string ShortName(const std::string& file) {
-  const std::string name = std::filesystem::path(file).filename().string();
+  const std::string name = Printable(std::filesystem::path(file).filename().string());
   return LengthOf(name) <= kLongestName ? name : "..." + LastCharacters(name, kLongestName - 3);
 }
 
@@ -84,7 +85,7 @@ class Lines final : public ProgressDisplay {
   Lines(Console& console, std::string file) : console_(console), file_(std::move(file)) {}
   void Show(double, unsigned) override {}
   void LevelDone(unsigned level) override {
-    console_.Result(FormatString(_("%s: level %u done"), file_.c_str(), level));
+    console_.Result(FormatString(_("%s: level %u done"), Printable(file_).c_str(), level));
   }
   void Clear() override {}
 
@@ -123,20 +124,6 @@ std::string ProgressLine(const std::string& file, unsigned level, double overall
   const size_t width = columns - taken;
   const auto full = static_cast<size_t>(overall * static_cast<double>(width));
   return label + " [" + std::string(full, '=') + std::string(width - full, ' ') + "] " + percent;
-}
-
-void ProgressReporter::Report(double fraction, bool startsLevel) {
-  if (startsLevel) {
-    if (model_.HasLevel()) display_.LevelDone(model_.CurrentLevel());
-    model_.StartLevel(fraction);
-  }
-  const double overall = model_.Overall(fraction);
-  if (model_.HasLevel()) display_.Show(overall, model_.CurrentLevel());
-}
-
-void ProgressReporter::Finish(bool complete) {
-  if (complete && model_.HasLevel()) display_.LevelDone(model_.CurrentLevel());
-  display_.Clear();
 }
 
 }  // namespace orin::app

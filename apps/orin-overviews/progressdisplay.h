@@ -7,7 +7,6 @@
 #include <string>
 
 #include "apps/orin-overviews/console.h"
-#include "apps/orin-overviews/progressmodel.h"
 
 namespace orin::app {
 
@@ -28,21 +27,5 @@ std::unique_ptr<ProgressDisplay> MakeProgressDisplay(Console& console, const std
 
 /// The bar's one line: file, level, bar and per cent in at most `columns` columns.
 std::string ProgressLine(const std::string& file, unsigned level, double overall, unsigned columns);
-
-/// Feeds a display with what a run reports.
-class ProgressReporter {
- public:
-  ProgressReporter(ProgressModel model, ProgressDisplay& display)
-      : model_(std::move(model)), display_(display) {}
-
-  /// \param startsLevel  the report comes with the message that a level begins
-  void Report(double fraction, bool startsLevel);
-  /// The run ended. \param complete  every level was built
-  void Finish(bool complete);
-
- private:
-  ProgressModel model_;
-  ProgressDisplay& display_;
-};
 
 }  // namespace orin::app

@@ -95,10 +95,6 @@ IDataset* DatasetManager::Open(const std::string& file, AccessMode mode) {
   constexpr char kFunction[] =
       "orin::datasources::DatasetManager::Open(const std::string&, "
       "orin::datasources::AccessMode)";
-  if (mode == kUpdate && refusesUpdates_)
-    Refuse(FormatString(_("%s: is not opened for writing: levels are to stand beside it."),
-                        file.c_str()),
-           kFunction);
   return ReadWithMemory(file, kFunction,
                         [&] { return OpenThrough(kFormatUnknown, file, mode, kFunction); });
 }
@@ -111,6 +107,18 @@ IDataset* DatasetManager::OpenFormat(const std::string& format, const std::strin
       "const std::string&, orin::datasources::AccessMode)";
   return ReadWithMemory(file, kFunction,
                         [&] { return OpenThrough(CodeOfName(format), file, mode, kFunction); });
+}
+
+std::unique_ptr<LevelSite> DatasetManager::OpenSite(const std::string& file, AccessMode mode) {
+  constexpr char kFunction[] =
+      "orin::datasources::DatasetManager::OpenSite(const std::string&, "
+      "orin::datasources::AccessMode)";
+  return ReadWithMemory(file, kFunction, [&] {
+    ZMBFormatType code = kFormatUnknown;
+    IFormatDriver* driver = FormatRegistry::Instance().DriverOf(file, code);
+    if (!driver) Refuse(UnrecognisedText(file), kFunction);
+    return std::make_unique<LevelSite>(*driver, code, file, mode);
+  });
 }
 
 }  // namespace orin::datasources

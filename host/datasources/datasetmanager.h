@@ -2,9 +2,11 @@
 // SPDX-License-Identifier: MIT
 #pragma once
 
+#include <memory>
 #include <string>
 
 #include "host/datasources/dataset.h"
+#include "host/datasources/levelsite.h"
 
 namespace orin::datasources {
 
@@ -23,14 +25,13 @@ class DatasetManager {
   /// \throws orin::Exception  as `Open`
   IDataset* OpenFormat(const std::string& format, const std::string& file, AccessMode mode);
 
-  /// While it is on, `Open` refuses to open for update, so that every image counts as read-only and
-  /// new levels go beside it. For the application, before work starts.
-  void RefuseUpdates(bool on) { refusesUpdates_ = on; }
+  /// Opens a raster with its levels in both places in view.
+  /// \param mode  kUpdate: for update where that is possible, else for reading
+  /// \throws orin::Exception  it cannot be opened at all; the text says why
+  std::unique_ptr<LevelSite> OpenSite(const std::string& file, AccessMode mode);
 
  private:
   DatasetManager() = default;
-
-  bool refusesUpdates_ = false;
 };
 
 }  // namespace orin::datasources

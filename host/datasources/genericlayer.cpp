@@ -20,7 +20,7 @@ bool Holds(const std::vector<LevelDescription>& levels, unsigned level) {
 class BothPlaces final : public ILevelStore {
  public:
   /// \param internal  may be null
-  BothPlaces(ILevelStore* internal, std::unique_ptr<ILevelStore> sideCar)
+  BothPlaces(ILevelStore* internal, std::shared_ptr<ILevelStore> sideCar)
       : internal_(internal), sideCar_(std::move(sideCar)) {}
 
   std::vector<LevelDescription> List() const override {
@@ -71,7 +71,7 @@ class BothPlaces final : public ILevelStore {
 
  private:
   ILevelStore* internal_;
-  std::unique_ptr<ILevelStore> sideCar_;
+  std::shared_ptr<ILevelStore> sideCar_;
 };
 
 /// The side-car of what is no file by itself: there is none, and none can be made.
@@ -103,14 +103,11 @@ class NoSideCar final : public ILevelStore {
 
 class GenericSource final : public IRasterSource {
  public:
-  /// \param sideCar  of `image`
-  /// \param format   null when `file` can have nothing beside it
-  GenericSource(std::unique_ptr<IRasterSource> image, std::unique_ptr<ILevelStore> sideCar,
+  /// \param levels  of `image`, to which they may refer
+  /// \param format  null when `file` can have nothing beside it
+  GenericSource(std::shared_ptr<IRasterSource> image, std::shared_ptr<ILevelStore> levels,
                 ISideCarFormat* format, const std::string& file)
-      : image_(std::move(image)),
-        levels_(image_->Levels(), std::move(sideCar)),
-        format_(format),
-        file_(file) {
+      : image_(std::move(image)), levels_(std::move(levels)), format_(format), file_(file) {
     hasMaskBeside_ = format && !image_->DeliversValidity() && OpenMaskBeside();
   }
 
@@ -123,6 +120,7 @@ class GenericSource final : public IRasterSource {
   }
   unsigned StoredBitsOf(unsigned channel) const override { return image_->StoredBitsOf(channel); }
   bool HoldsClasses() const override { return image_->HoldsClasses(); }
+  bool IsCloudOptimized() const override { return image_->IsCloudOptimized(); }
   std::unique_ptr<IRasterReader> OpenReader(const std::vector<unsigned>& channels) override {
     auto reader = image_->OpenReader(channels);
     if (image_->DeliversValidity()) return reader;
@@ -139,7 +137,7 @@ class GenericSource final : public IRasterSource {
     return AllOf(std::move(masks));
   }
   bool DeliversValidity() const override { return true; }
-  ILevelStore* Levels() override { return &levels_; }
+  ILevelStore* Levels() override { return levels_.get(); }
   std::shared_ptr<ImageWatch> Watch() override { return image_->Watch(); }
 
  private:
@@ -147,26 +145,51 @@ class GenericSource final : public IRasterSource {
     return format_->OpenMaskBeside(file_, image_->Width(), image_->Height());
   }
 
-  std::unique_ptr<IRasterSource> image_;
-  BothPlaces levels_;
+  std::shared_ptr<IRasterSource> image_;
+  std::shared_ptr<ILevelStore> levels_;
   ISideCarFormat* format_;
   std::string file_;
   bool hasMaskBeside_ = false;
 };
 
+ISideCarFormat& RequireFormat(const std::string& file) {
+  if (ISideCarFormat* format = FormatRegistry::Instance().SideCarFormat()) return *format;
+  throw Exception(FormatString(_("%s: no side-car format is registered."), file.c_str()),
+                  "host/datasources/genericlayer", "RequireFormat(const std::string&)", 0);
+}
+
+/// Null when nothing can stand beside the file.
+ISideCarFormat* FormatBeside(bool isPath) {
+  return isPath ? FormatRegistry::Instance().SideCarFormat() : nullptr;
+}
+
 }  // namespace
 
 std::unique_ptr<IRasterSource> OpenGeneric(IFormatDriver& driver, const std::string& file) {
-  ISideCarFormat* format = FormatRegistry::Instance().SideCarFormat();
-  if (!format)
-    throw Exception(FormatString(_("%s: no side-car format is registered."), file.c_str()),
-                    "host/datasources/genericlayer", "OpenGeneric", 0);
-  auto image = driver.Open(file, kReadOnly);
-  if (!driver.IsPath(file))
-    return std::make_unique<GenericSource>(std::move(image), std::make_unique<NoSideCar>(file),
-                                           nullptr, file);
-  auto sideCar = format->Open(file, *image);
-  return std::make_unique<GenericSource>(std::move(image), std::move(sideCar), format, file);
+  RequireFormat(file);
+  std::shared_ptr<IRasterSource> image = driver.Open(file, kReadOnly);
+  auto beside = OpenBeside(driver, file, *image);
+  return WithLevelsBeside(std::move(image), std::move(beside), file, driver.IsPath(file));
+}
+
+std::shared_ptr<ILevelStore> OpenBeside(IFormatDriver& driver, const std::string& file,
+                                        IRasterSource& image) {
+  if (!driver.IsPath(file)) return std::make_shared<NoSideCar>(file);
+  return RequireFormat(file).Open(file, image);
+}
+
+std::unique_ptr<IRasterSource> WithLevelsBeside(std::shared_ptr<IRasterSource> image,
+                                                std::shared_ptr<ILevelStore> beside,
+                                                const std::string& file, bool isPath) {
+  auto levels = std::make_shared<BothPlaces>(image->Levels(), std::move(beside));
+  return std::make_unique<GenericSource>(std::move(image), std::move(levels), FormatBeside(isPath),
+                                         file);
+}
+
+std::unique_ptr<IRasterSource> WithLevelsInside(std::shared_ptr<IRasterSource> image,
+                                                const std::string& file, bool isPath) {
+  const std::shared_ptr<ILevelStore> levels(image, image->Levels());
+  return std::make_unique<GenericSource>(std::move(image), levels, FormatBeside(isPath), file);
 }
 
 }  // namespace orin::datasources

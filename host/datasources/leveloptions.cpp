@@ -106,11 +106,6 @@ std::string ReadTile(const std::string& text, LevelOptions& options) {
   return "";
 }
 
-LevelOptions& Current() {
-  static LevelOptions options;
-  return options;
-}
-
 }  // namespace
 
 std::string ReadLevelOption(const std::string& text, LevelOptions& options) {
@@ -120,6 +115,7 @@ std::string ReadLevelOption(const std::string& text, LevelOptions& options) {
   if (equals != text.npos) {
     if (key == "COMPRESS") return Choose(kCompressions, key.c_str(), value, options.compression);
     if (key == "PREDICTOR") return Choose(kPredictors, key.c_str(), value, options.predictor);
+    options.saysBigTiff = options.saysBigTiff || key == "BIGTIFF";
     if (key == "BIGTIFF") return Choose(kBigTiff, key.c_str(), value, options.bigTiff);
     if (key == "TILE") return ReadTile(value, options);
     if (key == "LEVEL") return ReadNumber(key.c_str(), value, kMostZstdEffort, options.effort);
@@ -158,9 +154,5 @@ std::string TextOf(LevelCompression compression) {
                                   [&](const auto& entry) { return entry.value == compression; });
   return "COMPRESS=" + std::string(found->name);
 }
-
-const LevelOptions& CurrentLevelOptions() { return Current(); }
-
-void SetLevelOptions(const LevelOptions& options) { Current() = options; }
 
 }  // namespace orin::datasources

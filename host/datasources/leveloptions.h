@@ -36,6 +36,7 @@ struct LevelOptions {
   std::optional<int> effort;           ///< DEFLATE 1 to 12, ZSTD 1 to 22
   std::optional<int> quality;          ///< 1 to 100, of JPEG and lossy WebP
   BigTiff bigTiff = BigTiff::kIfNeeded;
+  bool saysBigTiff = false;  ///< the user named it
   /// A level that is built again is stored as these options say, all its channels anew; otherwise
   /// it stays in the form that it has.
   bool restores = false;
@@ -55,10 +56,5 @@ std::string ContradictionIn(const LevelOptions& options);
 
 /// "COMPRESS=JPEG", as a user writes it.
 std::string TextOf(LevelCompression compression);
-
-/// The options in force for the process.
-const LevelOptions& CurrentLevelOptions();
-/// Puts `options` in force; by the application, before work starts.
-void SetLevelOptions(const LevelOptions& options);
 
 }  // namespace orin::datasources

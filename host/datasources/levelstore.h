@@ -58,6 +58,10 @@ class ILevelStore {
   /// How levels are stored from now on; a format that leaves no choice takes no notice.
   virtual void SetOptions(const LevelOptions& /*options*/) {}
 
+  /// The levels whose stored form is not what the options say; none where these say nothing.
+  /// \throws orin::OptionException  an option does not fit the raster
+  virtual std::vector<unsigned> StoredOtherwise() const { return {}; }
+
   /// What it takes to make all of `levels` for `channels`, the ones that exist anew; those larger
   /// than the image are left out. `Create` checks the same for its own level.
   /// \throws orin::Exception  an option in force does not fit the raster
@@ -96,6 +100,9 @@ class IRasterSource {
   /// True when pixels number entries of a palette or named classes: a mean of two numbers means
   /// something else altogether.
   virtual bool HoldsClasses() const { return false; }
+
+  /// True when the file is laid out for readers on a network, which levels added inside would end.
+  virtual bool IsCloudOptimized() const { return false; }
 
   /// A reader of full-resolution pixels on a handle of its own; it must not outlive the source.
   /// \throws orin::Exception  the channels differ in type, or the file cannot be read

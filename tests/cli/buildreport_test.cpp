@@ -3,122 +3,152 @@
 
 #include <gtest/gtest.h>
 
+#include "apps/orin-overviews/buildnotices.h"
+
 namespace orin::app {
 namespace {
 
 using datasources::LevelDescription;
 using datasources::LevelPlace;
+using datasources::LevelStatus;
+using overviews::BuildPlan;
+using overviews::Fault;
+using overviews::RasterFacts;
+using overviews::Reason;
 
-/// A 1000 x 700 image of which levels 2, 4, 8 are asked for.
-BuildPlan Plan(std::vector<unsigned> kept) {
-  BuildPlan plan;
-  plan.width = 1000;
-  plan.height = 700;
-  plan.channelCount = 1;
-  plan.channels = {1};
-  plan.requested = {2, 4, 8};
-  plan.kept = std::move(kept);
-  return plan;
-}
-
-LevelDescription Level(unsigned level, LevelPlace place) {
+LevelDescription Level(unsigned level, LevelPlace place, std::string method = "AVERAGE") {
   LevelDescription description;
   description.level = level;
   description.place = place;
   description.file = place == LevelPlace::kInternal ? "scene.tif" : "scene.tif.ovr";
-  description.method = "AVERAGE";
+  description.method = std::move(method);
+  description.validChannels = {true};
+  description.status = LevelStatus::kCurrent;
   return description;
 }
 
-LevelState State(std::vector<unsigned> valid, std::vector<unsigned> unfinished, LevelPlace place) {
-  LevelState state{std::move(valid), std::move(unfinished), {}};
-  for (const unsigned level : state.valid) state.descriptions.push_back(Level(level, place));
-  return state;
+/// A 1000 x 700 image with these levels inside.
+RasterFacts Image(std::vector<unsigned> levels) {
+  RasterFacts facts;
+  facts.width = 1000;
+  facts.height = 700;
+  facts.channels = {gobs::eDT_8U};
+  for (const unsigned level : levels)
+    facts.inside.levels.push_back(Level(level, LevelPlace::kInternal));
+  return facts;
 }
 
-TEST(AfterFileName, EveryLineNamesTheFileOnce) {
-  EXPECT_EQ("a.tif: Failed.\na.tif: disk full",
-            AfterFileName("a.tif", "Failed.\na.tif: disk full"));
-  EXPECT_EQ("a.tif: one\na.tif: two", AfterFileName("a.tif", "one\n\ntwo\n"));
-  EXPECT_EQ("", AfterFileName("a.tif", ""));
+BuildPlan Plan(std::vector<unsigned> kept, std::vector<unsigned> building) {
+  BuildPlan plan;
+  plan.channels = {1};
+  plan.kept = std::move(kept);
+  for (const unsigned level : building)
+    plan.building.push_back({level, ResampleAverage, Reason::kMissing, ""});
+  return plan;
+}
+
+LevelState State(std::vector<unsigned> valid, std::vector<unsigned> unfinished) {
+  LevelState state{std::move(valid), std::move(unfinished), {}, {}};
+  for (const unsigned level : state.valid)
+    state.inside.push_back(Level(level, LevelPlace::kInternal));
+  return state;
 }
 
 TEST(BuildReport, TheSummaryTellsWhatWasBuiltHowAndWhere) {
   EXPECT_EQ("levels built: 2, 4, 8 (AVERAGE, inside the file)",
-            SummaryText(Plan({}), State({2, 4, 8}, {}, LevelPlace::kInternal)));
-  EXPECT_EQ("levels built: 4, 8 (AVERAGE, in scene.tif.ovr); already up to date: 2",
-            SummaryText(Plan({2}), State({2, 4, 8}, {}, LevelPlace::kSideCar)));
+            SummaryText(Plan({}, {2, 4, 8}), Image({}), State({2, 4, 8}, {})));
+  EXPECT_EQ("levels built: 4, 8 (AVERAGE, inside the file); already up to date: 2",
+            SummaryText(Plan({2}, {4, 8}), Image({2}), State({2, 4, 8}, {})));
+}
+
+TEST(BuildReport, LevelsOfSeveralMethodsAreToldApart) {
+  LevelState state = State({2, 4, 8}, {});
+  state.inside[1].method = state.inside[2].method = "MODE";
+  EXPECT_EQ("levels built: 2 (AVERAGE, inside the file); 4, 8 (MODE, inside the file)",
+            SummaryText(Plan({}, {2, 4, 8}), Image({}), state));
 }
 
 TEST(BuildReport, KeptLevelsOfUnknownOriginAreNeverCalledUpToDate) {
-  BuildPlan plan = Plan({2, 4});
-  plan.unverified = {4};
-  EXPECT_EQ("nothing to do; already up to date: 2; kept unverified: 4", NothingToDoText(plan));
-  plan.unverified = {2, 4};
-  EXPECT_EQ("nothing to do; kept unverified: 2, 4", NothingToDoText(plan));
+  RasterFacts facts = Image({2, 4});
+  facts.inside.levels[1].status = LevelStatus::kUnverified;
+  EXPECT_EQ("nothing to do; already up to date: 2; kept unverified: 4",
+            NothingToDoText(Plan({2, 4}, {}), facts));
+  facts.inside.levels[0].status = LevelStatus::kUnverified;
+  EXPECT_EQ("nothing to do; kept unverified: 2, 4", NothingToDoText(Plan({2, 4}, {}), facts));
 }
 
-TEST(BuildReport, LevelsOfAChangedImageAreNamed) {
-  BuildPlan plan = Plan({});
-  EXPECT_EQ("", StaleText(plan));
-  plan.stale = {2, 8};
-  EXPECT_EQ("the image was changed after these levels were built: 2, 8.", StaleText(plan));
-}
-
-TEST(BuildReport, LevelsInBothPlacesAreWorthANotice) {
-  LevelState state = State({2, 4}, {}, LevelPlace::kInternal);
-  EXPECT_EQ("", HiddenLevelsText(state));
-  state.descriptions.push_back(Level(8, LevelPlace::kSideCar));
-  EXPECT_NE("", HiddenLevelsText(state));
-  EXPECT_EQ("", HiddenLevelsText(State({2, 4}, {}, LevelPlace::kSideCar)));
+TEST(BuildReport, LevelsInBothPlacesAreNamedWithThoseThatOthersRead) {
+  LevelState state = State({2, 4}, {});
+  EXPECT_EQ("", BothPlacesText(state));
+  state.beside.push_back(Level(8, LevelPlace::kSideCar));
+  EXPECT_EQ(
+      "Levels stand inside the file (2, 4) and in scene.tif.ovr (8). Other programs read "
+      "those inside only.",
+      BothPlacesText(state));
 }
 
 TEST(BuildReport, NothingToDoSaysWhy) {
   EXPECT_EQ("nothing to do; already up to date: 2, 4, 8",
-            SummaryText(Plan({2, 4, 8}), State({2, 4, 8}, {}, LevelPlace::kInternal)));
-  EXPECT_EQ("nothing to do: 1000 x 700 pixels need no levels", NothingToDoText(Plan({})));
-  BuildPlan tooLarge = Plan({});
-  tooLarge.building = {{2000, true}};
+            SummaryText(Plan({2, 4, 8}, {}), Image({2, 4, 8}), State({2, 4, 8}, {})));
+  EXPECT_EQ("nothing to do: 1000 x 700 pixels need no levels",
+            NothingToDoText(Plan({}, {}), Image({})));
+  BuildPlan tooLarge = Plan({}, {});
+  tooLarge.empty = {2000};
   EXPECT_EQ("nothing to do: every level asked for is larger than the image",
-            NothingToDoText(tooLarge));
-  BuildPlan masks = Plan({});
+            NothingToDoText(tooLarge, Image({})));
+  BuildPlan masks = Plan({}, {});
   masks.channels.clear();
   EXPECT_EQ("nothing to do: all channels are masks of one bit, which have no levels",
-            NothingToDoText(masks));
+            NothingToDoText(masks, Image({})));
 }
 
 TEST(BuildReport, AnInterruptionTellsWhatIsFinishedAndHowToGoOn) {
-  BuildOptions options;
-  EXPECT_EQ("Interrupted. Levels finished: 2; still to do: 4, 8. The same command continues there.",
-            InterruptedText(State({2}, {4, 8}, LevelPlace::kInternal), options));
-  EXPECT_EQ("Interrupted. Levels finished: none; still to do: 2. The same command continues there.",
-            InterruptedText(State({}, {2}, LevelPlace::kInternal), options));
-  EXPECT_EQ("Interrupted. Levels finished: 2, 4.",
-            InterruptedText(State({2, 4}, {}, LevelPlace::kInternal), options));
-  options.force = true;
+  EXPECT_EQ(
+      "Interrupted. Levels finished: 2; still to do: 4, 8. Run the same command again to resume.",
+      InterruptedText(State({2}, {4, 8}), false));
+  EXPECT_EQ(
+      "Interrupted. Levels finished: none; still to do: 2. Run the same command again to resume.",
+      InterruptedText(State({}, {2}), false));
+  EXPECT_EQ("Interrupted. Levels finished: 2, 4.", InterruptedText(State({2, 4}, {}), false));
   EXPECT_EQ(
       "Interrupted. Levels finished: 2; still to do: 4. "
-      "The same command without --force continues there.",
-      InterruptedText(State({2}, {4}, LevelPlace::kInternal), options));
+      "Run the same command without --force to resume.",
+      InterruptedText(State({2}, {4}), true));
 }
 
-TEST(BuildReport, RequestsThatCannotBeAreWrongUsageAndTheRestCannotBeBuilt) {
-  for (const unsigned line : {609u, 625u, 641u, 698u}) EXPECT_EQ(kWrongUsage, CodeOfWarning(line));
-  for (const unsigned line : {0u, 658u, 670u, 913u}) EXPECT_EQ(kCannotBuild, CodeOfWarning(line));
-}
-
-TEST(BuildReport, TheAdviceFitsTheFailure) {
-  const LevelState state = State({2}, {4, 8}, LevelPlace::kInternal);
-  const BuildOptions options;
-  EXPECT_NE(std::string::npos, AdviceAfterFailure(641, state, options).find("--force"));
-  EXPECT_NE(std::string::npos, AdviceAfterFailure(658, state, options).find("--external"));
-  EXPECT_NE(std::string::npos, AdviceAfterFailure(670, state, options).find("--external"));
-  EXPECT_NE(std::string::npos, AdviceAfterFailure(698, state, options).find("--method nearest"));
+TEST(BuildReport, AFailureTellsWhatIsFinishedAndHowToGoOn) {
   EXPECT_EQ(
       "Levels finished: 2; still to do: 4, 8. "
-      "When the cause is removed, the same command continues there.",
-      AdviceAfterFailure(913, state, options));
-  EXPECT_EQ("", AdviceAfterFailure(625, state, options));
+      "Fix the problem, then run the same command again to resume.",
+      RetryText(State({2}, {4, 8}), false));
+  EXPECT_EQ("", RetryText(State({2}, {}), false));
+}
+
+TEST(BuildNotices, RequestsThatCannotBeAreWrongUsageAndTheRestCannotBeBuilt) {
+  for (const Fault fault :
+       {Fault::kChannelOutside, Fault::kChannelIsBits, Fault::kOnlyBits, Fault::kLevelTooSmall,
+        Fault::kLevelEmpty, Fault::kComplexNotSupported, Fault::kOtherChannelsLackLevel,
+        Fault::kPartInOtherForm, Fault::kBigTiffInside})
+    EXPECT_EQ(kWrongUsage, CodeOf(fault));
+  for (const Fault fault : {Fault::kFormatHoldsNoLevels, Fault::kFileIsReadOnly})
+    EXPECT_EQ(kCannotBuild, CodeOf(fault));
+  EXPECT_EQ(kDone, CodeOf(Fault::kNone));
+}
+
+TEST(BuildNotices, EachReasonNamesItsLevels) {
+  BuildPlan plan = Plan({}, {});
+  overviews::BuildRequest request;
+  EXPECT_TRUE(NoticesOf(plan, request, Image({}), "scene.tif").empty());
+  plan.building = {{2, ResampleMode, Reason::kOtherMethod, "NEAREST"},
+                   {4, ResampleMode, Reason::kStale, "MODE"},
+                   {8, ResampleMode, Reason::kOtherMethod, ""}};
+  request.method = ResampleMode;
+  const std::vector<std::string> expected = {
+      "Rebuilding levels 4: the image was changed after they were built.",
+      "Rebuilding levels 8 by MODE: another program made them, by a method that they do not "
+      "record.",
+      "Rebuilding levels 2 by MODE: they were made by NEAREST."};
+  EXPECT_EQ(expected, NoticesOf(plan, request, Image({}), "scene.tif"));
 }
 
 }  // namespace

@@ -46,47 +46,5 @@ TEST(ProgressLine, HundredPerCentIsForTheEndAlone) {
   EXPECT_NE(std::string::npos, ProgressLine("a.tif", 2, 1.0, 60).find("100%"));
 }
 
-/// Writes down what it is asked to show.
-class Recording final : public ProgressDisplay {
- public:
-  void Show(double overall, unsigned level) override {
-    shown.emplace_back(level, static_cast<int>(overall * 100));
-  }
-  void LevelDone(unsigned level) override { done.push_back(level); }
-  void Clear() override { ++cleared; }
-
-  std::vector<std::pair<unsigned, int>> shown;
-  std::vector<unsigned> done;
-  int cleared = 0;
-};
-
-TEST(ProgressReporter, ALevelIsDoneWhenTheNextOneBegins) {
-  Recording display;
-  ProgressReporter reporter(ProgressModel({{2}, {4}}, LevelReport::kToTheEnd), display);
-  reporter.Report(0.0, false);
-  EXPECT_TRUE(display.shown.empty());
-  reporter.Report(0.0, true);
-  reporter.Report(0.5, false);
-  EXPECT_TRUE(display.done.empty());
-  reporter.Report(0.8, true);
-  EXPECT_EQ(std::vector<unsigned>{2}, display.done);
-  reporter.Report(1.0, false);
-  reporter.Finish(true);
-  EXPECT_EQ((std::vector<unsigned>{2, 4}), display.done);
-  EXPECT_EQ((std::vector<std::pair<unsigned, int>>{{2, 0}, {2, 40}, {4, 80}, {4, 100}}),
-            display.shown);
-  EXPECT_EQ(1, display.cleared);
-}
-
-TEST(ProgressReporter, ALevelThatWasNotFinishedIsNotDone) {
-  Recording display;
-  ProgressReporter reporter(ProgressModel({{2}, {4}}, LevelReport::kToTheEnd), display);
-  reporter.Report(0.0, true);
-  reporter.Report(0.3, false);
-  reporter.Finish(false);
-  EXPECT_TRUE(display.done.empty());
-  EXPECT_EQ(1, display.cleared);
-}
-
 }  // namespace
 }  // namespace orin::app

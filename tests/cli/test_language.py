@@ -22,11 +22,11 @@ class French(Case):
         self.assertEqual(f"orin-overviews: {text}: "
                          "n'est pas un fichier raster d'un format connu.\n", answer.stderr)
 
-    def test_warnings_of_a_run(self):
+    def test_errors_of_a_run(self):
         file = write_raster(self.path("scene.tif"), 600, 400)
         answer = run("build", file, "--levels", "1", LANGUAGE="fr")
         self.assertRan(answer, 2)
-        self.assertIn("Les niveaux doivent valoir 2 ou plus.", answer.stderr)
+        self.assertIn("les niveaux sont des facteurs de réduction de 2 ou plus.", answer.stderr)
 
     def test_english_without_a_translation(self):
         self.assertIn("a FILE is needed", run("build", LANGUAGE="xx").stderr)

@@ -142,12 +142,14 @@ class Inside(Hfa):
         self.assertRan(run("build", self.file, "--levels", "2", "--force", "--method", "nearest"))
         self.check_levels(self.file, self.pixels, [2])
 
-    def test_some_channels_alone(self):
+    def test_some_channels_alone_need_the_others_to_have_the_level(self):
         write(self.file, self.pixels, "Byte")
-        self.assertRan(run("build", self.file, "--levels", "2", "--channels", "2"))
-        self.assertEqual([False, True],
-                         [channel["valid"] for channel in info(self.file)["levels"][0]["channels"]])
-        self.assertRan(run("build", self.file, "--levels", "2", "--method", "nearest"))
+        answer = run("build", self.file, "--levels", "2", "--channels", "2")
+        self.assertRan(answer, 2)
+        self.assertIn("Level 2 would hold the channels named only", answer.stderr)
+        self.assertEqual([], info(self.file)["levels"])
+        self.assertRan(run("build", self.file, "--levels", "2"))
+        self.assertRan(run("build", self.file, "--levels", "2", "--channels", "2", "--force"))
         self.assertEqual([2], all_valid(self.file))
 
     def test_no_data_stays_no_data(self):

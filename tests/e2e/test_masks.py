@@ -272,7 +272,8 @@ class Alpha(MaskCase):
         write_tiff(file, numpy.concatenate([picture(valid, outside=3),
                                             (valid * 255)[None].astype("u1")]),
                    "Byte", ("PHOTOMETRIC=RGB", "ALPHA=YES", *TILED))
-        self.build(file, "--levels", "2,4", "--channels", "1-3", "--method", "average")
+        self.build(file, "--levels", "2,4", "--channels", "1-3", "--method", "average",
+                   "--external")
         for index in (0, 1):
             self.assertNotIn(3, read_pixels(file, index)[:3])
 

@@ -97,7 +97,7 @@ class TheImage(Case):
         del changed
         answer = run("build", self.file, "--levels", "2", "--external")
         self.assertRan(answer)
-        self.assertIn("see only the levels inside the file", answer.stderr)
+        self.assertIn("Other programs read those inside only.", answer.stderr)
         self.assertRan(run("info", self.file), 3)  # other programs read what is stale
         self.assertEqual([(2, "internal", "stale"), (2, "side-car", "current"),
                           (4, "internal", "stale")],
@@ -108,7 +108,8 @@ class TheImage(Case):
         self.assertRan(run("build", self.file, "--levels", "2"))
         answer = run("build", self.file, "--levels", "4,8", "--external")
         self.assertRan(answer)
-        self.assertEqual(1, answer.stderr.count("levels inside the file"), answer.stderr)
+        self.assertEqual(1, answer.stderr.count("Levels stand inside the file (2) and in"),
+                         answer.stderr)
 
 
 class TheSideCar(Case):

@@ -226,6 +226,20 @@ bool HaveSameForm(const LevelCoding& one, const LevelCoding& other) {
   return formOf(one) == formOf(other) && sameChroma;
 }
 
+bool HasFormAskedFor(const LevelCoding& stored, const LevelCoding& asked,
+                     const datasources::LevelOptions& options) {
+  const PixelFormat& one = stored.format;
+  const PixelFormat& other = asked.format;
+  const bool isJpeg = other.compression == COMPRESSION_JPEG;
+  const bool sameQuality = !options.quality || !isJpeg || stored.jpegQuality == asked.jpegQuality;
+  const bool namesTiles = options.tileWidth || options.tileHeight;
+  const bool sameTiles =
+      one.tiled && one.tileWidth == other.tileWidth && one.tileHeight == other.tileHeight;
+  return (!options.compression || one.compression == other.compression) &&
+         (!options.predictor || stored.predictor == asked.predictor) &&
+         (!namesTiles || sameTiles) && sameQuality;
+}
+
 std::vector<NewEntry> EntriesOf(const LevelCoding& coding) {
   const PixelFormat& format = coding.format;
   const auto forEachSample = [&](uint64_t number) {

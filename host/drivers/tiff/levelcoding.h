@@ -64,6 +64,11 @@ uint16_t UsualPredictor(const PixelFormat& format);
 /// True when tiles of one can stand in the directory of the other.
 bool HaveSameForm(const LevelCoding& one, const LevelCoding& other);
 
+/// True when `stored` is as `asked` in all that `options` name and a file tells; the effort of a
+/// codec it does not tell.
+bool HasFormAskedFor(const LevelCoding& stored, const LevelCoding& asked,
+                     const datasources::LevelOptions& options);
+
 /// The entries of a level's directory: all but those that locate its tiles and its metadata.
 std::vector<NewEntry> EntriesOf(const LevelCoding& coding);
 

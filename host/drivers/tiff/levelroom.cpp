@@ -73,6 +73,18 @@ void TiffLevelStore::SetOptions(const datasources::LevelOptions& options) {
   options_ = options;
 }
 
+std::vector<unsigned> TiffLevelStore::StoredOtherwise() const {
+  const std::lock_guard lock(mutex_);
+  std::vector<unsigned> levels;
+  for (const StoredLevel& stored : levels_) {
+    if (!options_.SayCoding() || Find(stored.level) != &stored) continue;
+    const LevelCoding asked =
+        CodingOfLevel(settings_.coding, stored.level, file_->Path(), options_);
+    if (!HasFormAskedFor(CodingOfStored(stored), asked, options_)) levels.push_back(stored.level);
+  }
+  return levels;
+}
+
 LevelRoom TiffLevelStore::RoomFor(const std::vector<unsigned>& levels,
                                   const std::vector<unsigned>& channels) const {
   const std::lock_guard lock(mutex_);

@@ -63,6 +63,7 @@ class TiffLevelStore final : public datasources::ILevelStore {
   void SetSource(const datasources::LevelDescription& source) override;
   void KeepAnswers() override;
   void SetOptions(const datasources::LevelOptions& options) override;
+  std::vector<unsigned> StoredOtherwise() const override;
   datasources::LevelRoom RoomFor(const std::vector<unsigned>& levels,
                                  const std::vector<unsigned>& channels) const override;
   bool HasReclaimableSpace() const override;
@@ -167,7 +168,7 @@ class TiffLevelStore final : public datasources::ILevelStore {
   mutable std::mutex mutex_;
   std::unique_ptr<LevelFile> file_;
   Settings settings_;
-  datasources::LevelOptions options_ = datasources::CurrentLevelOptions();
+  datasources::LevelOptions options_;
   mutable LevelFreshness freshness_;
   mutable std::optional<datasources::ImageStamp> kept_;  ///< of the last answer that was kept
   std::optional<Catalogue> catalogue_;  ///< of the structure that `levels_` were found in

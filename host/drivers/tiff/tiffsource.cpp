@@ -100,6 +100,18 @@ std::string MetadataTextOf(const TiffHandle& tiff, const std::string& path) {
   return text;
 }
 
+/// Whether text behind the header says so. An edit that ends it leaves its mark there.
+bool IsCloudOptimizedTiff(const PositionedFile& file, const TiffStructure& structure) {
+  constexpr size_t kMaxBytes = 4096;
+  const uint64_t size = file.Size();
+  const uint64_t start = std::min<uint64_t>(size, structure.HeaderBytes());
+  std::string text(std::min<uint64_t>(kMaxBytes, size - start), '\0');
+  file.Read(start, text.data(), text.size());
+  return text.starts_with("GDAL_STRUCTURAL_METADATA_SIZE=") &&
+         text.find("LAYOUT=IFDS_BEFORE_DATA") != text.npos &&
+         text.find("KNOWN_INCOMPATIBLE_EDITION=YES") == text.npos;
+}
+
 }  // namespace
 
 TiffSource::TiffSource(std::string file, datasources::AccessMode access) : file_(std::move(file)) {
@@ -125,6 +137,7 @@ void TiffSource::FindMasks() {
   const TiffStructure structure = ParseStructure(file);
   if (const auto mask = Catalogue(file, structure, true).MaskOf(0))
     maskOffset_ = structure.directories[*mask].offset;
+  isCloudOptimized_ = IsCloudOptimizedTiff(file, structure);
   hasMaskBeside_ = OpenMaskBeside(file_, format_.width, format_.height) != nullptr;
 }
 

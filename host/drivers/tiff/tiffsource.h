@@ -37,6 +37,7 @@ class TiffSource final : public datasources::IRasterSource {
   }
   /// A palette, or category names in the file `NAME.EXT.aux.xml`.
   bool HoldsClasses() const override;
+  bool IsCloudOptimized() const override { return isCloudOptimized_; }
   std::unique_ptr<datasources::IRasterReader> OpenReader(
       const std::vector<unsigned>& channels) override;
   unsigned AlphaChannel() const override { return alphaChannel_; }
@@ -58,6 +59,7 @@ class TiffSource final : public datasources::IRasterSource {
   bool hasMaskBeside_ = false;
   bool namesCategories_ = false;
   model::NoDataOrigin noDataOrigin_ = model::NoDataOrigin::kNowhere;
+  bool isCloudOptimized_ = false;
   std::unique_ptr<datasources::ILevelStore> levels_;
 };
 

@@ -94,16 +94,6 @@ TEST_F(GdalDriver, RefusesASideCarOfWhatIsNoFileOfItsOwnAndSaysWhereItWouldBe) {
   EXPECT_THAT(RefusalOf([&] { store->Create(2, {1}, "NEAREST"); }), HasSubstr(name + ".ovr"));
 }
 
-TEST_F(GdalDriver, OpensNothingForUpdateWhileUpdatesAreRefused) {
-  WritePicture(File("image.img"), "HFA", {});
-  datasources::DatasetManager& manager = *datasources::DatasetManager::GetInstance();
-  manager.RefuseUpdates(true);
-  EXPECT_THAT(RefusalOf([&] { Open(File("image.img"), datasources::kUpdate); }),
-              HasSubstr("image.img: is not opened for writing"));
-  manager.RefuseUpdates(false);
-  EXPECT_TRUE(Open(File("image.img"), datasources::kUpdate));
-}
-
 TEST_F(GdalDriver, KeepsLevelsOfAnErdasImageThatIsOpenForReadingBesideIt) {
   WritePicture(File("image.img"), "HFA", {});
   const auto dataset = Open(File("image.img"));

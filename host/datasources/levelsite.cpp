@@ -1,0 +1,50 @@
+// SPDX-License-Identifier: MIT
+#include "host/datasources/levelsite.h"
+
+#include <utility>
+
+#include "host/datasources/genericlayer.h"
+#include "host/datasources/sourcedataset.h"
+#include "host/services/exception.h"
+
+namespace orin::datasources {
+
+LevelSite::LevelSite(IFormatDriver& driver, int formatCode, std::string file, AccessMode access)
+    : driver_(driver),
+      formatCode_(formatCode),
+      file_(std::move(file)),
+      isPath_(driver.IsPath(file_)) {
+  if (access == kUpdate) {
+    try {
+      image_ = driver.Open(file_, kUpdate);
+      access_ = kUpdate;
+    } catch (const Exception& refusal) {
+      updateRefusal_ = refusal.GetMessage();
+    }
+  }
+  if (!image_) image_ = driver.Open(file_, kReadOnly);
+}
+
+const ZMBInfo_s& LevelSite::Format() const {
+  const ZMBInfo_s* record = ZMBGetFormatInfo(formatCode_);
+  return record ? *record : *ZMBInfo[kFormatUnknown];
+}
+
+const std::shared_ptr<ILevelStore>& LevelSite::Beside() {
+  if (!beside_) beside_ = OpenBeside(driver_, file_, *image_);
+  return beside_;
+}
+
+ILevelStore* LevelSite::LevelsIn(LevelPlace place) {
+  return place == LevelPlace::kInternal ? image_->Levels() : Beside().get();
+}
+
+std::unique_ptr<IRasterDataset> LevelSite::DatasetFor(LevelPlace place) {
+  const bool isInside = place == LevelPlace::kInternal;
+  auto source = isInside ? WithLevelsInside(image_, file_, isPath_)
+                         : WithLevelsBeside(image_, Beside(), file_, isPath_);
+  return std::make_unique<SourceDataset>(std::move(source), file_, access_,
+                                         isInside ? formatCode_ : kFormatGeneric, formatCode_);
+}
+
+}  // namespace orin::datasources
