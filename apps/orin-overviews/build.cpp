@@ -5,6 +5,7 @@
 #include <memory>
 #include <system_error>
 
+#include "apps/orin-overviews/abruptend.h"
 #include "apps/orin-overviews/buildnotices.h"
 #include "apps/orin-overviews/buildprogress.h"
 #include "apps/orin-overviews/buildreport.h"
@@ -118,10 +119,19 @@ void FileBuild::TellBefore() {
 
 BuildResult FileBuild::Build() {
   if (plan_.building.empty()) return {};
+  if (plan_.replacesLeftOver) {
+    site_.RemoveLeftOver();
+    site_.LevelsIn(plan_.place)->SetOptions(request_.storing);
+  }
   const auto dataset = site_.DatasetFor(plan_.place);
   const auto display = MakeProgressDisplay(console_, site_.File(), options_.quiet);
   BuildProgress progress(*display, interruption_, console_, site_.File(),
                          PlaceText(plan_.place, site_.File() + ".ovr"));
+  const AbruptEnd guard([this] {
+    Error(
+        _("The system allows no more threads. Set OMP_NUM_THREADS=1, or raise the limit (ulimit "
+          "-u), then run the same command again to resume."));
+  });
   const BuildResult result = overviews::ExecuteBuild(*dataset, plan_, progress);
   display->Clear();
   return result;

@@ -84,6 +84,9 @@ std::string RebuildText(Reason reason, const std::string& levels) {
     case Reason::kStale:
       return FormatString(_("Rebuilding levels %s: the image was changed after they were built."),
                           text);
+    case Reason::kChanged:
+      return FormatString(
+          _("Rebuilding levels %s: another program wrote into them after they were built."), text);
     case Reason::kUnfinished:
       return FormatString(_("Building levels %s again: they were not finished."), text);
     case Reason::kOtherForm:
@@ -159,13 +162,17 @@ std::vector<std::string> NoticesOf(const BuildPlan& plan, const overviews::Build
                                    const RasterFacts& facts, const std::string& file) {
   std::vector<std::string> notices;
   if (plan.building.empty()) return notices;
-  for (const Reason reason :
-       {Reason::kStale, Reason::kUnfinished, Reason::kOtherForm, Reason::kSourceRebuilt}) {
+  for (const Reason reason : {Reason::kStale, Reason::kChanged, Reason::kUnfinished,
+                              Reason::kOtherForm, Reason::kSourceRebuilt}) {
     const std::vector<unsigned> levels = plan.Levels(reason);
     if (!levels.empty()) notices.push_back(RebuildText(reason, JoinNumbers(levels)));
   }
   for (auto& text : OtherMethodTexts(plan, request)) notices.push_back(std::move(text));
   for (auto& text : PlaceTexts(plan, facts, file)) notices.push_back(std::move(text));
+  if (plan.replacesLeftOver)
+    notices.push_back(FormatString(
+        _("Replacing %s: it holds levels of an image of another size (%u x %u pixels)."),
+        facts.leftOver->file.c_str(), facts.leftOver->width, facts.leftOver->height));
   return notices;
 }
 

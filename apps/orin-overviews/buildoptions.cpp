@@ -1,6 +1,10 @@
 // SPDX-License-Identifier: MIT
 #include "apps/orin-overviews/buildoptions.h"
 
+#include <filesystem>
+#include <system_error>
+
+#include "apps/orin-overviews/nearestword.h"
 #include "apps/orin-overviews/numberlist.h"
 #include "host/services/environment.h"
 #include "host/services/text.h"
@@ -38,14 +42,17 @@ std::string ReadFactor(const std::string& text, unsigned& factor) {
 std::string ReadMethod(const std::string& text, QRTOverviewResampleType& method) {
   method = GetPyramidType(text);
   if (method != ResampleInvalid) return "";
-  return FormatString(_("unknown method \"%s\"; the methods are %s"), text.c_str(),
-                      PyramidTypeNames().c_str());
+  return FormatString(_("unknown method \"%s\"; the methods are %s."), text.c_str(),
+                      PyramidTypeNames().c_str()) +
+         SuggestionFor(text, {"nearest", "average", "mode", "bilinear", "bicubic"});
 }
 
 /// What counts where neither the command line nor the file's levels name a method.
 void ReadEnvironment(BuildOptions& options) {
   const std::string name = core::QRTGetEnvironmentVariable("ORIN_OVERVIEW_METHOD");
-  if (!name.empty()) options.usualMethod = GetPyramidType(name);
+  if (name.empty()) return;
+  const std::string problem = ReadMethod(name, options.usualMethod);
+  if (!problem.empty()) throw CLI::ValidationError("ORIN_OVERVIEW_METHOD", problem);
 }
 
 /// Reads every KEY=VALUE.
@@ -83,6 +90,20 @@ void RefuseTogether(const CLI::Option& one, const CLI::Option& other) {
 
 }  // namespace
 
+void RefuseLevelsAmongFiles(const std::vector<std::string>& files) {
+  std::string words;
+  std::string list;
+  for (const std::string& file : files) {
+    std::error_code unknown;
+    if (!ParseLevels(file).problem.empty() || std::filesystem::exists(file, unknown)) continue;
+    words += (words.empty() ? "" : " ") + file;
+    list += (list.empty() ? "" : ",") + file;
+  }
+  if (!words.empty())
+    throw CLI::ValidationError(words,
+                               FormatString(_("levels are given as --levels %s"), list.c_str()));
+}
+
 CLI::App* AddBuildCommand(CLI::App& app, BuildOptions& options) {
   CLI::App* command = app.add_subcommand("build", _("Build the missing overview levels of files."));
   command->add_option("FILE", options.files, _("Raster files"))->required()->type_name("");
@@ -94,7 +115,6 @@ CLI::App* AddBuildCommand(CLI::App& app, BuildOptions& options) {
       [&](const std::string& text) { return ReadFactor(text, options.factor); });
   AddText(*command, "--method", _("METHOD"), PyramidTypeNames(),
           [&](const std::string& text) { return ReadMethod(text, options.method); });
-  ReadEnvironment(options);
   AddText(*command, "--channels", _("LIST"), _("Channels to treat, such as 1,3-5"),
           [&](const std::string& text) { return ReadList(ParseChannels(text), options.channels); });
   const auto* internal = command->add_flag_callback(
@@ -107,6 +127,8 @@ CLI::App* AddBuildCommand(CLI::App& app, BuildOptions& options) {
   command->add_flag("--force", options.force, _("Build levels again that are up to date"));
   command->add_flag("--quiet", options.quiet, _("Print warnings and errors only"));
   command->final_callback([=, &options] {
+    ReadEnvironment(options);
+    RefuseLevelsAmongFiles(options.files);
     RefuseTogether(*levels, *factor);
     RefuseTogether(*internal, *external);
     FinishStoring(options);

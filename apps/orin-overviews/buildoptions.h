@@ -29,4 +29,8 @@ struct BuildOptions {
 /// Adds the sub-command. `options` is filled while the command line is parsed and outlives `app`.
 CLI::App* AddBuildCommand(CLI::App& app, BuildOptions& options);
 
+/// Levels stand behind --levels; some other programs take them behind the file.
+/// \throws CLI::ValidationError  a file that does not exist is named like a list of levels
+void RefuseLevelsAmongFiles(const std::vector<std::string>& files);
+
 }  // namespace orin::app

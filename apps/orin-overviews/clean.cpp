@@ -46,6 +46,12 @@ std::vector<unsigned> FactorsOf(const std::vector<LevelDescription>& levels) {
   return factors;
 }
 
+struct Removed {
+  std::vector<LevelDescription> levels;
+  std::string leftOver;       ///< a side-car of an image of another size; empty: none
+  bool hasReclaimed = false;  ///< free space was given back
+};
+
 /// Removes what was chosen; where no levels are named, also those that only then show, having
 /// shared a factor with another one.
 void RemoveFrom(ILevelStore& store, const std::vector<LevelDescription>& chosen,
@@ -62,34 +68,34 @@ void RemoveFrom(ILevelStore& store, const std::vector<LevelDescription>& chosen,
 }
 
 /// Free space that a command left which was killed is given back as well.
-/// \returns what was removed
-std::vector<LevelDescription> CleanInside(const CleanOptions& options, const std::string& file,
-                                          bool& hasReclaimed) {
+Removed CleanInside(const CleanOptions& options, const std::string& file) {
   std::unique_ptr<IDataset> dataset(
       DatasetManager::GetInstance()->Open(file, datasources::kReadOnly));
   ILevelStore* store = LevelsOf(*dataset);
   const auto chosen = Chosen(store, LevelPlace::kInternal, options);
-  if (chosen.empty() && !(store && store->HasReclaimableSpace())) return chosen;
-  hasReclaimed = true;
+  if (chosen.empty() && !(store && store->HasReclaimableSpace())) return {};
   dataset.reset();
   ZMBFormatType code = kFormatUnknown;
   datasources::IFormatDriver* driver = datasources::FormatRegistry::Instance().DriverOf(file, code);
   RemoveFrom(*driver->OpenToRemoveLevels(file)->Levels(), chosen, options);
-  return chosen;
+  return {chosen, "", true};
 }
 
-/// What a build that was killed left of a side-car goes as well, unless single levels are named.
-std::vector<LevelDescription> CleanBeside(const CleanOptions& options, const std::string& file,
-                                          bool& hasReclaimed) {
-  const std::unique_ptr<IDataset> dataset(
-      DatasetManager::GetInstance()->OpenFormat("ZMBALL", file, datasources::kReadOnly));
-  ILevelStore* store = LevelsOf(*dataset);
+/// What a build that was killed left of a side-car goes as well, and a side-car of an image of
+/// another size, unless single levels are named.
+Removed CleanBeside(const CleanOptions& options, const std::string& file) {
+  const auto site = DatasetManager::GetInstance()->OpenSite(file, datasources::kReadOnly);
+  ILevelStore* store = site->LevelsIn(LevelPlace::kSideCar);
   const auto chosen = Chosen(store, LevelPlace::kSideCar, options);
+  const auto leftOver = options.levels.empty() ? site->FindLeftOver() : std::nullopt;
+  if (leftOver) {
+    site->RemoveLeftOver();
+    return {{}, leftOver->file, false};
+  }
   const bool reclaims = store && store->HasReclaimableSpace();
   if (store && (reclaims || !chosen.empty() || options.levels.empty()))
     RemoveFrom(*store, chosen, options);
-  hasReclaimed = hasReclaimed || reclaims;
-  return chosen;
+  return {chosen, "", reclaims};
 }
 
 std::string RemovedText(const std::vector<LevelDescription>& removed) {
@@ -104,10 +110,15 @@ std::string RemovedText(const std::vector<LevelDescription>& removed) {
 ExitCode TryPlace(const auto& clean, const CleanOptions& options, const std::string& file,
                   bool& hasRemoved, bool& hasReclaimed, Console& console) {
   try {
-    const std::vector<LevelDescription> removed = clean(options, file, hasReclaimed);
-    if (removed.empty()) return kDone;
+    const Removed removed = clean(options, file);
+    hasReclaimed = hasReclaimed || removed.hasReclaimed;
+    if (removed.levels.empty() && removed.leftOver.empty()) return kDone;
     hasRemoved = true;
-    console.Result(AfterFileName(file, RemovedText(removed)));
+    if (!removed.levels.empty()) console.Result(AfterFileName(file, RemovedText(removed.levels)));
+    if (!removed.leftOver.empty())
+      console.Result(AfterFileName(
+          file, FormatString(_("removed %s, which held levels of an image of another size"),
+                             removed.leftOver.c_str())));
     return kDone;
   } catch (const Exception& error) {
     console.Error(AfterFileName(file, error.GetMessage()));

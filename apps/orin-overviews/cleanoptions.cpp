@@ -26,7 +26,8 @@ CLI::App* AddCleanCommand(CLI::App& app, CleanOptions& options) {
       "--external", [&] { options.placement = Placement::kExternal; },
       _("Remove levels in the file beside it only"));
   command->add_flag("--quiet", options.quiet, _("Print warnings and errors only"));
-  command->final_callback([=] {
+  command->final_callback([=, &options] {
+    RefuseLevelsAmongFiles(options.files);
     if (internal->count() && external->count())
       throw CLI::ValidationError(
           internal->get_name(),

@@ -6,6 +6,8 @@
 #include <CLI/Formatter.hpp>
 
 #include "apps/orin-overviews/exitcode.h"
+#include "apps/orin-overviews/nearestword.h"
+#include "apps/orin-overviews/terminaltext.h"
 #include "host/services/text.h"
 
 namespace orin::app {
@@ -31,14 +33,36 @@ std::string NamesOf(const std::vector<std::string>& arguments) {
   return names;
 }
 
+/// The long names of the options that the command line may hold.
+std::vector<std::string> OptionsOf(const CLI::App& app) {
+  std::vector<std::string> names;
+  const auto add = [&](const CLI::App& part) {
+    for (const CLI::Option* option : part.get_options())
+      for (const std::string& name : option->get_lnames()) names.push_back("--" + name);
+  };
+  add(app);
+  for (const CLI::App* command : app.get_subcommands()) add(*command);
+  return names;
+}
+
+std::string MissingText(const CLI::App& app) {
+  if (!app.get_subcommands().empty()) return _("a FILE is needed");
+  const std::vector<std::string> words = app.remaining();
+  if (words.empty()) return _("a sub-command is needed: build, info or clean");
+  return FormatString(_("unknown sub-command: %s; there are build, info and clean."),
+                      words.front().c_str()) +
+         SuggestionFor(words.front(), {"build", "info", "clean"});
+}
+
 /// What is wrong with the command line, in the user's language.
 std::string ProblemOf(const CLI::ParseError& error, const CLI::App& app) {
   const std::string text = error.what();
-  if (dynamic_cast<const CLI::ExtrasError*>(&error))
-    return FormatString(_("unknown argument: %s"), NamesOf(app.remaining(true)).c_str());
-  if (dynamic_cast<const CLI::RequiredError*>(&error))
-    return app.get_subcommands().empty() ? _("a sub-command is needed: build, info or clean")
-                                         : _("a FILE is needed");
+  if (dynamic_cast<const CLI::ExtrasError*>(&error)) {
+    const std::vector<std::string> words = app.remaining(true);
+    return FormatString(_("unknown argument: %s"), NamesOf(words).c_str()) +
+           (words.empty() ? "" : SuggestionFor(words.front(), OptionsOf(app)));
+  }
+  if (dynamic_cast<const CLI::RequiredError*>(&error)) return MissingText(app);
   if (dynamic_cast<const CLI::ArgumentMismatch*>(&error))
     return FormatString(_("%s: takes exactly one value"), text.substr(0, text.find(':')).c_str());
   return text;
@@ -49,7 +73,7 @@ int Refuse(const CLI::ParseError& error, const CLI::App& app) {
   const auto used = app.get_subcommands();
   const std::string help =
       std::string(kProgram) + (used.empty() ? "" : " " + used.front()->get_name()) + " --help";
-  fmt::print(stderr, "{}: {}\n", kProgram, problem);
+  fmt::print(stderr, "{}: {}\n", kProgram, Printable(problem));
   fmt::print(stderr, "{}\n", FormatString(_("Try: %s"), help.c_str()));
   return kWrongUsage;
 }

@@ -5,7 +5,9 @@
 #include <spdlog/sinks/basic_file_sink.h>
 #include <spdlog/sinks/stdout_sinks.h>
 
+#include <cerrno>
 #include <cstdio>
+#include <cstring>
 #include <string_view>
 
 #include "apps/orin-overviews/terminaltext.h"
@@ -65,11 +67,22 @@ void Console::Say(spdlog::level::level_enum level, bool shown, const std::string
   });
 }
 
+/// A reader at the other end of a pipe sees it when it happens, or is gone, which ends no build.
+void Console::Print(const std::string& text) {
+  if (!outputProblem_.empty()) return;
+  if (makeRoom_) makeRoom_();
+  errno = 0;
+  const bool isWritten = std::fwrite(text.data(), 1, text.size(), stdout) == text.size();
+  if (std::fflush(stdout) != 0 || !isWritten) outputProblem_ = std::strerror(errno);
+}
+
+void Console::Output(const std::string& text) { Print(text); }
+
 void Console::Result(const std::string& text) {
   if (!settings_.quiet) {
-    if (makeRoom_) makeRoom_();
-    ForEachLine(text, [](std::string_view line) { fmt::print("{}\n", Printable(line)); });
-    std::fflush(stdout);  // a reader at the other end of a pipe sees it when it happens
+    std::string lines;
+    ForEachLine(text, [&](std::string_view line) { lines += Printable(line) + '\n'; });
+    Print(lines);
   }
   Say(spdlog::level::info, false, text);
 }

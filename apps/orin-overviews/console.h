@@ -24,6 +24,10 @@ class Console {
   explicit Console(const Settings& settings);
 
   void Result(const std::string& text);
+  /// The same for a text that is printed as it is, and not recorded.
+  void Output(const std::string& text);
+  /// Why results could not be written; empty: they were.
+  const std::string& OutputProblem() const { return outputProblem_; }
   /// Something worth knowing that is neither wrong nor asked for.
   void Notice(const std::string& text);
   void Warning(const std::string& text);
@@ -35,12 +39,14 @@ class Console {
   void BeforeLine(std::function<void()> makeRoom) { makeRoom_ = std::move(makeRoom); }
 
  private:
+  void Print(const std::string& text);
   void Say(spdlog::level::level_enum level, bool shown, const std::string& text);
 
   Settings settings_;
   std::shared_ptr<spdlog::logger> terminal_;  ///< standard error
   std::shared_ptr<spdlog::logger> log_;       ///< null: no log file
   std::function<void()> makeRoom_;
+  std::string outputProblem_;
 };
 
 /// Warnings and events of the library go to `console` while it lives.

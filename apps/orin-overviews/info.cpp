@@ -1,8 +1,6 @@
 // SPDX-License-Identifier: MIT
 #include "apps/orin-overviews/info.h"
 
-#include <fmt/core.h>
-
 #include <algorithm>
 
 #include "apps/orin-overviews/rasterinfo.h"
@@ -25,8 +23,8 @@ bool AreUpToDate(const std::vector<datasources::LevelDescription>& levels) {
 ExitCode RunInfo(const InfoOptions& options, Console& console) {
   try {
     const RasterInfo info = CollectInfo(options.file);
-    fmt::print("{}", options.json ? JsonOf(info) : TableOf(info));
-    return AreUpToDate(info.levels) ? kDone : kNotUpToDate;
+    console.Output(options.json ? JsonOf(info) : TableOf(info));
+    return AreUpToDate(info.levels) && !info.leftOver ? kDone : kNotUpToDate;
   } catch (const Exception& error) {
     console.Error(AfterFileName(options.file, error.GetMessage()));
     return kCannotOpen;

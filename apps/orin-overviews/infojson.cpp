@@ -52,6 +52,13 @@ Json JsonOf(const LevelDescription& level) {
           {"channels", ChannelsOf(level)}};
 }
 
+Json LeftOverOf(const RasterInfo& info) {
+  if (!info.leftOver) return {};
+  return {{"file", info.leftOver->file},
+          {"width", info.leftOver->width},
+          {"height", info.leftOver->height}};
+}
+
 }  // namespace
 
 std::string JsonOf(const RasterInfo& info) {
@@ -66,9 +73,11 @@ std::string JsonOf(const RasterInfo& info) {
       {"width", info.width},
       {"height", info.height},
       {"channels", channels},
+      {"cloudOptimized", info.isCloudOptimized},
       {"mask", info.hasMask},
       {"alphaChannel", info.alphaChannel ? Json(info.alphaChannel) : Json()},
-      {"levels", levels}};
+      {"levels", levels},
+      {"leftOver", LeftOverOf(info)}};
   // A file name need not be UTF-8, JSON must be.
   return all.dump(2, ' ', false, Json::error_handler_t::replace) + "\n";
 }

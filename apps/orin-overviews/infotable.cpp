@@ -7,6 +7,7 @@
 
 #include "apps/orin-overviews/numberlist.h"
 #include "apps/orin-overviews/rasterinfo.h"
+#include "apps/orin-overviews/terminaltext.h"
 #include "host/services/text.h"
 
 namespace orin::app {
@@ -46,7 +47,7 @@ std::string ValidityText(const RasterInfo& info) {
 std::string PlaceText(const LevelDescription& level) {
   if (level.isInSubDirectory) return _("inside (SubIFD)");
   if (level.place == datasources::LevelPlace::kInternal) return _("inside");
-  return std::filesystem::path(level.file).filename().string();
+  return Printable(std::filesystem::path(level.file).filename().string());
 }
 
 /// "yes", "no", the channels that are up to date, or what else is known.
@@ -62,16 +63,10 @@ std::string ValidText(const LevelDescription& level) {
   return FormatString(_("channels %s"), JoinNumbers(valid).c_str());
 }
 
-/// A text that a file holds, which may be anything: cut short, and without what would steer a
-/// terminal.
+/// A text that a file holds, which may be anything: cut short, and safe to print.
 std::string ShownText(const std::string& text) {
-  constexpr size_t kMostBytes = 60;
-  std::string shown = text.substr(0, kMostBytes);
-  for (size_t i = 0; i < shown.size(); ++i) {
-    const auto byte = static_cast<unsigned char>(shown[i]);
-    const bool isSecondControl = i > 0 && shown[i - 1] == '\xC2' && byte >= 0x80 && byte < 0xA0;
-    if (byte < ' ' || byte == 0x7F || isSecondControl) shown[i] = '?';
-  }
+  constexpr size_t kMaxBytes = 60;
+  const std::string shown = Printable(text.substr(0, kMaxBytes));
   return shown.empty() ? "-" : shown;
 }
 
@@ -113,10 +108,18 @@ std::string TextOf(const std::vector<Row>& rows) {
 }  // namespace
 
 std::string TableOf(const RasterInfo& info) {
-  std::string text = FormatString(_("%s: %u x %u pixels, channels: %zu (%s), %s\n"),
-                                  info.file.c_str(), info.width, info.height, info.channels.size(),
-                                  TypesText(info.channels).c_str(), info.formatDescription.c_str());
+  std::string text =
+      FormatString(_("%s: %u x %u pixels, channels: %zu (%s), %s\n"), Printable(info.file).c_str(),
+                   info.width, info.height, info.channels.size(), TypesText(info.channels).c_str(),
+                   info.formatDescription.c_str());
+  if (info.isCloudOptimized) text += _("layout: cloud optimized GeoTIFF\n");
   text += ValidityText(info);
+  if (info.leftOver)
+    text += FormatString(_("%s holds levels of an image of another size (%u x %u pixels), which "
+                           "other programs read. "
+                           "build --external replaces it, clean removes it.\n"),
+                         Printable(info.leftOver->file).c_str(), info.leftOver->width,
+                         info.leftOver->height);
   if (info.levels.empty()) return text + _("no overview levels\n");
   const bool tellsOfMasks = TellsOfMasks(info);
   Row heading = {_("level"), _("size"), _("place"), _("method"), _("from"), _("valid")};

@@ -2,10 +2,8 @@
 // SPDX-License-Identifier: MIT
 #include <fmt/core.h>
 
-#include <cerrno>
 #include <csignal>
 #include <cstdio>
-#include <cstring>
 
 #include "apps/orin-overviews/build.h"
 #include "apps/orin-overviews/clean.h"
@@ -14,6 +12,7 @@
 #include "apps/orin-overviews/exitcode.h"
 #include "apps/orin-overviews/info.h"
 #include "apps/orin-overviews/locale.h"
+#include "apps/orin-overviews/terminaltext.h"
 #ifdef ORIN_HAS_GDAL
 #include "host/drivers/gdal/gdaldriver.h"
 #endif
@@ -52,10 +51,12 @@ int Run(const Invocation& invocation) {
 #ifdef ORIN_HAS_GDAL
   orin::drivers::RegisterGdalDriver();  // after it: local TIFF files are the TIFF driver's
 #endif
-  PreferenceRegistry::Install(orin::LoadPreferences(orin::PreferenceFilePath()));
+  PreferenceRegistry::Install(
+      orin::LoadPreferences(orin::PreferenceFilePath(), orin::IsPreferenceFileNamed()));
   const ExitCode code = RunCommand(invocation, console);
-  if (std::fflush(stdout) == 0 && !std::ferror(stdout)) return code;
-  console.Error(FormatString(_("The output cannot be written: %s."), std::strerror(errno)));
+  if (console.OutputProblem().empty()) return code;
+  console.Error(
+      FormatString(_("The output cannot be written: %s."), console.OutputProblem().c_str()));
   return code == kDone ? kCannotBuild : code;
 }
 
@@ -70,9 +71,9 @@ int main(int argc, char** argv) {
     if (const auto ended = ParseCommandLine(argc, argv, invocation)) return *ended;
     return Run(invocation);
   } catch (const orin::Exception& error) {
-    fmt::print(stderr, "orin-overviews: {}\n", error.GetMessage());
+    fmt::print(stderr, "orin-overviews: {}\n", Printable(error.GetMessage()));
   } catch (const std::exception& error) {
-    fmt::print(stderr, "orin-overviews: {}\n", error.what());
+    fmt::print(stderr, "orin-overviews: {}\n", Printable(error.what()));
   }
   return kCannotBuild;
 }

@@ -28,12 +28,11 @@ void AddHidden(const datasources::ILevelStore& store,
 }  // namespace
 
 RasterInfo CollectInfo(const std::string& file) {
+  const auto site =
+      datasources::DatasetManager::GetInstance()->OpenSite(file, datasources::kReadOnly);
   // The generic layer lists the levels inside the file and those beside it together.
-  const std::unique_ptr<datasources::IDataset> dataset(
-      datasources::DatasetManager::GetInstance()->OpenFormat("ZMBALL", file,
-                                                             datasources::AccessMode::kReadOnly));
-  auto* raster = dynamic_cast<datasources::IRasterDataset*>(dataset.get());
-  if (!raster)
+  const auto raster = site->DatasetFor(datasources::LevelPlace::kSideCar);
+  if (raster->GetChannelCount() == 0)
     throw Exception(FormatString(_("%s: holds no raster."), file.c_str()),
                     "apps/orin-overviews/rasterinfo", "orin::app::CollectInfo(const std::string&)",
                     0);
@@ -50,11 +49,13 @@ RasterInfo CollectInfo(const std::string& file) {
         std::unique_ptr<datasources::IChannelInfo>(raster->GetChannelInfo(channel))->GetDataType());
   info.hasMask = raster->GetSource()->HasMask();
   info.alphaChannel = raster->GetSource()->AlphaChannel();
+  info.isCloudOptimized = raster->GetSource()->IsCloudOptimized();
   const std::unique_ptr<datasources::IOverviewInfo> levels(raster->GetOverviewInfo());
   auto* store = raster->GetSource()->Levels();
   if (store) store->KeepAnswers();
   if (levels) info.levels = levels->Describe();
   if (store) AddHidden(*store, info.levels);
+  info.leftOver = site->FindLeftOver();
   return info;
 }
 

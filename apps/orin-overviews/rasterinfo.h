@@ -2,11 +2,13 @@
 // SPDX-License-Identifier: MIT
 #pragma once
 
+#include <optional>
 #include <string>
 #include <vector>
 
 #include "basic/gobs/datatype.h"
 #include "host/datasources/dataset.h"
+#include "host/datasources/levelsite.h"
 
 namespace orin::app {
 
@@ -20,6 +22,8 @@ struct RasterInfo {
   std::vector<datasources::LevelDescription> levels;  ///< ascending, those in both places twice
   bool hasMask = false;       ///< of the image, inside its file or beside it
   unsigned alphaChannel = 0;  ///< 1-based, 0: none
+  bool isCloudOptimized = false;
+  std::optional<datasources::LeftOver> leftOver;  ///< beside it, of an image of another size
 };
 
 /// \throws orin::Exception  the file cannot be opened or is no raster

@@ -1,11 +1,14 @@
 // SPDX-License-Identifier: MIT
 #include "host/datasources/levelsite.h"
 
+#include <filesystem>
+#include <system_error>
 #include <utility>
 
 #include "host/datasources/genericlayer.h"
 #include "host/datasources/sourcedataset.h"
 #include "host/services/exception.h"
+#include "host/services/text.h"
 
 namespace orin::datasources {
 
@@ -37,6 +40,29 @@ const std::shared_ptr<ILevelStore>& LevelSite::Beside() {
 
 ILevelStore* LevelSite::LevelsIn(LevelPlace place) {
   return place == LevelPlace::kInternal ? image_->Levels() : Beside().get();
+}
+
+std::optional<LeftOver> LevelSite::FindLeftOver() {
+  const std::string sideCar = file_ + ".ovr";
+  std::error_code unknown;
+  if (!isPath_ || !std::filesystem::is_regular_file(sideCar, unknown)) return std::nullopt;
+  if (!Beside()->List().empty()) return std::nullopt;
+  ZMBFormatType code = kFormatUnknown;
+  IFormatDriver* driver = FormatRegistry::Instance().DriverOf(sideCar, code);
+  if (!driver || code != kFormatTiff) return std::nullopt;
+  const auto largest = driver->Open(sideCar, kReadOnly);
+  return LeftOver{sideCar, largest->Width(), largest->Height()};
+}
+
+void LevelSite::RemoveLeftOver() {
+  const auto leftOver = FindLeftOver();
+  if (!leftOver) return;
+  beside_.reset();  // it knows the file
+  std::error_code error;
+  if (!std::filesystem::remove(leftOver->file, error) && error)
+    throw Exception(FormatString(_("%s: cannot be removed: %s."), leftOver->file.c_str(),
+                                 error.message().c_str()),
+                    "host/datasources/levelsite", "LevelSite::RemoveLeftOver()", 0);
 }
 
 std::unique_ptr<IRasterDataset> LevelSite::DatasetFor(LevelPlace place) {

@@ -3,12 +3,20 @@
 #pragma once
 
 #include <memory>
+#include <optional>
 #include <string>
 
 #include "host/datasources/formats.h"
 #include "host/datasources/levelstore.h"
 
 namespace orin::datasources {
+
+/// A side-car that holds levels of an image of another size, and none of this one.
+struct LeftOver {
+  std::string file;
+  unsigned width;   ///< pixels of its largest level
+  unsigned height;  ///< pixels
+};
 
 /// Shows the levels of both places before anybody decides where new ones go.
 class LevelSite {
@@ -29,6 +37,12 @@ class LevelSite {
   /// The levels in that place; null when the format holds none inside. Owned by the site.
   /// \throws orin::Exception  a side-car is there and cannot be read
   ILevelStore* LevelsIn(LevelPlace place);
+  /// What an image of another size left under the name of this one. Other programs read it.
+  std::optional<LeftOver> FindLeftOver();
+  /// Takes it away. \pre no dataset of the site is alive
+  /// \throws orin::Exception  it cannot be removed
+  void RemoveLeftOver();
+
   /// The raster as a dataset whose new levels go to `place`. It shares what the site has open.
   /// \throws orin::Exception  as `LevelsIn`
   std::unique_ptr<IRasterDataset> DatasetFor(LevelPlace place);

@@ -24,9 +24,9 @@ std::unique_ptr<PreferenceRegistry>& Installed() {
 }
 
 void WarnAt(const std::string& path, unsigned int line, const std::string& problem) {
+  const std::string place = line == 0 ? path : path + ":" + std::to_string(line);
   orin::tarn::Warning::Warn(
-      FormatString(_("%s:%u: %s The defaults apply."), path.c_str(), line, problem.c_str()),
-      kSource, line);
+      FormatString(_("%s: %s The defaults apply."), place.c_str(), problem.c_str()), kSource, line);
 }
 
 std::optional<int> MethodOf(const toml::node& node) {
@@ -72,6 +72,24 @@ std::optional<toml::table> Parse(const std::string& path) {
   }
 }
 
+void WarnOfUnknownKey(const toml::key& key, const std::string& path) {
+  const unsigned int line = key.source().begin.line;
+  orin::tarn::Warning::Warn(
+      FormatString(_("%s:%u: Unknown key \"%s\"; in [raster-layer] there are overview-method and "
+                     "decimation-factor."),
+                   path.c_str(), line, std::string(key.str()).c_str()),
+      kSource, line);
+}
+
+void WarnOfUnknownKeys(const toml::table& file, const std::string& path) {
+  for (const auto& [key, node] : file)
+    if (key != "raster-layer") WarnOfUnknownKey(key, path);
+  const toml::table* known = file["raster-layer"].as_table();
+  if (!known) return;
+  for (const auto& [key, node] : *known)
+    if (key != "overview-method" && key != "decimation-factor") WarnOfUnknownKey(key, path);
+}
+
 }  // namespace
 
 PreferenceRegistry* PreferenceRegistry::Get() { return Installed().get(); }
@@ -92,20 +110,25 @@ std::string PreferenceFilePath() {
   return "";
 }
 
-std::unique_ptr<PreferenceRegistry> LoadPreferences(const std::string& path) {
+bool IsPreferenceFileNamed() {
+  return !core::QRTGetEnvironmentVariable("ORIN_PREFERENCES").empty();
+}
+
+std::unique_ptr<PreferenceRegistry> LoadPreferences(const std::string& path, bool mustExist) {
   auto registry = std::make_unique<PreferenceRegistry>();
   int method = kDefaultMethod;
   int factor = kDefaultFactor;
   std::error_code ignored;
   if (!path.empty() && std::filesystem::exists(path, ignored)) {
     if (const auto file = Parse(path)) {
+      WarnOfUnknownKeys(*file, path);
       method =
           Entry(*file, "overview-method", method,
                 _("overview-method must be \"nearest\", \"average\" or \"mode\"."), path, MethodOf);
       factor = Entry(*file, "decimation-factor", factor, _("decimation-factor must be 2 or 3."),
                      path, FactorOf);
     }
-  }
+  } else if (mustExist) WarnAt(path, 0, _("The preference file does not exist."));
   registry->Set("", RasterLayerPreference(method, factor));
   return registry;
 }

@@ -60,6 +60,8 @@ namespace orin {
 /// Path of the preference file: `$ORIN_PREFERENCES`, else `$XDG_CONFIG_HOME/orin/preferences.toml`,
 /// else `$HOME/.config/orin/preferences.toml`; empty when none of the variables is set.
 std::string PreferenceFilePath();
+/// True when `$ORIN_PREFERENCES` names that file, so that somebody expects it to be there.
+bool IsPreferenceFileNamed();
 
 /// Reads a preference file into a new registry.
 ///
@@ -67,8 +69,10 @@ std::string PreferenceFilePath();
 ///     overview-method   = "average"   # or 1; nearest 0, average 1, mode 2
 ///     decimation-factor = 3           # 2 or 3
 ///
-/// A file that does not exist is no error. A file that cannot be read, is not TOML or holds a value
-/// that cannot be used is reported through `Warning` with file and line, and the defaults apply.
-std::unique_ptr<PreferenceRegistry> LoadPreferences(const std::string& path);
+/// A file that cannot be read, is not TOML or holds a value that cannot be used is reported through
+/// `Warning` with file and line, and the defaults apply; so is a key that has no meaning.
+/// \param mustExist  a file that does not exist is reported, too
+std::unique_ptr<PreferenceRegistry> LoadPreferences(const std::string& path,
+                                                    bool mustExist = false);
 
 }  // namespace orin

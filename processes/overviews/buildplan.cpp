@@ -69,6 +69,8 @@ BuildPlan Planner::Plan() {
   CollectWanted();
   ChooseLevels();
   AddDescendants();
+  plan_.replacesLeftOver =
+      facts_.leftOver && plan_.place == LevelPlace::kSideCar && !plan_.building.empty();
   CheckBuilding();
   return plan_;
 }
@@ -154,6 +156,7 @@ std::optional<Reason> Planner::ReasonToBuild(unsigned level) const {
   const LevelDescription* stored = Find(level);
   if (!stored) return Reason::kMissing;
   if (stored->status == LevelStatus::kStale) return Reason::kStale;
+  if (IsOutOfDate(*stored) && stored->status != LevelStatus::kUnfinished) return Reason::kChanged;
   if (!datasources::HoldsForAll(stored->validChannels, plan_.channels)) return Reason::kUnfinished;
   if (request_.force) return Reason::kForced;
   if (request_.method && stored->method != StoredNameOf(*request_.method))

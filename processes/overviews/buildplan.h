@@ -32,6 +32,7 @@ enum class Reason {
   kMissing,
   kUnfinished,
   kStale,
+  kChanged,        ///< another program wrote into it
   kSourceRebuilt,  ///< it was computed from a level that is built again
   kOtherMethod,    ///< than the one named
   kOtherForm,      ///< than the options say
@@ -61,7 +62,8 @@ struct BuildPlan {
 
   datasources::LevelPlace place = datasources::LevelPlace::kInternal;
   PlaceReason placeReason = PlaceReason::kUsual;
-  bool inOnePass = false;  ///< all channels at once
+  bool inOnePass = false;         ///< all channels at once
+  bool replacesLeftOver = false;  ///< a side-car of an image of another size goes first
   std::vector<unsigned> channels;
   std::vector<unsigned> wanted;        ///< levels asked for or out of date, not empty, ascending
   std::vector<unsigned> kept;          ///< of these: present, valid and not to be built

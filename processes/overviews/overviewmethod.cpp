@@ -16,9 +16,8 @@ std::string StoredNameOf(QRTOverviewResampleType type) {
 }
 
 QRTOverviewResampleType TypeOfStoredName(const std::string& name) {
-  for (const model::Method& method : model::kMethods)
-    if (method.name == name) return method.type;
-  return ResampleInvalid;
+  const model::Method* const method = model::FindMethod(std::string_view(name));
+  return method ? method->type : ResampleInvalid;
 }
 
 bool Blends(QRTOverviewResampleType type) {

@@ -41,6 +41,7 @@ RasterFacts FactsOf(datasources::LevelSite& site, const datasources::LevelOption
   facts.isWritable = dataset->GetAccessMode() == datasources::kUpdate;
   facts.inside = FactsIn(site, LevelPlace::kInternal, storing);
   facts.beside = FactsIn(site, LevelPlace::kSideCar, storing);
+  facts.leftOver = site.FindLeftOver();
   return facts;
 }
 

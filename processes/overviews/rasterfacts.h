@@ -3,6 +3,7 @@
 #pragma once
 
 #include <cstdint>
+#include <optional>
 #include <string>
 #include <vector>
 
@@ -24,9 +25,10 @@ struct RasterFacts {
   std::vector<gobs::DataType> channels;
   bool isTiff = false;            ///< inside, all channels are treated in one pass
   bool isCloudOptimized = false;  ///< levels that are added inside cost the file this property
-  bool isCategorical = false;     ///< pixels number colours of a palette, or classes
-  bool holdsLevels = false;       ///< the format keeps levels inside
-  bool isWritable = false;        ///< the file is open for update
+  std::optional<datasources::LeftOver> leftOver;  ///< beside, of an image of another size
+  bool isCategorical = false;  ///< pixels number colours of a palette, or classes
+  bool holdsLevels = false;    ///< the format keeps levels inside
+  bool isWritable = false;     ///< the file is open for update
   PlaceFacts inside;
   PlaceFacts beside;
 

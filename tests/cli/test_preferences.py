@@ -41,6 +41,18 @@ class Preferences(Case):
 
 
 class BadPreferences(Case):
+    def test_a_named_file_that_is_missing_is_reported(self):
+        missing = self.path("none.toml")
+        answer = run("info", self.path("missing.tif"), ORIN_PREFERENCES=missing)
+        self.assertIn(f"orin-overviews: {missing}: The preference file does not exist.",
+                      answer.stderr)
+
+    def test_unknown_keys_are_reported(self):
+        file, errors = self.warning('[raster-layer]\noverview-metod = "average"\n'
+                                    "[raster]\ndecimation-factor = 3\n")
+        self.assertIn(f'{file}:2: Unknown key "overview-metod"', errors)
+        self.assertIn(f'{file}:3: Unknown key "raster"', errors)
+
     def warning(self, text):
         """Standard error of a run whose preference file holds `text`."""
         preferences = self.path("bad.toml", text)

@@ -258,8 +258,10 @@ class Palette(Case):
             self.assertEqual("", answer.stdout)
 
     def test_nothing_is_said_when_nothing_is_built(self):
-        for method in ("nearest", "average"):
-            answer = run("build", self.file, "--levels", "2", "--method", method)
+        self.assertRan(run("build", self.file, "--levels", "2", "--method", "average"))
+        for method in ([], ["--method", "average"]):
+            answer = run("build", self.file, "--levels", "2", *method)
+            self.assertIn("nothing to do", answer.stdout)
             self.assertEqual("", answer.stderr)
 
     def test_named_classes_are_warned_of_too(self):

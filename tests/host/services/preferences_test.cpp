@@ -122,7 +122,7 @@ TEST_F(Preferences, WrongKindsAndRangesOfValuesAreRefused) {
 TEST_F(Preferences, AFileThatCannotBeReadIsReported) {
   ExpectDefaults(*LoadPreferences(directory_.string()));
   ASSERT_EQ(1u, warnings_.size());
-  EXPECT_EQ(directory_.string() + ":0: The preference file cannot be read. The defaults apply.",
+  EXPECT_EQ(directory_.string() + ": The preference file cannot be read. The defaults apply.",
             warnings_[0].message);
 }
 
