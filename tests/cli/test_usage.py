@@ -79,7 +79,7 @@ class FilesThatCannotBeOpened(Case):
                     self.assertTrue(answer.stderr.startswith(f"orin-overviews: {file}: "),
                                     answer.stderr)
                     self.assertIn(reason, answer.stderr)
-                    self.assertEqual(1, answer.stderr.count(file))
+                    self.assertEqual(1, answer.stderr.count(f"{file}: "))
 
     def test_each_of_several_files_is_reported(self):
         first, second = self.path("one.tif"), self.path("two.tif")
