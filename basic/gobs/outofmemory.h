@@ -12,7 +12,8 @@
 namespace orin {
 
 /// A failure like any other to who handles the host's exceptions, and `std::bad_alloc` to who
-/// handles those. Catch one of these two: as `std::exception`, which it is twice, it is not caught.
+/// handles those. Catch one of these two, or everything: as `std::exception`, which it is twice, it
+/// is not caught.
 class OutOfMemory : public Exception, public std::bad_alloc {
  public:
   using Exception::Exception;

@@ -3,7 +3,7 @@
 
 #include <algorithm>
 #include <charconv>
-#include <exception>
+#include <system_error>
 
 #include <sys/stat.h>
 
@@ -129,7 +129,7 @@ std::string ImageWatch::Compute(const std::stop_token& stop) const {
     both.AddText(fingerprint);
     both.AddText(FingerprintOfFile(mask, stop));
     return stop.stop_requested() ? "" : both.Text();
-  } catch (const std::exception&) {
+  } catch (...) {
     return {};
   }
 }
@@ -142,9 +142,14 @@ void ImageWatch::Start(const ImageStamp& stamp) {
   std::promise<std::string> promise;
   result_ = promise.get_future().share();
   computing_ = stamp;
-  worker_ = std::jthread([this, promise = std::move(promise)](const std::stop_token& stop) mutable {
-    promise.set_value(Compute(stop));
-  });
+  try {
+    worker_ =
+        std::jthread([this, promise = std::move(promise)](const std::stop_token& stop) mutable {
+          promise.set_value(Compute(stop));
+        });
+  } catch (const std::system_error&) {
+    computing_.reset();  // without a thread it is computed when it is asked for
+  }
 }
 
 std::string ImageWatch::Fingerprint(const ImageStamp& stamp) {

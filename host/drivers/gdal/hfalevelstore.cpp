@@ -77,7 +77,7 @@ HfaLevelStore::~HfaLevelStore() {
   try {
     if (isChanged_) ReclaimSpace();
     CommitStamps();
-  } catch (const std::exception&) {
+  } catch (...) {
     // deliberate: nothing is lost but space, which the next change finds again
   }
 }
@@ -253,7 +253,7 @@ void HfaLevelStore::EndWriting(HfaLevelBuild& build) noexcept {
   created_.erase(build.Level());
   try {
     CommitStamps();
-  } catch (const std::exception&) {
+  } catch (...) {
     // deliberate: records with an old stamp cost the next answer a reading of the image
   }
 }
@@ -397,7 +397,7 @@ void HfaLevelStore::KeepAnswers() {
     LockFile();
     freshness_.UpdateStamps(catalogue_, fingerprint, *now, *file_);
     Reload();
-  } catch (const std::exception&) {
+  } catch (...) {
     // deliberate: a file that cannot be written, or is being written, is no failure of a question
   }
   if (!wasLocked) file_.reset();

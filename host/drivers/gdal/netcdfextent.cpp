@@ -129,7 +129,7 @@ class Header {
 uint64_t EndOfClassicNetcdf(const std::string& path) {
   try {
     return Header(path).End();
-  } catch (const std::exception&) {
+  } catch (...) {
     return 0;  // the library reports what it cannot read
   }
 }

@@ -22,7 +22,7 @@ PatchedFile::~PatchedFile() {
   HideFromLibrary(libraryName_);
   try {
     if (!isKept_ && size_ > end_) file_.Truncate(end_);
-  } catch (const std::exception&) {
+  } catch (...) {
     // deliberate: what is left behind is at the file's end, and nothing refers to it
   }
 }

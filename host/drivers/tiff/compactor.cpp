@@ -181,7 +181,7 @@ void Compactor::Relocate(const Move& move) {
     appender.Keep();  // first: a link that fails half-way may point there already
     for (const auto& [position, copied] : links) appender.Link(position, copied);
     file_.Sync();
-  } catch (const std::exception&) {
+  } catch (...) {
     appender.CutBackTo(end);
     throw;
   }
@@ -241,7 +241,7 @@ void Compactor::Compact() {
   try {
     for (int step = 0; step < kMaxSteps && TakeStep(evacuated); ++step) {
     }
-  } catch (const std::exception&) {
+  } catch (...) {
     // deliberate: no level is harmed, and the next change tries again
   }
   Parse();

@@ -125,7 +125,7 @@ void RestampLevels(const LevelFile& levelFile, const std::vector<const StoredLev
       file->Write(StampPosition(*level), text.data(), text.size());
     }
     if (isInImage) file->SetModified(stamp.modified);
-  } catch (const std::exception&) {
+  } catch (...) {
     // deliberate: a file that cannot be written, or is being written, is no failure of a question
   }
 }

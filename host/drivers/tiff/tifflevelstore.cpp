@@ -42,7 +42,7 @@ TiffLevelStore::~TiffLevelStore() {
     file_->Reclaim();
     Reload();
     Settle();
-  } catch (const std::exception&) {
+  } catch (...) {
     // deliberate: nothing is lost but space, which the next change finds again
   }
 }
@@ -345,13 +345,13 @@ void TiffLevelStore::EndWriting(unsigned level, LevelBuild& build) noexcept {
     if (isWaited) StoreWaiting(level);
     else if (!build.IsEmpty() && build.HasOnlyCompletePlanes())
       Store(level, pending_.at(level), CompletePlanes(build), std::move(build.mask), std::nullopt);
-  } catch (const std::exception&) {
+  } catch (...) {
     // deliberate: a destructor calls this; the level stays what it was in the file
   }
   try {
     if (!build.isClosed) GiveUp(level, build);
     Settle();
-  } catch (const std::exception&) {
+  } catch (...) {
     // deliberate: what was appended stays behind unused
   }
 }

@@ -74,12 +74,17 @@ std::string MaskFileOf(const std::string& imageFile) {
   return std::filesystem::is_regular_file(path, ignored) ? path : "";
 }
 
-/// An image is opened several times by one build.
-void WarnOnce(const std::string& text) {
+bool IsNews(const std::string& text) {
   static std::mutex mutex;
   static std::set<std::string> said;
   const std::lock_guard lock(mutex);
-  if (said.insert(text).second) tarn::Warning::Warn(text, "host/drivers/tiff/tiffmask", 0);
+  return said.insert(text).second;
+}
+
+/// An image is opened several times by one build. No lock is held while the sink runs: it may ask
+/// about the same image.
+void WarnOnce(const std::string& text) {
+  if (IsNews(text)) tarn::Warning::Warn(text, "host/drivers/tiff/tiffmask", 0);
 }
 
 }  // namespace
