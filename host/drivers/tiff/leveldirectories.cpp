@@ -98,9 +98,12 @@ Place PlaceOf(const TiffStructure& structure, size_t index) {
 Place PlaceOfNew(const TiffStructure& structure, const Catalogue& catalogue,
                  const ImageShape& image, uint32_t width, uint32_t height) {
   const auto& directories = structure.directories;
-  size_t index = image.isInFile ? catalogue.NewLevelsBegin() : 0;
+  // Behind the last page that is known there may be more, and a level would not be found again.
+  const size_t begin = structure.isBroken ? 1 : catalogue.NewLevelsBegin();
+  size_t index = image.isInFile ? begin : 0;
   for (; index < directories.size(); ++index) {
     const CatalogueEntry& entry = catalogue.At(index);
+    if (image.isInFile && entry.kind == DirectoryKind::kImage) break;
     const bool isSmaller = uint64_t{entry.width} * entry.height < uint64_t{width} * height;
     if (entry.kind == DirectoryKind::kLevel && isSmaller) break;
   }
