@@ -14,6 +14,7 @@ namespace {
 bool AreUpToDate(const std::vector<datasources::LevelDescription>& levels) {
   return std::none_of(levels.begin(), levels.end(), [](const auto& level) {
     return level.status == datasources::LevelStatus::kStale ||
+           level.status == datasources::LevelStatus::kChanged ||
            level.status == datasources::LevelStatus::kUnfinished;
   });
 }
@@ -22,7 +23,7 @@ bool AreUpToDate(const std::vector<datasources::LevelDescription>& levels) {
 
 ExitCode RunInfo(const InfoOptions& options, Console& console) {
   try {
-    const RasterInfo info = CollectInfo(options.file);
+    const RasterInfo info = CollectInfo(options.file, options.update);
     console.Output(options.json ? JsonOf(info) : TableOf(info));
     return AreUpToDate(info.levels) && !info.leftOver ? kDone : kNotUpToDate;
   } catch (const Exception& error) {

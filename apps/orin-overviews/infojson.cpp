@@ -20,10 +20,36 @@ const char* NameOf(datasources::LevelStatus status) {
       return "stale";
     case datasources::LevelStatus::kUnfinished:
       return "unfinished";
+    case datasources::LevelStatus::kChanged:
+      return "changed";
     case datasources::LevelStatus::kUnverified:
       break;
   }
   return "unverified";
+}
+
+/// A word for programs; null for a level that is not stale.
+Json NameOf(datasources::StaleReason reason) {
+  using datasources::StaleReason;
+  switch (reason) {
+    case StaleReason::kNone:
+      break;
+    case StaleReason::kImageData:
+      return "image";
+    case StaleReason::kCoding:
+      return "storage";
+    case StaleReason::kNoData:
+      return "no-data";
+    case StaleReason::kMask:
+      return "mask";
+    case StaleReason::kAlpha:
+      return "alpha";
+    case StaleReason::kPalette:
+      return "palette";
+    case StaleReason::kSourceRebuilt:
+      return "source-level";
+  }
+  return {};
 }
 
 Json ChannelsOf(const LevelDescription& level) {
@@ -47,6 +73,7 @@ Json JsonOf(const LevelDescription& level) {
           {"sourceLevel", level.sourceLevel ? Json(level.sourceLevel) : Json()},
           {"program", OrNull(level.program)},
           {"state", NameOf(level.status)},
+          {"staleReason", NameOf(level.reason)},
           {"fingerprint", OrNull(level.image.fingerprint)},
           {"mask", level.hasMask},
           {"channels", ChannelsOf(level)}};

@@ -10,6 +10,7 @@ namespace orin::app {
 struct InfoOptions {
   std::string file;
   bool json = false;
+  bool update = false;  ///< keep what had to be read for the answer
 };
 
 /// Adds the sub-command. `options` is filled while the command line is parsed and outlives `app`.

@@ -56,6 +56,7 @@ std::string ValidText(const LevelDescription& level) {
   for (unsigned i = 0; i < level.validChannels.size(); ++i)
     if (level.validChannels[i]) valid.push_back(i + 1);
   if (level.status == datasources::LevelStatus::kStale) return _("stale");
+  if (level.status == datasources::LevelStatus::kChanged) return _("changed");
   if (valid.empty()) return _("no");
   const bool isUnverified = level.status == datasources::LevelStatus::kUnverified;
   if (valid.size() == level.validChannels.size()) return isUnverified ? _("unverified") : _("yes");
@@ -105,6 +106,20 @@ std::string TextOf(const std::vector<Row>& rows) {
   return text;
 }
 
+/// A line for each level that says why it is not what its image asks for, as far as that is known.
+std::string ReasonsText(const RasterInfo& info) {
+  std::string text;
+  for (const LevelDescription& level : info.levels) {
+    if (level.status == datasources::LevelStatus::kChanged)
+      text += FormatString(_("level %u: another program wrote into it after it was built\n"),
+                           level.level);
+    if (level.reason != datasources::StaleReason::kNone)
+      text += FormatString(_("level %u: stale: %s\n"), level.level,
+                           model::TextOf(level.reason).c_str());
+  }
+  return text;
+}
+
 }  // namespace
 
 std::string TableOf(const RasterInfo& info) {
@@ -127,7 +142,7 @@ std::string TableOf(const RasterInfo& info) {
   heading.push_back(_("program"));
   std::vector<Row> rows = {heading};
   for (const LevelDescription& level : info.levels) rows.push_back(RowOf(level, tellsOfMasks));
-  return text + TextOf(rows);
+  return text + TextOf(rows) + ReasonsText(info);
 }
 
 }  // namespace orin::app

@@ -27,7 +27,7 @@ void AddHidden(const datasources::ILevelStore& store,
 
 }  // namespace
 
-RasterInfo CollectInfo(const std::string& file) {
+RasterInfo CollectInfo(const std::string& file, bool keepsAnswers) {
   const auto site =
       datasources::DatasetManager::GetInstance()->OpenSite(file, datasources::kReadOnly);
   // The generic layer lists the levels inside the file and those beside it together.
@@ -52,7 +52,7 @@ RasterInfo CollectInfo(const std::string& file) {
   info.isCloudOptimized = raster->GetSource()->IsCloudOptimized();
   const std::unique_ptr<datasources::IOverviewInfo> levels(raster->GetOverviewInfo());
   auto* store = raster->GetSource()->Levels();
-  if (store) store->KeepAnswers();
+  if (store && keepsAnswers) store->KeepAnswers();
   if (levels) info.levels = levels->Describe();
   if (store) AddHidden(*store, info.levels);
   info.leftOver = site->FindLeftOver();

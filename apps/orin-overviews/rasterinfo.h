@@ -26,8 +26,9 @@ struct RasterInfo {
   std::optional<datasources::LeftOver> leftOver;  ///< beside it, of an image of another size
 };
 
+/// \param keepsAnswers  keep with the levels what had to be read, if their file may be written
 /// \throws orin::Exception  the file cannot be opened or is no raster
-RasterInfo CollectInfo(const std::string& file);
+RasterInfo CollectInfo(const std::string& file, bool keepsAnswers);
 
 /// "uint8", "int16", "float32", "complex float64", "bit" ...
 std::string TypeName(const gobs::DataType& type);

@@ -4,6 +4,7 @@
 #include <algorithm>
 #include <utility>
 
+#include "host/datasources/levelsources.h"
 #include "host/datasources/validityreader.h"
 #include "host/services/exception.h"
 #include "host/services/text.h"
@@ -23,23 +24,12 @@ class BothPlaces final : public ILevelStore {
   BothPlaces(ILevelStore* internal, std::shared_ptr<ILevelStore> sideCar)
       : internal_(internal), sideCar_(std::move(sideCar)) {}
 
-  std::vector<LevelDescription> List() const override {
-    std::vector<LevelDescription> levels = sideCar_->List();
-    if (internal_)
-      for (LevelDescription& entry : internal_->List())
-        if (!Holds(levels, entry.level)) levels.push_back(std::move(entry));
-    std::sort(
-        levels.begin(), levels.end(),
-        [](const LevelDescription& a, const LevelDescription& b) { return a.level < b.level; });
-    return levels;
-  }
+  std::vector<LevelDescription> List() const override { return ListBoth().shown; }
   std::vector<LevelDescription> ListHidden() const override {
     std::vector<LevelDescription> hidden = sideCar_->ListHidden();
-    if (!internal_) return hidden;
-    const std::vector<LevelDescription> levels = sideCar_->List();
-    for (LevelDescription& entry : internal_->List())
-      if (Holds(levels, entry.level)) hidden.push_back(std::move(entry));
-    for (LevelDescription& entry : internal_->ListHidden()) hidden.push_back(std::move(entry));
+    for (LevelDescription& entry : ListBoth().hidden) hidden.push_back(std::move(entry));
+    if (internal_)
+      for (LevelDescription& entry : internal_->ListHidden()) hidden.push_back(std::move(entry));
     return hidden;
   }
   void Create(unsigned level, const std::vector<unsigned>& channels,
@@ -48,11 +38,12 @@ class BothPlaces final : public ILevelStore {
   }
   std::unique_ptr<IRasterWriter> OpenWriter(unsigned level,
                                             const std::vector<unsigned>& channels) override {
-    const bool inside = internal_ && !Holds(sideCar_->List(), level);
-    if (!inside) return sideCar_->OpenWriter(level, channels);
-    for (const LevelDescription& entry : internal_->List())
-      if (entry.level == level) sideCar_->SetSource(entry);
-    return internal_->OpenWriter(level, channels);
+    for (const LevelDescription& entry : ListBoth().shown) {
+      if (entry.level != level || entry.place != LevelPlace::kInternal) continue;
+      sideCar_->SetSource(entry);
+      return internal_->OpenWriter(level, channels);
+    }
+    return sideCar_->OpenWriter(level, channels);
   }
   void SetValid(unsigned level, const std::vector<unsigned>& channels, bool valid) override {
     sideCar_->SetValid(level, channels, valid);
@@ -70,6 +61,27 @@ class BothPlaces final : public ILevelStore {
   void Remove(const std::vector<unsigned>& levels) override { sideCar_->Remove(levels); }
 
  private:
+  struct Levels {
+    std::vector<LevelDescription> shown;   ///< one entry a factor, ascending
+    std::vector<LevelDescription> hidden;  ///< inside, of a factor that stands beside it, too
+  };
+
+  Levels ListBoth() const {
+    const std::vector<LevelDescription> beside = sideCar_->List();
+    std::vector<LevelDescription> all = internal_ ? internal_->List() : beside;
+    if (internal_) all.insert(all.end(), beside.begin(), beside.end());
+    CheckSources(all);
+    std::stable_sort(
+        all.begin(), all.end(),
+        [](const LevelDescription& a, const LevelDescription& b) { return a.level < b.level; });
+    Levels levels;
+    for (LevelDescription& entry : all) {
+      const bool isHidden = entry.place == LevelPlace::kInternal && Holds(beside, entry.level);
+      (isHidden ? levels.hidden : levels.shown).push_back(std::move(entry));
+    }
+    return levels;
+  }
+
   ILevelStore* internal_;
   std::shared_ptr<ILevelStore> sideCar_;
 };
@@ -138,6 +150,7 @@ class GenericSource final : public IRasterSource {
   }
   bool DeliversValidity() const override { return true; }
   ILevelStore* Levels() override { return levels_.get(); }
+  model::LevelInputs Inputs() const override { return image_->Inputs(); }
   std::shared_ptr<ImageWatch> Watch() override { return image_->Watch(); }
 
  private:

@@ -52,7 +52,7 @@ ImageRecord ParseImageRecord(const std::string& text) {
   const auto modified = NumberIn<int64_t>(text, kTimeAt, 20, 10);
   const auto companions = NumberIn<uint64_t>(text, kCompanionsAt, 16, 16);
   if (!IsFingerprint(fingerprint) || !bytes || !modified || !companions) return {};
-  return {fingerprint, {*bytes, *modified, *companions}};
+  return {fingerprint, {*bytes, *modified, *companions, 0, 0}};
 }
 
 }  // namespace orin::datasources

@@ -1,4 +1,4 @@
-/// What a level remembers of the image that it was computed from.
+/// The first version of the texts that levels keep of their image.
 // SPDX-License-Identifier: MIT
 #pragma once
 
@@ -6,24 +6,12 @@
 #include <cstdint>
 #include <string>
 
+#include "host/model/levelrecord.h"
+
 namespace orin::datasources {
 
-/// What the file system tells of an image's files, without reading them.
-struct ImageStamp {
-  uint64_t bytes = 0;       ///< size of the image's file
-  int64_t modified = 0;     ///< its modification time, nanoseconds since 1970
-  uint64_t companions = 0;  ///< digest of sizes and times of the other files; 0 without such files
-
-  friend bool operator==(const ImageStamp&, const ImageStamp&) = default;
-};
-
-struct ImageRecord {
-  std::string fingerprint;  ///< of the image's stored data; empty when it is unknown
-  ImageStamp stamp;         ///< of a moment when the image held that data
-
-  bool IsBlank() const { return fingerprint.empty(); }
-  friend bool operator==(const ImageRecord&, const ImageRecord&) = default;
-};
+using model::ImageRecord;
+using model::ImageStamp;
 
 /// Characters of a record's text, and of its part for the stamp, which ends it. Both are fixed, so
 /// that they can be overwritten in place.

@@ -5,8 +5,7 @@
 #include <charconv>
 #include <system_error>
 
-#include <sys/stat.h>
-
+#include "host/datasources/filestate.h"
 #include "host/datasources/fingerprint.h"
 
 namespace orin::datasources {
@@ -16,19 +15,6 @@ constexpr char kExternalMask[] = ".msk";
 constexpr size_t kMostKnown = 64;
 
 using Entries = std::vector<std::pair<ImageStamp, std::string>>;
-
-struct FileState {
-  uint64_t bytes;
-  int64_t modified;  ///< nanoseconds since 1970
-};
-
-std::optional<FileState> StateOf(const std::string& path) {
-  struct stat status;
-  if (stat(path.c_str(), &status) != 0 || !S_ISREG(status.st_mode)) return std::nullopt;
-  constexpr int64_t kNanoseconds = 1000000000;
-  return FileState{static_cast<uint64_t>(status.st_size),
-                   status.st_mtim.tv_sec * kNanoseconds + status.st_mtim.tv_nsec};
-}
 
 std::optional<std::string> Find(const Entries& entries, const ImageStamp& stamp) {
   const auto found = std::find_if(entries.rbegin(), entries.rend(),
@@ -65,7 +51,10 @@ class Computed {
   std::vector<Entry> entries_;
 };
 
-uint64_t DigestOf(const std::vector<std::string>& files) {
+/// How much of what other files show goes into their digest.
+enum class Detail { kSizeAndTime, kAll };
+
+uint64_t DigestOf(const std::vector<std::string>& files, Detail detail) {
   Fingerprinter digest;
   bool isAny = false;
   for (size_t i = 0; i < files.size(); ++i) {
@@ -75,6 +64,9 @@ uint64_t DigestOf(const std::vector<std::string>& files) {
     digest.AddNumber(i);
     digest.AddNumber(state->bytes);
     digest.AddNumber(static_cast<uint64_t>(state->modified));
+    if (detail == Detail::kSizeAndTime) continue;
+    digest.AddNumber(static_cast<uint64_t>(state->changed));
+    digest.AddNumber(state->inode);
   }
   if (!isAny) return 0;
   const std::string text = digest.Text();
@@ -102,7 +94,21 @@ ImageWatch::~ImageWatch() = default;
 std::optional<ImageStamp> ImageWatch::Stamp() const {
   const auto state = StateOf(file_);
   if (!state) return std::nullopt;
-  return ImageStamp{state->bytes, state->modified, DigestOf(companions_)};
+  return ImageStamp{state->bytes, state->modified, DigestOf(companions_, Detail::kSizeAndTime), 0,
+                    0};
+}
+
+std::optional<ImageStamp> ImageWatch::FullStamp() const {
+  const auto state = StateOf(file_);
+  if (!state) return std::nullopt;
+  return ImageStamp{state->bytes, state->modified, DigestOf(companions_, Detail::kAll),
+                    state->changed, state->inode};
+}
+
+std::optional<ImageStamp> ImageWatch::SettledStamp() const {
+  SettledStateOf(file_);
+  for (const std::string& companion : companions_) SettledStateOf(companion);
+  return FullStamp();
 }
 
 std::optional<std::string> ImageWatch::Known(const ImageStamp& stamp) const {

@@ -36,8 +36,14 @@ class ImageWatch {
   ImageWatch& operator=(const ImageWatch&) = delete;
 
   const std::string& File() const { return file_; }
-  /// What the file system shows now; none when the image is no regular file.
+  /// What the file system shows now, sizes and modification times; none when the image is no
+  /// regular file.
   std::optional<ImageStamp> Stamp() const;
+  /// The same with status change times and numbers of files.
+  std::optional<ImageStamp> FullStamp() const;
+  /// The full stamp, of which no later write leaves all as it is; see filestate.h for the
+  /// exception. May wait for the disk.
+  std::optional<ImageStamp> SettledStamp() const;
 
   /// The fingerprint of the image as it was at `stamp`, as far as that is known already. An empty
   /// one: it was tried and could not be computed.

@@ -14,6 +14,7 @@
 #include "host/datasources/overviewinfo.h"
 #include "host/datasources/rasterreader.h"
 #include "host/datasources/rasterwriter.h"
+#include "host/datasources/sourceinputs.h"
 #include "host/datasources/validity.h"
 
 namespace orin::datasources {
@@ -51,8 +52,9 @@ class ILevelStore {
   /// beside it, too; those that share a factor with another one; those that cannot be managed.
   virtual std::vector<LevelDescription> ListHidden() const { return {}; }
 
-  /// Where `List` had to read the whole image to tell what is up to date, keeps the answer with the
-  /// levels, if their file may be written, so that the next one comes at once. Never fails.
+  /// Where `List` had to read the image or a level to tell what is up to date, keeps the answer
+  /// with the levels, if their file may be written, so that the next one comes at once. Never
+  /// fails.
   virtual void KeepAnswers() {}
 
   /// How levels are stored from now on; a format that leaves no choice takes no notice.
@@ -120,6 +122,9 @@ class IRasterSource {
 
   /// The levels kept with this raster, or null when its format holds none. Owned by the source.
   virtual ILevelStore* Levels() = 0;
+
+  /// What a run is told beside pixels, as the record of a level keeps it.
+  virtual model::LevelInputs Inputs() const { return InputsOf(*this); }
 
   /// Knows whether the image's data is what it was. Null: the bytes of its file tell.
   virtual std::shared_ptr<ImageWatch> Watch() { return nullptr; }

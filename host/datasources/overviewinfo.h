@@ -6,20 +6,15 @@
 #include <string>
 #include <vector>
 
-#include "host/datasources/imagerecord.h"
+#include "host/model/freshness.h"
 
 namespace orin::datasources {
 
 /// Where the pixels of a level are kept.
 enum class LevelPlace { kInternal, kSideCar };
 
-/// How a level stands to its image.
-enum class LevelStatus {
-  kUnverified,  ///< present and usable; nothing tells which data it was computed from
-  kUnfinished,  ///< some channel is being built, or its build did not end
-  kStale,       ///< computed from other data than the image holds now: no channel is valid
-  kCurrent      ///< computed from the data that the image holds
-};
+using model::LevelStatus;
+using model::StaleReason;
 
 /// Everything that is known of one level.
 struct LevelDescription {
@@ -35,8 +30,12 @@ struct LevelDescription {
   std::vector<bool> validChannels;  ///< one entry for each channel of the raster: finished, and not
                                     ///< known to be out of date
   LevelStatus status = LevelStatus::kUnverified;
-  ImageRecord image = {};  ///< that it was computed from; blank when unknown
-  bool hasMask = false;    ///< a mask of its own stands with its pixels
+  StaleReason reason = StaleReason::kNone;  ///< of a stale level
+  model::ImageRecord image = {};            ///< that it was computed from; blank when unknown
+  std::string bytes = {};        ///< digest of what it stores, its generation; empty when unknown
+  std::string sourceBytes = {};  ///< generation of the level that it was computed from; empty for
+                                 ///< the image, or when unknown
+  bool hasMask = false;          ///< a mask of its own stands with its pixels
   /// It stands in a directory inside the image's own (SubIFD): listed, never used or changed.
   bool isInSubDirectory = false;
 };

@@ -175,7 +175,7 @@ class Info(Case):
         self.assertEqual({"level": 2, "width": 501, "height": 388, "place": "internal",
                           "file": self.file, "method": "NEAREST", "sourceLevel": 1,
                           "program": program, "state": "current",
-                          "fingerprint": beside["fingerprint"], "mask": False,
+                          "staleReason": None, "fingerprint": beside["fingerprint"], "mask": False,
                           "channels": valid}, inside)
         self.assertEqual((False, None), (answer["mask"], answer["alphaChannel"]))
         self.assertRegex(inside["fingerprint"], "^[0-9a-f]{32}$")

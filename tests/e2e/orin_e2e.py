@@ -55,7 +55,7 @@ def info(path):
     answer = run("info", "--json", path)
     told = json.loads(answer.stdout) if answer.stdout else None
     states = [level["state"] for level in told["levels"]] if told else []
-    is_due = "stale" in states or "unfinished" in states
+    is_due = any(state in ("stale", "changed", "unfinished") for state in states)
     assert answer.returncode == (3 if is_due else 0), answer.stdout + answer.stderr
     return told
 

@@ -25,8 +25,12 @@ def bytes_of(path):
 
 def stamps_apart(content):
     """A file without what its levels know of its size and time, and what that is."""
-    stamp = re.compile(rb'(?<=ORIN_IMAGE">)([0-9a-f]{32} )(\d{20} [+-]\d{19} [0-9a-f]{16})(?=<)')
-    return stamp.sub(rb"\1", content), [found[2] for found in stamp.finditer(content)]
+    image = re.compile(rb'(?<=ORIN_IMAGE">)(2 [0-9a-f]{32} )(\d{20} [+-]\d{19})'
+                       rb'( [0-9a-f]{16} \+0{19} 0{16})(?=<)')
+    holder = re.compile(rb'(?<=ORIN_CONTENT">)(2 [0-9a-f]{32} [0-9a-f]{32} )'
+                        rb'(\d{20} [+-]\d{19})(?=<)')
+    stamps = [found[2] for found in (*image.finditer(content), *holder.finditer(content))]
+    return holder.sub(rb"\1", image.sub(rb"\1\3", content)), stamps
 
 
 class TheImage(Case):
@@ -82,8 +86,8 @@ class TheImage(Case):
         noted = bytes_of(self.file)
         after = stamps_apart(noted)
         self.assertEqual(before[0], after[0])
-        stamp = b"%020d +%019d %016x" % (len(noted), 2_000_000_011, 0)
-        self.assertEqual([stamp] * levels, after[1])
+        stamp = b"%020d +%019d" % (len(noted), 2_000_000_011)
+        self.assertEqual([stamp] * levels * 2, after[1])
         self.assertNotIn(stamp, before[1])
         self.assertRan(run("build", self.file))
         self.assertUntouched(noted)

@@ -12,6 +12,7 @@
 #include <utility>
 
 #include "host/datasources/fingerprint.h"
+#include "host/datasources/imagerecord.h"
 #include "host/datasources/imagewatch.h"
 #include "host/drivers/gdal/gdalerrors.h"
 #include "host/drivers/gdal/pixelfiles.h"
@@ -152,7 +153,7 @@ std::string FingerprintOfVrt(const std::string& file, const GdalFormat& format) 
   if (!sources.areAllFiles) return {};
   for (const std::string& source : sources.files) {
     const auto stamp = datasources::ImageWatch(source).Stamp();
-    fingerprint.AddText(stamp ? TextOf(*stamp) : "");
+    fingerprint.AddText(stamp ? datasources::TextOf(*stamp) : "");
   }
   return fingerprint.Text();
 }

@@ -17,8 +17,10 @@ void ReadMetadata(const PositionedFile& file, const TiffStructure& structure,
   if (!entry || entry->bytes > kMostBytes) return;
   const std::vector<uint8_t> bytes = ReadBytes(file, structure, *entry);
   stored.metadata = ParseLevelMetadata(std::string(bytes.begin(), bytes.end()));
-  stored.validityPosition = entry->position + stored.metadata.validityAt;
-  stored.imagePosition = entry->position + stored.metadata.imageAt;
+  const auto positionOf = [&](uint64_t at) { return at == 0 ? 0 : entry->position + at; };
+  stored.validityPosition = positionOf(stored.metadata.validityAt);
+  stored.imagePosition = positionOf(stored.metadata.imageAt);
+  stored.contentPosition = positionOf(stored.metadata.contentAt);
 }
 
 /// Whether a level of ours says so truly: one of a copied or resized image may not.

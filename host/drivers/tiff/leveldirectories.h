@@ -31,7 +31,8 @@ struct StoredLevel {
   PixelFormat format;
   LevelMetadata metadata;
   uint64_t validityPosition = 0;  ///< in the file
-  uint64_t imagePosition = 0;     ///< of the record of the image, in the file
+  uint64_t imagePosition = 0;     ///< of the record of the image, in the file; 0: it has none
+  uint64_t contentPosition = 0;   ///< of the record of the content, as above
 };
 
 /// The levels of the image, in the order of the chain; those that differ from it in channels or

@@ -159,6 +159,11 @@ Appender& LevelFile::ToAppend() {
   return *appender_;
 }
 
+PositionedFile& LevelFile::ToChange() {
+  OpenForChange();
+  return *file_;
+}
+
 void LevelFile::Overwrite(uint64_t position, const std::string& bytes) {
   OpenForChange();
   file_->Write(position, bytes.data(), bytes.size());

@@ -53,6 +53,8 @@ class LevelFile {
   /// Ready to append. \throws orin::Exception  the file cannot be opened for writing, or not be
   /// made
   Appender& ToAppend();
+  /// Ready to change in place. \throws orin::Exception  as `ToAppend`
+  PositionedFile& ToChange();
   /// Changes bytes in place.
   void Overwrite(uint64_t position, const std::string& bytes);
   void Sync();

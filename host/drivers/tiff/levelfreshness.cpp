@@ -2,132 +2,203 @@
 #include "host/drivers/tiff/levelfreshness.h"
 
 #include <algorithm>
+#include <chrono>
+#include <utility>
 
+#include "host/datasources/filestate.h"
+#include "host/drivers/tiff/stampcommit.h"
 #include "host/services/exception.h"
 #include "host/services/text.h"
 
 namespace orin::drivers {
-namespace {
 
-using datasources::ImageRecord;
-using datasources::ImageStamp;
-using datasources::LevelStatus;
+using model::FileStamp;
+using model::ImageRecord;
+using model::ImageStamp;
 
-bool Remembers(const StoredLevel& level) { return level.isOurs && !level.metadata.image.IsBlank(); }
-
-/// Channels that are absent count: other programs show them empty.
-bool IsFinished(const StoredLevel& level) {
-  return !level.isOurs || level.metadata.validity.find_first_not_of(kValid) == std::string::npos;
+LevelFreshness::LevelFreshness(std::shared_ptr<datasources::ImageWatch> watch, bool isInImage,
+                               model::LevelInputs inputs)
+    : watch_(std::move(watch)), isInImage_(isInImage), inputs_(std::move(inputs)) {
+  opened_ = watch_->FullStamp();
 }
 
-/// \param fingerprint  of the image now; empty when it is unknown
-LevelStatus StatusOf(const StoredLevel& level, const std::string& fingerprint) {
-  const bool isKnown = Remembers(level) && !fingerprint.empty();
-  if (isKnown && level.metadata.image.fingerprint != fingerprint) return LevelStatus::kStale;
-  if (!IsFinished(level)) return LevelStatus::kUnfinished;
-  return isKnown ? LevelStatus::kCurrent : LevelStatus::kUnverified;
+void LevelFreshness::FailAsChanged(const char* operation) const {
+  throw Exception(FormatString(_("%s: was changed by another program while a level was computed "
+                                 "from it. Run again when nobody writes to it."),
+                               watch_->File().c_str()),
+                  "host/drivers/tiff/levelfreshness", std::string("LevelFreshness::") + operation,
+                  0);
 }
 
-}  // namespace
-
+/// What the image shows; while levels are written into it, what it showed before.
 std::optional<ImageStamp> LevelFreshness::Now() const {
-  return isChanging_ ? before_ : watch_->Stamp();
+  if (isInImage_ && isChanging_) return before_;
+  auto now = watch_->FullStamp();
+  if (now && isInImage_) now = now->InImage();
+  return now;
+}
+
+/// The same of the file that holds the levels.
+std::optional<FileStamp> LevelFreshness::HolderNow(const std::string& file) const {
+  if (isChanging_) return holderBefore_;
+  const auto state = datasources::StateOf(file);
+  return state ? std::optional(FileStamp{state->bytes, state->modified}) : std::nullopt;
 }
 
 /// Levels that agree on what the image was when it looked as now are believed.
-void LevelFreshness::Trust(const std::vector<StoredLevel>& levels, const ImageStamp& now) {
-  if (watch_->Known(now)) return;
+void LevelFreshness::Trust(const std::vector<StoredLevel>& levels) {
+  const auto now = Now();
+  if (!now || watch_->Known(*now)) return;
   std::string fingerprint;
   for (const StoredLevel& level : levels) {
     const ImageRecord& record = level.metadata.image;
-    if (!Remembers(level) || record.stamp != now) continue;
+    if (!level.isOurs || record.IsBlank() || !IsUnchanged(record.stamp, *now)) continue;
     if (!fingerprint.empty() && record.fingerprint != fingerprint) return;
     fingerprint = record.fingerprint;
   }
-  if (!fingerprint.empty()) watch_->Learn(now, fingerprint);
+  if (!fingerprint.empty()) watch_->Learn(*now, fingerprint);
 }
 
-/// Empty when it cannot be told, or when nobody needs it.
-std::string LevelFreshness::FingerprintFor(const std::vector<StoredLevel>& levels,
-                                           const ImageStamp& now) {
-  if (std::none_of(levels.begin(), levels.end(), Remembers)) return {};
-  Trust(levels, now);
-  if (const auto known = watch_->Known(now)) return *known;
-  std::string fingerprint = watch_->Fingerprint(now);
-  const bool isStill = isChanging_ || watch_->Stamp() == now;
-  return isStill ? fingerprint : std::string();
-}
-
-LevelFreshness::Judgement LevelFreshness::Judge(const std::vector<StoredLevel>& levels) {
-  Judgement judgement;
-  judgement.now = Now();
-  const std::string fingerprint =
-      judgement.now ? FingerprintFor(levels, *judgement.now) : std::string();
-  for (size_t i = 0; i < levels.size(); ++i) {
-    const ImageRecord& record = levels[i].metadata.image;
-    judgement.statuses.push_back(StatusOf(levels[i], fingerprint));
-    if (Remembers(levels[i]) && record.fingerprint == fingerprint && record.stamp != judgement.now)
-      judgement.outdated.push_back(i);
-  }
-  return judgement;
-}
-
-void LevelFreshness::BeginChange(const std::vector<StoredLevel>& levels) {
-  if (isChanging_) return;
-  before_ = watch_->Stamp();
-  isChanging_ = isInImage_;
-  if (before_) Trust(levels, *before_);
-  wasKnown_ = before_ && watch_->Known(*before_);
-}
-
-void LevelFreshness::EndChange(const std::optional<ImageStamp>& now) {
-  const std::string fingerprint = KnownFingerprint();
-  if (now && !fingerprint.empty()) watch_->Learn(*now, fingerprint);
-  isChanging_ = false;
-}
-
-void LevelFreshness::Prepare(const std::optional<ImageStamp>& start) {
-  if (start) watch_->Start(*start);
-}
-
-ImageRecord LevelFreshness::RecordSince(const std::optional<ImageStamp>& start, bool wasTouched) {
-  if (!start) return {};
-  std::string fingerprint = watch_->Fingerprint(*start);
-  // A fingerprint that was computed meanwhile may be of the data before or after a touch.
-  const auto isAsBefore = [&] { return wasKnown_ && watch_->Again() == fingerprint; };
-  const bool hasChanged = isInImage_ ? wasTouched && !isAsBefore() : watch_->Stamp() != start;
-  if (hasChanged)
-    throw Exception(FormatString(_("%s: was changed by another program while a level was computed "
-                                   "from it. Run again when nobody writes to it."),
-                                 watch_->File().c_str()),
-                    "host/drivers/tiff/levelfreshness", "LevelFreshness::RecordSince", 0);
-  return fingerprint.empty() ? ImageRecord() : ImageRecord{std::move(fingerprint), *start};
-}
-
+/// Of `Now()`, if it is known without reading; else empty.
 std::string LevelFreshness::KnownFingerprint() const {
   const auto now = Now();
   return now ? watch_->Known(*now).value_or("") : "";
 }
 
-uint64_t StampPosition(const StoredLevel& level) {
-  return level.imagePosition + datasources::kImageRecordLength - datasources::kImageStampLength;
+/// Empty when it cannot be told.
+std::string LevelFreshness::FingerprintOf(const ImageStamp& now) {
+  if (const auto known = watch_->Known(now)) return *known;
+  std::string fingerprint = watch_->Fingerprint(now);
+  return isChanging_ || Now() == now ? fingerprint : std::string();
 }
 
-void RestampLevels(const LevelFile& levelFile, const std::vector<const StoredLevel*>& levels,
-                   const ImageStamp& stamp, bool isInImage) noexcept {
-  try {
-    const auto file = levelFile.OpenLocked();
-    for (const StoredLevel* level : levels) {
-      std::string there(datasources::kImageRecordLength, '\0');
-      file->Read(level->imagePosition, there.data(), there.size());
-      if (datasources::ParseImageRecord(there) != level->metadata.image) continue;
-      const std::string text = TextOf(stamp);
-      file->Write(StampPosition(*level), text.data(), text.size());
-    }
-    if (isInImage) file->SetModified(stamp.modified);
-  } catch (...) {
-    // deliberate: a file that cannot be written, or is being written, is no failure of a question
+std::string LevelFreshness::BytesOf(const LevelFile& file, const StoredLevel& level) {
+  const auto holder = HolderNow(file.Path());
+  std::string bytes = holder ? contents_.KnownBytes(level, *holder) : std::string();
+  if (!bytes.empty()) return bytes;
+  bytes = BytesDigestOf(file.File(), file.Structure(), level);
+  if (holder) contents_.Learn(level, *holder, bytes);
+  return bytes;
+}
+
+model::ContentRecord LevelFreshness::ContentOf(const LevelFile& file, const StoredLevel& level) {
+  StoredLevel recorded = level;
+  model::ContentRecord& content = recorded.metadata.content;
+  content = {TableDigestOf(file.File(), file.Structure(), level),
+             BytesDigestOf(file.File(), file.Structure(), level),
+             {}};
+  if (const auto holder = HolderNow(file.Path())) contents_.Learn(recorded, *holder, content.bytes);
+  return content;
+}
+
+LevelFreshness::Answers LevelFreshness::CheckFreshness(const LevelFile& file,
+                                                       const std::vector<StoredLevel>& levels) {
+  Answers answers;
+  answers.now = Now();
+  model::ObservedImage image{answers.now, inputs_, [&] { return FingerprintOf(*answers.now); }};
+  if (answers.now)  // what is known in this program comes before what levels say
+    if (const auto known = watch_->Known(*answers.now); known && isChanging_)
+      image.fingerprint = [known] { return *known; };
+  std::vector<model::LevelRecord> records;
+  std::vector<model::ObservedLevel> observed;
+  for (const StoredLevel& level : levels) {
+    records.push_back(level.isOurs ? model::LevelRecord(level.metadata) : model::LevelRecord());
+    observed.push_back({HolderNow(file.Path()),
+                        level.isOurs ? TableDigestOf(file.File(), file.Structure(), level) : "",
+                        [&] { return BytesOf(file, level); }});
   }
+  answers.levels = model::CheckFreshness(records, image, observed);
+  answers.areStampsOld =
+      std::any_of(answers.levels.begin(), answers.levels.end(),
+                  [](const model::Freshness& answer) { return answer.isStampOld; });
+  return answers;
+}
+
+void LevelFreshness::BeginChange(const LevelFile& file, const std::vector<StoredLevel>& levels) {
+  if (isChanging_) return;
+  Trust(levels);
+  before_ = Now();
+  holderBefore_ = HolderNow(file.Path()).value_or(FileStamp());
+  for (const StoredLevel& level : levels) {
+    const model::ContentRecord& content = level.metadata.content;
+    const bool isBelieved = holderBefore_ && content.holder == *holderBefore_ &&
+                            contents_.KnownBytes(level, *holderBefore_).empty();
+    if (level.isOurs && isBelieved) contents_.Learn(level, *holderBefore_, content.bytes);
+  }
+  isChanging_ = true;
+  hasChanged_ = true;
+}
+
+void LevelFreshness::EndChange(const LevelFile& file) {
+  if (!isChanging_) return;
+  const std::string fingerprint = KnownFingerprint();
+  isChanging_ = false;
+  if (!file.Exists()) return;
+  const auto holder = HolderNow(file.Path());
+  if (holder && holderBefore_) contents_.Carry(*holderBefore_, *holder);
+  const auto now = Now();
+  if (now && !fingerprint.empty()) watch_->Learn(*now, fingerprint);
+}
+
+std::optional<LevelFreshness::Start> LevelFreshness::Begin(const std::vector<StoredLevel>& levels) {
+  Trust(levels);
+  const bool isUntouched = !isInImage_ || !hasChanged_;
+  const bool isKnown = isInImage_ && !KnownFingerprint().empty();
+  const auto stamp = isKnown ? watch_->FullStamp() : watch_->SettledStamp();
+  if (isUntouched && opened_ && (!stamp || stamp->InImage() != opened_->InImage()))
+    FailAsChanged("Begin");
+  if (!stamp) return std::nullopt;
+  if (!isKnown) watch_->Start(*stamp);
+  return Start{*stamp, isKnown};
+}
+
+void LevelFreshness::RequireUnchanged(const std::optional<Start>& start) {
+  if (!start || start->isKnown || !isInImage_ || proven_ == start->stamp) return;
+  const std::string fingerprint = watch_->Fingerprint(start->stamp);
+  if (watch_->FullStamp() != start->stamp) FailAsChanged("RequireUnchanged");
+  proven_ = start->stamp;
+  if (!fingerprint.empty()) watch_->Learn(start->stamp.InImage(), fingerprint);
+}
+
+ImageRecord LevelFreshness::RecordSince(const std::optional<Start>& start, bool wasTouched) {
+  if (!start) return {};
+  if (isInImage_) {
+    const std::string fingerprint = KnownFingerprint();
+    if (wasTouched && (fingerprint.empty() || watch_->Again() != fingerprint))
+      FailAsChanged("RecordSince");
+    return {fingerprint, {}};  // the stamp comes last of all
+  }
+  const std::string fingerprint = watch_->Fingerprint(start->stamp);
+  if (watch_->FullStamp() != start->stamp) FailAsChanged("RecordSince");
+  proven_ = start->stamp;
+  return fingerprint.empty() ? ImageRecord() : ImageRecord{fingerprint, start->stamp};
+}
+
+void LevelFreshness::CommitStamps(PositionedFile& file, const TiffStructure& structure,
+                                  const std::vector<StoredLevel>& levels,
+                                  std::optional<int64_t> modified) {
+  const auto settled = isInImage_ ? watch_->FullStamp() : watch_->SettledStamp();
+  if (!settled) return;
+  Trust(levels);
+  const std::string fingerprint =
+      isInImage_ ? KnownFingerprint() : watch_->Known(*settled).value_or("");
+  const auto holder = HolderNow(file.Path());
+  if (fingerprint.empty() || !holder) return;
+  StampCommit commit(file, structure);
+  for (const StoredLevel& level : levels) {
+    const bool isWhole =
+        level.metadata.content.holder == *holder || contents_.IsWhole(level, *holder);
+    if (level.isOurs && isWhole && level.metadata.image.fingerprint == fingerprint)
+      commit.Add(level);
+  }
+  const bool mustRead = isInImage_ || proven_ != settled;
+  const auto holds = [&] {
+    return (!mustRead || watch_->Again() == fingerprint) &&
+           (isInImage_ || watch_->FullStamp() == settled);
+  };
+  const auto now = std::chrono::system_clock::now().time_since_epoch();
+  commit.Run(isInImage_ ? std::nullopt : settled, settled->companions,
+             modified.value_or(std::chrono::nanoseconds(now).count()), holds);
 }
 
 }  // namespace orin::drivers

@@ -1,5 +1,18 @@
-/// Which levels of a file match the image that they were computed from.
+/// How the levels of a TIFF file stand to the image that they were computed from.
 // SPDX-License-Identifier: MIT
+//
+// Levels beside an image: nobody but other programs writes to the image. What was read between two
+// equal stamps, the first of them settled, is the data that the fingerprint is of.
+//
+// Levels inside it: every write of ours changes what the file shows, and hides a write of another
+// program in the same tick of the clock. So the fingerprint is complete before our first write, and
+// is computed again after our last one:
+//
+//   stamp -- pixels are read -- our writes ......... stamps into the file, its time set -- verified
+//   |<- fingerprint, stamp as before ->|             |<- the image is read again, and so are the  |
+//                                                    |   levels; the time must still be that ---->|
+//
+// A difference at the end takes the stamps back, and the next question reads.
 #pragma once
 
 #include <memory>
@@ -8,73 +21,84 @@
 #include <vector>
 
 #include "host/datasources/imagewatch.h"
-#include "host/datasources/overviewinfo.h"
-#include "host/drivers/tiff/leveldirectories.h"
+#include "host/drivers/tiff/levelcontents.h"
 #include "host/drivers/tiff/levelfile.h"
+#include "host/model/freshness.h"
 
 namespace orin::drivers {
 
-/// Compares what levels remember with the image. Levels of which size and time agree are taken as
-/// current at once; for others the image is read, once for each state that it shows.
-///
-/// Writing levels into the image's own file changes its size and time. From the first such write to
-/// the last the file counts as it was before.
 class LevelFreshness {
  public:
   /// \param isInImage  the levels stand in the image's own file
-  LevelFreshness(std::shared_ptr<datasources::ImageWatch> watch, bool isInImage)
-      : watch_(std::move(watch)), isInImage_(isInImage) {}
+  /// \param inputs     what a run is told of the image
+  LevelFreshness(std::shared_ptr<datasources::ImageWatch> watch, bool isInImage,
+                 model::LevelInputs inputs);
 
   bool IsInImage() const { return isInImage_; }
+  const model::LevelInputs& Inputs() const { return inputs_; }
 
-  struct Judgement {
-    std::vector<datasources::LevelStatus> statuses;  ///< one a level
-    std::vector<size_t> outdated;                    ///< current, but with another size or time
-    std::optional<datasources::ImageStamp> now;
+  struct Answers {
+    std::vector<model::Freshness> levels;  ///< one a level
+    bool areStampsOld = false;             ///< of some level that is current
+    std::optional<model::ImageStamp> now;
   };
-  Judgement Judge(const std::vector<StoredLevel>& levels);
+  Answers CheckFreshness(const LevelFile& file, const std::vector<StoredLevel>& levels);
+  /// Digest of what a level stores: as known, else read.
+  std::string BytesOf(const LevelFile& file, const StoredLevel& level);
+  /// The content of a level that was linked just now; its holder's stamp is blank.
+  model::ContentRecord ContentOf(const LevelFile& file, const StoredLevel& level);
 
-  /// What the image shows now; while levels are written into it, what it showed before.
-  std::optional<datasources::ImageStamp> Now() const;
   /// The first change to the file that holds `levels` comes next.
-  void BeginChange(const std::vector<StoredLevel>& levels);
+  void BeginChange(const LevelFile& file, const std::vector<StoredLevel>& levels);
   bool IsChanging() const { return isChanging_; }
   /// Somebody else may have changed the image since the changes began: what it was tells nothing.
   void Doubt() { before_.reset(); }
-  /// All is written. \param now  what the image shows after that, when it is known
-  void EndChange(const std::optional<datasources::ImageStamp>& now);
+  /// All is written but stamps.
+  void EndChange(const LevelFile& file);
 
-  /// Computes the fingerprint in the background, unless it is known.
-  /// \param start  when the computation of a level began
-  void Prepare(const std::optional<datasources::ImageStamp>& start);
-  /// What a level that was computed from the image remembers; blank when nothing can be told.
+  /// When the computation of a level from the image began.
+  struct Start {
+    model::ImageStamp stamp;
+    bool isKnown = false;  ///< what the image held then
+  };
+  /// Begins to compute the fingerprint in the background, unless it is known. None: nothing can be
+  /// told of the image.
+  /// \throws orin::Exception  the image has changed since this object was made
+  std::optional<Start> Begin(const std::vector<StoredLevel>& levels);
+  /// Comes before the first write of a level that is computed from the image in its own file. Waits
+  /// for the fingerprint.
+  /// \throws orin::Exception  the image has changed since `start`
+  void RequireUnchanged(const std::optional<Start>& start);
+  /// What a level that was computed from the image records; blank when nothing can be told.
   /// \param wasTouched  somebody else may have written to the image's file since then, while levels
   ///                    were written into it
   /// \throws orin::Exception  another program has changed the image since `start`
-  datasources::ImageRecord RecordSince(const std::optional<datasources::ImageStamp>& start,
-                                       bool wasTouched);
-  /// The fingerprint of `Now()`, if it is known without reading; else empty.
-  std::string KnownFingerprint() const;
+  model::ImageRecord RecordSince(const std::optional<Start>& start, bool wasTouched);
+
+  /// Lets levels that are what they should be say how image and file look from now on. Reads them,
+  /// and an image in the same file, to be sure. The last change of all to `file`.
+  /// \param modified  the time that the file gets; none: now
+  void CommitStamps(PositionedFile& file, const TiffStructure& structure,
+                    const std::vector<StoredLevel>& levels, std::optional<int64_t> modified);
 
  private:
-  void Trust(const std::vector<StoredLevel>& levels, const datasources::ImageStamp& now);
-  std::string FingerprintFor(const std::vector<StoredLevel>& levels,
-                             const datasources::ImageStamp& now);
+  std::optional<model::ImageStamp> Now() const;
+  std::optional<model::FileStamp> HolderNow(const std::string& file) const;
+  void Trust(const std::vector<StoredLevel>& levels);
+  std::string KnownFingerprint() const;
+  std::string FingerprintOf(const model::ImageStamp& now);
+  [[noreturn]] void FailAsChanged(const char* operation) const;
 
   std::shared_ptr<datasources::ImageWatch> watch_;
   bool isInImage_;
+  model::LevelInputs inputs_;
+  LevelContents contents_;
+  std::optional<model::ImageStamp> opened_;  ///< when this object was made
+  bool hasChanged_ = false;                  ///< the file, by this object's owner
   bool isChanging_ = false;
-  bool wasKnown_ = false;                          ///< the fingerprint, when the changes began
-  std::optional<datasources::ImageStamp> before_;  ///< of the image, when the changes began
+  std::optional<model::ImageStamp> before_;       ///< of the image, when the changes began
+  std::optional<model::FileStamp> holderBefore_;  ///< of the levels' file, when the changes began
+  std::optional<model::ImageStamp> proven_;  ///< settled, and the fingerprint is of the data then
 };
-
-/// Writes `stamp` over what the levels remember, as long as they stand where they stood; the time
-/// of a file that is the image itself stays what it is. Fails quietly: then the next answer
-/// reads the image again.
-void RestampLevels(const LevelFile& levelFile, const std::vector<const StoredLevel*>& levels,
-                   const datasources::ImageStamp& stamp, bool isInImage) noexcept;
-
-/// Where in the file the part of a level's record stands that is its stamp.
-uint64_t StampPosition(const StoredLevel& level);
 
 }  // namespace orin::drivers

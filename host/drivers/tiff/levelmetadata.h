@@ -1,38 +1,34 @@
-/// What a level's metadata tag says of it: how it was made, and which channels are up to date.
+/// The record of a level in the metadata tag of its directory.
 // SPDX-License-Identifier: MIT
 #pragma once
 
 #include <cstdint>
-#include <optional>
 #include <string>
 
-#include "host/datasources/imagerecord.h"
+#include "host/model/levelrecord.h"
 
 namespace orin::drivers {
 
-inline constexpr char kAbsent = '-';   ///< the channel was not created
-inline constexpr char kInvalid = '0';  ///< created, not up to date
-inline constexpr char kValid = '1';
+using model::kAbsent;
+using model::kInvalid;
+using model::kValid;
 
-struct LevelMetadata {
-  std::string method;        ///< "NEAREST" ...; may be empty
-  unsigned level = 0;        ///< decimation factor; 0 when the tag does not say
-  unsigned sourceLevel = 0;  ///< 1 for full resolution; 0 unknown
-  std::string program;
-  std::string validity;  ///< one character a channel; empty when the tag has none
-  uint64_t validityAt =
-      0;  ///< of its first character in the tag's text: changed in place, never moved
-  datasources::ImageRecord image = {};  ///< that the level was computed from
-  uint64_t imageAt = 0;                 ///< as validityAt; 0 when the tag has no such item
+/// With the places in the tag's text of the items that are changed there, never moved; 0 where the
+/// tag has no such item, or where its text is not written as it is read.
+struct LevelMetadata : model::LevelRecord {
+  uint64_t validityAt = 0;
+  uint64_t imageAt = 0;
+  uint64_t contentAt = 0;
 };
 
 /// The name and version that levels are signed with.
 std::string ProgramName();
 
 /// The tag's text.
-std::string ComposeLevelMetadata(const LevelMetadata& metadata);
+std::string ComposeLevelMetadata(const model::LevelRecord& record);
 
-/// What can be understood of a tag's text, also of another program's.
+/// What can be understood of a tag's text, also of another program's. What cannot be changed in
+/// place counts as not there.
 LevelMetadata ParseLevelMetadata(const std::string& text);
 
 }  // namespace orin::drivers

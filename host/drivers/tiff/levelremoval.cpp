@@ -63,7 +63,7 @@ void TiffLevelStore::Remove(const std::vector<unsigned>& levels) {
   else PrepareToReclaim();
   if (!file_->Exists()) file_->DeleteUnfinished();
   Reload();
-  if (areThere) Settle();
+  if (areThere) EndChange();
 }
 
 }  // namespace orin::drivers

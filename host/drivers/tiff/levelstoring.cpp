@@ -15,6 +15,14 @@ struct TileTable {
   uint64_t TilePlace::*field;
 };
 
+/// Whether a valid channel of the level is none of those that are pending.
+bool HasOtherChannels(const StoredLevel& level, const std::vector<bool>& pending) {
+  const std::string& validity = level.metadata.validity;
+  for (size_t i = 0; i < validity.size(); ++i)
+    if (validity[i] == kValid && !pending.at(i)) return true;
+  return false;
+}
+
 constexpr TileTable kTables[] = {{TIFFTAG_TILEOFFSETS, &TilePlace::offset},
                                  {TIFFTAG_TILEBYTECOUNTS, &TilePlace::count}};
 
@@ -35,27 +43,42 @@ std::vector<uint32_t> TiffLevelStore::CompletePlanes(const LevelBuild& build) co
   return planes;
 }
 
+/// The record of a level before its directory is written. Channels that stay in it were computed
+/// from the same data, the same way, or they do not count: a level has one record.
 /// \param before  the level of ours that is in the file, or null
-/// \param image   that the pending channels were computed from. Channels computed from other data
-///                are as good as not there: a level remembers one image
-LevelMetadata TiffLevelStore::MetadataFor(unsigned level, const Pending& pending,
-                                          const StoredLevel* before,
-                                          const datasources::ImageRecord& image) const {
-  LevelMetadata metadata;
-  metadata.method = pending.method;
-  metadata.level = level;
-  metadata.sourceLevel = lastRead_ ? lastRead_ : settings_.usualSource;
-  metadata.program = ProgramName();
-  metadata.validity =
+/// \param source  of the pending channels
+model::LevelRecord TiffLevelStore::RecordFor(unsigned level, const Pending& pending,
+                                             const StoredLevel* before, const LevelSource& source) {
+  model::LevelRecord record;
+  record.method = pending.method;
+  record.level = level;
+  record.sourceLevel = source.level ? source.level : settings_.usualSource;
+  record.sourceBytes = source.bytes;
+  record.program = ProgramName();
+  record.inputs = freshness_.Inputs();
+  record.inputs.channels = pending.together;
+  record.image = source.image;
+  record.validity =
       before ? before->metadata.validity : std::string(pending.channels.size(), kAbsent);
-  if (before && before->metadata.method != pending.method)  // it would not be true of the others
-    std::replace(metadata.validity.begin(), metadata.validity.end(), kValid, kInvalid);
+  const bool hasOthers = before && HasOtherChannels(*before, pending.channels);
+  const char others = hasOthers ? ValidityOfOthers(*before, record) : kValid;
   for (size_t i = 0; i < pending.channels.size(); ++i)
-    if (pending.channels[i]) metadata.validity[i] = kInvalid;
-    else if (before && before->metadata.image.fingerprint != image.fingerprint)
-      metadata.validity[i] = kAbsent;
-  metadata.image = image;
-  return metadata;
+    if (pending.channels[i]) record.validity[i] = kInvalid;
+    else if (others == kAbsent || (others == kInvalid && record.validity[i] == kValid))
+      record.validity[i] = others;
+  return record;
+}
+
+/// What becomes of channels that stay: kValid, they are what they were; kInvalid, they are not what
+/// `now` says; kAbsent, they are of another image.
+char TiffLevelStore::ValidityOfOthers(const StoredLevel& before, const model::LevelRecord& now) {
+  const model::LevelRecord& then = before.metadata;
+  if (then.image.fingerprint != now.image.fingerprint) return kAbsent;
+  const bool isSameWay = then.version == 2 && then.method == now.method &&
+                         then.sourceLevel == now.sourceLevel &&
+                         then.sourceBytes == now.sourceBytes &&
+                         DifferenceOf(then.inputs, now.inputs) == model::StaleReason::kNone;
+  return isSameWay && IsWhole(before) ? kValid : kInvalid;
 }
 
 /// Of a level that the file does not hold.
@@ -66,11 +89,11 @@ Place TiffLevelStore::NewPlace(const PixelFormat& format) const {
 }
 
 /// \param mask  of the level, complete; null for none
-void TiffLevelStore::AddDirectory(const Pending& pending, const LevelMetadata& metadata,
+void TiffLevelStore::AddDirectory(const Pending& pending, const model::LevelRecord& record,
                                   const std::vector<uint32_t>& planes, const LevelBuild* mask) {
   const TiffStructure& structure = file_->Structure();
   const LevelBuild& build = *pending.build;
-  const StoredLevel* before = Find(metadata.level);
+  const StoredLevel* before = Find(record.level);
   const uint64_t tiles = build.TilesPerPlane();
   std::vector<NewEntry> entries = EntriesOf(build.Coding());
   for (const TileTable& table : kTables) {
@@ -84,7 +107,7 @@ void TiffLevelStore::AddDirectory(const Pending& pending, const LevelMetadata& m
                      [&](const TilePlace& place) { return place.*table.field; });
     entries.push_back(NumbersEntry(table.tag, structure.isBig ? TIFF_LONG8 : TIFF_LONG, numbers));
   }
-  std::string text = ComposeLevelMetadata(metadata);
+  std::string text = ComposeLevelMetadata(record);
   if (settings_.image.isInFile && catalogue_->HasPages()) text = WithPage(std::move(text), 1);
   entries.push_back(TextEntry(TIFFTAG_GDAL_METADATA, text));
   const PixelFormat& format = build.Coding().format;
@@ -122,15 +145,13 @@ void TiffLevelStore::TidyMasks(std::optional<uint64_t> strayMask) {
 /// Whether finished channels are kept back, and keeps them and their mask: other programs would
 /// show a level of which the rest is empty, or of other pixels. What is kept back is lost when the
 /// program is killed.
-/// \param image  that they were computed from
 bool TiffLevelStore::Waits(Pending& pending, const std::vector<unsigned>& channels,
-                           const datasources::ImageRecord& image) const {
+                           const LevelSource& source) const {
   if (!pending.coding.format.planar) return false;
   std::set<unsigned> all(pending.waiting.begin(), pending.waiting.end());
   all.insert(channels.begin(), channels.end());
   pending.waiting.assign(all.begin(), all.end());
-  pending.waitingImage = image;
-  pending.waitingSource = lastRead_;
+  pending.waitingSource = source;
   if (pending.build->mask) pending.waitingMask = std::move(pending.build->mask);
   return pending.waiting.size() < settings_.image.samples;
 }
@@ -151,8 +172,7 @@ void TiffLevelStore::StoreWaiting(unsigned level) {
     const std::shared_ptr<LevelBuild> build = entry->second.build;
     return GiveUp(level, *build);
   }
-  lastRead_ = entry->second.waitingSource;
-  StoreFinished(level, entry->second, {}, datasources::ImageRecord(entry->second.waitingImage));
+  StoreFinished(level, entry->second, {}, LevelSource(entry->second.waitingSource));
 }
 
 void TiffLevelStore::StoreAllWaitingBut(unsigned level) {
@@ -166,30 +186,30 @@ void TiffLevelStore::StoreAllWaitingBut(unsigned level) {
 /// mask meanwhile stays.
 void TiffLevelStore::StoreFinished(unsigned level, Pending& pending,
                                    const std::vector<unsigned>& channels,
-                                   const datasources::ImageRecord& image) {
+                                   const LevelSource& source) {
   std::set<unsigned> all(channels.begin(), channels.end());
   all.insert(pending.waiting.begin(), pending.waiting.end());
   pending.waiting.clear();
   const std::vector<unsigned> finished(all.begin(), all.end());
   std::unique_ptr<LevelBuild> mask =
       std::move(pending.waitingMask ? pending.waitingMask : pending.build->mask);
-  Store(level, pending, PlanesOf(pending.coding, finished), std::move(mask), image);
+  Store(level, pending, PlanesOf(pending.coding, finished), std::move(mask), source);
   MarkStored(level, finished, true);
 }
 
 /// Puts the tiles of `planes` into the level's directory; its validity is turned on by nobody here.
 /// \param mask   of all channels of the level; null for none
-/// \param image  that they were computed from; none: what the level remembers stays
+/// \param source  they were computed from; none: what the level records stays
 void TiffLevelStore::Store(unsigned level, Pending& pending, const std::vector<uint32_t>& planes,
                            std::unique_ptr<LevelBuild> mask,
-                           const std::optional<datasources::ImageRecord>& image) {
+                           const std::optional<LevelSource>& source) {
   const std::shared_ptr<LevelBuild> build = pending.build;
   file_->Sync();
   CatchUp();
   const StoredLevel* before = pending.isRecoded ? nullptr : FindOurs(level);
-  const datasources::ImageRecord kept =
-      before ? before->metadata.image : datasources::ImageRecord();
-  AddDirectory(pending, MetadataFor(level, pending, before, image.value_or(kept)), planes,
+  LevelSource kept = source_;
+  kept.image = before ? before->metadata.image : model::ImageRecord();
+  AddDirectory(pending, RecordFor(level, pending, before, source.value_or(kept)), planes,
                mask.get());
   pending.isRecoded = false;
   Reload();

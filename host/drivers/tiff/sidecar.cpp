@@ -118,8 +118,10 @@ std::unique_ptr<datasources::ILevelStore> TiffSideCar::Open(const std::string& i
   settings.usualSource = 1;
   settings.watch = image.Watch();
   if (!settings.watch) settings.watch = std::make_shared<datasources::ImageWatch>(imageFile);
+  settings.inputs = image.Inputs();
   settings.validity =
       image.DeliversValidity() ? ValidityOf(image) : ValidityBeside(imageFile, image);
+  if (settings.validity.hasMask && settings.inputs.mask.empty()) settings.inputs.mask = "beside";
   auto file = OpenLevels(imageFile, path);
   settings.coding.byteOrder = file->Structure().byteOrder;
   return std::make_unique<TiffLevelStore>(std::move(file), std::move(settings));

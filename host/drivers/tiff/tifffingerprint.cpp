@@ -80,8 +80,8 @@ TileTables TablesOf(const PositionedFile& file, const TiffStructure& structure,
 }
 
 /// \returns false when `stop` was requested
-bool AddTiles(const PositionedFile& file, const TileTables& tables, Fingerprinter& fingerprint,
-              const std::stop_token& stop) {
+bool AddTilesOf(const PositionedFile& file, const TileTables& tables, Fingerprinter& fingerprint,
+                const std::stop_token& stop) {
   const uint64_t size = file.Size();
   uint64_t left = size;  // tiles that overlap could make a small file take for ever
   std::unordered_map<uint64_t, size_t> firstAt;
@@ -113,6 +113,20 @@ bool AddTiles(const PositionedFile& file, const TileTables& tables, Fingerprinte
 
 }  // namespace
 
+bool AddStoredTiles(const PositionedFile& file, const TiffStructure& structure,
+                    const TiffDirectory& directory, Fingerprinter& fingerprint,
+                    const std::stop_token& stop) {
+  return AddTilesOf(file, TablesOf(file, structure, directory), fingerprint, stop);
+}
+
+void AddTileSizes(const PositionedFile& file, const TiffStructure& structure,
+                  const TiffDirectory& directory, Fingerprinter& fingerprint) {
+  const TileTables tables = TablesOf(file, structure, directory);
+  fingerprint.AddNumber(tables.counts.size());
+  for (size_t i = 0; i < tables.counts.size(); ++i)
+    fingerprint.AddNumber(tables.offsets[i] == 0 ? 0 : tables.counts[i]);
+}
+
 std::string FingerprintOfTiff(const std::string& path, const std::stop_token& stop) {
   const PositionedFile file(path, PositionedFile::Mode::kRead);
   const TiffStructure structure = ParseStructure(file);
@@ -122,10 +136,9 @@ std::string FingerprintOfTiff(const std::string& path, const std::stop_token& st
     const std::vector<uint8_t> bytes = ReadBytes(file, structure, *tables);
     fingerprint.Add(bytes.data(), bytes.size());
   }
-  if (!AddTiles(file, TablesOf(file, structure, image), fingerprint, stop)) return {};
+  if (!AddStoredTiles(file, structure, image, fingerprint, stop)) return {};
   const auto mask = Catalogue(file, structure, true).MaskOf(0);
-  if (mask &&
-      !AddTiles(file, TablesOf(file, structure, structure.directories[*mask]), fingerprint, stop))
+  if (mask && !AddStoredTiles(file, structure, structure.directories[*mask], fingerprint, stop))
     return {};
   return fingerprint.Text();
 }

@@ -4,6 +4,7 @@
 #include <algorithm>
 #include <utility>
 
+#include "host/datasources/levelsources.h"
 #include "host/drivers/tiff/levelwriter.h"
 #include "host/services/exception.h"
 #include "host/services/text.h"
@@ -14,7 +15,8 @@ using datasources::LevelDescription;
 
 std::unique_ptr<datasources::ILevelStore> OpenInternalLevels(
     const std::string& file, const PixelFormat& image, bool update,
-    std::shared_ptr<datasources::ImageWatch> watch, ImageValidity validity) {
+    std::shared_ptr<datasources::ImageWatch> watch, model::LevelInputs inputs,
+    ImageValidity validity) {
   auto levels = std::make_unique<LevelFile>(file, update);
   TiffLevelStore::Settings settings;
   settings.image = {image.width, image.height, image.samplesPerPixel, image.type, true};
@@ -23,13 +25,15 @@ std::unique_ptr<datasources::ILevelStore> OpenInternalLevels(
   settings.validity = std::move(validity);
   settings.usualSource = 1;
   settings.watch = std::move(watch);
+  settings.inputs = std::move(inputs);
   return std::make_unique<TiffLevelStore>(std::move(levels), std::move(settings));
 }
 
 TiffLevelStore::TiffLevelStore(std::unique_ptr<LevelFile> file, Settings settings)
     : file_(std::move(file)),
       settings_(std::move(settings)),
-      freshness_(settings_.watch, settings_.place == datasources::LevelPlace::kInternal) {
+      freshness_(settings_.watch, settings_.place == datasources::LevelPlace::kInternal,
+                 settings_.inputs) {
   Reload();
 }
 
@@ -38,10 +42,12 @@ TiffLevelStore::~TiffLevelStore() {
     StoreAllWaitingBut(0);
     const bool mayReclaim = settings_.place == datasources::LevelPlace::kInternal;
     if (!file_->IsChanged() && !(mayReclaim && PrepareToReclaim())) return;
-    freshness_.BeginChange(levels_);
+    freshness_.BeginChange(*file_, levels_);
     file_->Reclaim();
     Reload();
-    Settle();
+    EndChange();
+    if (file_->Exists())
+      freshness_.CommitStamps(file_->ToChange(), file_->Structure(), levels_, std::nullopt);
   } catch (...) {
     // deliberate: nothing is lost but space, which the next change finds again
   }
@@ -75,7 +81,7 @@ void TiffLevelStore::CatchUp() {
   file_->ToAppend();
   file_->Refresh();
   Reload();
-  freshness_.BeginChange(levels_);
+  freshness_.BeginChange(*file_, levels_);
 }
 
 void TiffLevelStore::Fail(const char* format, unsigned level, const char* operation) const {
@@ -101,8 +107,10 @@ const StoredLevel* TiffLevelStore::Find(unsigned level) const {
 }
 
 LevelDescription TiffLevelStore::Describe(const StoredLevel& stored,
-                                          datasources::LevelStatus status) const {
-  const bool isStale = status == datasources::LevelStatus::kStale;
+                                          const model::Freshness& freshness) const {
+  using datasources::LevelStatus;
+  const bool isLost =
+      freshness.status == LevelStatus::kStale || freshness.status == LevelStatus::kChanged;
   LevelDescription entry;
   entry.level = stored.level;
   entry.width = stored.format.width;
@@ -111,19 +119,22 @@ LevelDescription TiffLevelStore::Describe(const StoredLevel& stored,
   entry.file = file_->Path();
   entry.method = stored.metadata.method;
   entry.hasMask = stored.mask.has_value();
-  entry.status = status;
+  entry.status = freshness.status;
+  entry.reason = freshness.reason;
   const std::string& validity = stored.metadata.validity;
   const bool lacksMask = GetsMask(stored.format) && !stored.mask;
-  if (stored.isOurs && lacksMask && !isStale) entry.status = datasources::LevelStatus::kUnfinished;
+  if (stored.isOurs && lacksMask && !isLost) entry.status = LevelStatus::kUnfinished;
   for (uint32_t i = 0; i < settings_.image.samples; ++i) {
     entry.presentChannels.push_back(!stored.isOurs || validity[i] != kAbsent);
     entry.validChannels.push_back(!stored.isOurs ||
-                                  (validity[i] == kValid && !isStale && !lacksMask));
+                                  (validity[i] == kValid && !isLost && !lacksMask));
   }
   if (!stored.isOurs) return entry;
   entry.sourceLevel = stored.metadata.sourceLevel;
   entry.program = stored.metadata.program;
   entry.image = stored.metadata.image;
+  entry.bytes = stored.metadata.content.bytes;
+  entry.sourceBytes = stored.metadata.sourceBytes;
   return entry;
 }
 
@@ -153,11 +164,12 @@ void TiffLevelStore::AddPending(unsigned level, const Pending& pending,
 std::vector<LevelDescription> TiffLevelStore::List() const {
   const std::lock_guard lock(mutex_);
   std::vector<LevelDescription> list;
-  const LevelFreshness::Judgement judgement = freshness_.Judge(levels_);
-  if (file_->MayChange()) Keep(judgement);
+  const LevelFreshness::Answers answers = freshness_.CheckFreshness(*file_, levels_);
+  if (file_->MayChange() && freshness_.IsInImage()) KeepStamps(answers);  // opened for update
   for (size_t i = 0; i < levels_.size(); ++i)
     if (Find(levels_[i].level) == &levels_[i])
-      list.push_back(Describe(levels_[i], judgement.statuses[i]));
+      list.push_back(Describe(levels_[i], answers.levels[i]));
+  if (settings_.place == datasources::LevelPlace::kInternal) datasources::CheckSources(list);
   for (const auto& [level, pending] : pending_) AddPending(level, pending, list);
   std::sort(list.begin(), list.end(),
             [](const LevelDescription& a, const LevelDescription& b) { return a.level < b.level; });
@@ -168,12 +180,11 @@ std::vector<LevelDescription> TiffLevelStore::ListHidden() const {
   const std::lock_guard lock(mutex_);
   std::vector<LevelDescription> hidden;
   for (const StoredLevel& level : levels_)
-    if (Find(level.level) != &level)
-      hidden.push_back(Describe(level, datasources::LevelStatus::kUnverified));
+    if (Find(level.level) != &level) hidden.push_back(Describe(level, model::Freshness()));
   if (!catalogue_) return hidden;
   for (const StoredLevel& level :
        FindSubLevels(file_->File(), file_->Structure(), *catalogue_, settings_.image)) {
-    hidden.push_back(Describe(level, datasources::LevelStatus::kUnverified));
+    hidden.push_back(Describe(level, model::Freshness()));
     hidden.back().isInSubDirectory = true;
   }
   return hidden;
@@ -205,12 +216,11 @@ void TiffLevelStore::Create(unsigned level, const std::vector<unsigned>& channel
   if (entry == pending_.end()) {
     RequireRoomFor(level, channels);
     entry = pending_.emplace(level, PendingFor(level)).first;
-    entry->second.imageAtStart = freshness_.Now();
+    entry->second.start = freshness_.Begin(levels_);
   }
   for (const unsigned channel : channels) entry->second.channels.at(channel - 1) = true;
   entry->second.method = method;
-  lastRead_ = 0;
-  source_.reset();
+  source_ = {};
 }
 
 std::unique_ptr<datasources::IRasterWriter> TiffLevelStore::OpenWriter(
@@ -270,7 +280,7 @@ TiffLevelStore::Pending& TiffLevelStore::Reopen(unsigned level,
   }
   if (entry != pending_.end()) return entry->second;
   Pending pending;
-  pending.imageAtStart = freshness_.Now();
+  pending.start = freshness_.Begin(levels_);
   pending.channels.resize(settings_.image.samples);
   pending.method = ours->metadata.method;
   pending.coding = CodingOfStored(*ours);
@@ -290,8 +300,11 @@ void TiffLevelStore::Mark(const StoredLevel& stored, const std::vector<unsigned>
 std::shared_ptr<LevelBuild> TiffLevelStore::BeginWriting(unsigned level,
                                                          const std::vector<unsigned>& channels) {
   const std::lock_guard lock(mutex_);
+  file_->ToAppend();  // locked from here on, nothing is written yet
+  RequireSource(level);
   CatchUp();
   Pending& pending = Reopen(level, channels);
+  pending.together = channels.size() > 1 ? channels : std::vector<unsigned>();
   const StoredLevel* ours = FindOurs(level);
   std::vector<unsigned> valid;
   for (const unsigned channel : channels)
@@ -302,7 +315,6 @@ std::shared_ptr<LevelBuild> TiffLevelStore::BeginWriting(unsigned level,
   });
   if (!pending.build)
     pending.build = std::make_shared<LevelBuild>(pending.coding, file_->ToAppend().End());
-  if (!source_) freshness_.Prepare(pending.imageAtStart);
   ++pending.build->writers;
   return pending.build;
 }
@@ -350,7 +362,7 @@ void TiffLevelStore::EndWriting(unsigned level, LevelBuild& build) noexcept {
   }
   try {
     if (!build.isClosed) GiveUp(level, build);
-    Settle();
+    EndChange();
   } catch (...) {
     // deliberate: what was appended stays behind unused
   }
@@ -366,9 +378,10 @@ void TiffLevelStore::SetValid(unsigned level, const std::vector<unsigned>& chann
         Fail(_("%s: level %u is not complete and cannot be marked valid."), level, "SetValid");
     if (const LevelBuild* mask = pending->second.build->mask.get(); mask && !mask->IsComplete(0))
       Fail(_("%s: level %u is not complete and cannot be marked valid."), level, "SetValid");
-    const datasources::ImageRecord image = RecordOrGiveUp(level, pending->second);
-    if (!Waits(pending->second, channels, image))
-      StoreFinished(level, pending->second, channels, image);
+    LevelSource source = source_;
+    source.image = RecordOrGiveUp(level, pending->second);
+    if (!Waits(pending->second, channels, source))
+      StoreFinished(level, pending->second, channels, source);
     return;
   }
   if (AnyWaits(level, channels) || !Find(level)) StoreWaiting(level);
@@ -379,10 +392,12 @@ void TiffLevelStore::SetValid(unsigned level, const std::vector<unsigned>& chann
 void TiffLevelStore::MarkStored(unsigned level, const std::vector<unsigned>& channels, bool valid) {
   const StoredLevel* stored = Find(level);
   RequireStored(stored, level, channels);
+  if (stored->isOurs && valid) RecordContent(level);
+  stored = Find(level);
   if (stored->isOurs) Mark(*stored, channels, valid ? kValid : kInvalid);
   else if (!valid)
     Fail(_("%s: level %u is another program's and cannot be marked."), level, "SetValid");
-  Settle();
+  EndChange();
 }
 
 void TiffLevelStore::RequireStored(const StoredLevel* stored, unsigned level,

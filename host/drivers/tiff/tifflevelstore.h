@@ -25,10 +25,12 @@ namespace orin::drivers {
 /// \param image   format of the file's first directory
 /// \param update  levels may be made and changed
 /// \param watch   of the image
+/// \param inputs  what a run is told of it
 /// \throws orin::Exception  the file's structure cannot be read
 std::unique_ptr<datasources::ILevelStore> OpenInternalLevels(
     const std::string& file, const PixelFormat& image, bool update,
-    std::shared_ptr<datasources::ImageWatch> watch, ImageValidity validity = {});
+    std::shared_ptr<datasources::ImageWatch> watch, model::LevelInputs inputs,
+    ImageValidity validity = {});
 
 /// A level appears in the file when it is complete: tiles first, then its directory, then the link
 /// to it, then its validity, each durable before the next. Until then it is pending here; a pending
@@ -46,6 +48,7 @@ class TiffLevelStore final : public datasources::ILevelStore {
     ImageValidity validity;
     unsigned usualSource = 0;  ///< recorded as a level's source when no level was read for it
     std::shared_ptr<datasources::ImageWatch> watch;  ///< of the image
+    model::LevelInputs inputs;                       ///< what a run is told of the image
   };
   /// \throws orin::Exception  the file cannot be read
   TiffLevelStore(std::unique_ptr<LevelFile> file, Settings settings);
@@ -95,16 +98,24 @@ class TiffLevelStore final : public datasources::ILevelStore {
   void EndWriting(unsigned level, LevelBuild& build) noexcept;
 
  private:
+  /// What a level is computed from.
+  struct LevelSource {
+    unsigned level = 0;        ///< whose pixels were read since the last Create; 0 none
+    std::string bytes;         ///< digest of what it stores; empty when unknown
+    model::ImageRecord image;  ///< that it was computed from; blank where it is unknown
+    bool isLevel = false;      ///< false: the image itself is, as far as is known
+  };
+
   struct Pending {
     std::vector<bool> channels;  ///< created
     std::string method;
     LevelCoding coding;
     bool isRecoded = false;             ///< stored tiles have another form and are given up
     std::shared_ptr<LevelBuild> build;  ///< null until the first write
-    std::optional<datasources::ImageStamp> imageAtStart;
-    std::vector<unsigned> waiting;          ///< channels that are finished and wait for the others
-    datasources::ImageRecord waitingImage;  ///< what these were computed from
-    unsigned waitingSource = 0;             ///< and from which level; 0 as for `lastRead_`
+    std::optional<LevelFreshness::Start> start;  ///< of its computation
+    std::vector<unsigned> together;              ///< channels of one pass, when it treats several
+    std::vector<unsigned> waiting;  ///< channels that are finished and wait for the others
+    LevelSource waitingSource;      ///< what these were computed from
     std::unique_ptr<LevelBuild> waitingMask;  ///< of these; null when they have none
   };
 
@@ -118,7 +129,7 @@ class TiffLevelStore final : public datasources::ILevelStore {
   void CatchUp();
   bool PrepareToReclaim();
   datasources::LevelDescription Describe(const StoredLevel& stored,
-                                         datasources::LevelStatus status) const;
+                                         const model::Freshness& freshness) const;
   void AddPending(unsigned level, const Pending& pending,
                   std::vector<datasources::LevelDescription>& list) const;
   LevelCoding CodingOfStored(const StoredLevel& stored) const;
@@ -130,32 +141,36 @@ class TiffLevelStore final : public datasources::ILevelStore {
   Pending& Reopen(unsigned level, const std::vector<unsigned>& channels);
   void Mark(const StoredLevel& stored, const std::vector<unsigned>& channels, char validity);
 
-  datasources::ImageRecord RecordOrGiveUp(unsigned level, const Pending& pending);
+  model::ImageRecord RecordOrGiveUp(unsigned level, const Pending& pending);
   void NoteSource(const StoredLevel& stored, const std::vector<unsigned>& channels);
-  void Settle();
-  void Keep(const LevelFreshness::Judgement& judgement) const;
+  void RequireSource(unsigned level);
+  void RequireSourceLevel() const;
+  void RecordContent(unsigned level);
+  bool IsWhole(const StoredLevel& stored);
+  void EndChange();
+  void KeepStamps(const LevelFreshness::Answers& answers) const;
 
-  LevelMetadata MetadataFor(unsigned level, const Pending& pending, const StoredLevel* before,
-                            const datasources::ImageRecord& image) const;
+  model::LevelRecord RecordFor(unsigned level, const Pending& pending, const StoredLevel* before,
+                               const LevelSource& source);
+  char ValidityOfOthers(const StoredLevel& before, const model::LevelRecord& now);
   std::vector<uint32_t> PlanesOf(const LevelCoding& coding,
                                  const std::vector<unsigned>& channels) const;
   std::vector<uint32_t> CompletePlanes(const LevelBuild& build) const;
   void RequireStored(const StoredLevel* stored, unsigned level,
                      const std::vector<unsigned>& channels) const;
   bool Waits(Pending& pending, const std::vector<unsigned>& channels,
-             const datasources::ImageRecord& image) const;
+             const LevelSource& source) const;
   bool WouldMix(unsigned level, const Pending& pending) const;
   bool AnyWaits(unsigned level, const std::vector<unsigned>& channels) const;
   void StoreWaiting(unsigned level);
   void StoreAllWaitingBut(unsigned level);
   void StoreFinished(unsigned level, Pending& pending, const std::vector<unsigned>& channels,
-                     const datasources::ImageRecord& image);
+                     const LevelSource& source);
   void MarkStored(unsigned level, const std::vector<unsigned>& channels, bool valid);
   void Store(unsigned level, Pending& pending, const std::vector<uint32_t>& planes,
-             std::unique_ptr<LevelBuild> mask,
-             const std::optional<datasources::ImageRecord>& image);
+             std::unique_ptr<LevelBuild> mask, const std::optional<LevelSource>& source);
   Place NewPlace(const PixelFormat& format) const;
-  void AddDirectory(const Pending& pending, const LevelMetadata& metadata,
+  void AddDirectory(const Pending& pending, const model::LevelRecord& record,
                     const std::vector<uint32_t>& planes, const LevelBuild* mask);
   StoredMask MaskBefore(unsigned level, const LevelBuild& mask);
   void TidyMasks(std::optional<uint64_t> strayMask);
@@ -170,13 +185,12 @@ class TiffLevelStore final : public datasources::ILevelStore {
   Settings settings_;
   datasources::LevelOptions options_;
   mutable LevelFreshness freshness_;
-  mutable std::optional<datasources::ImageStamp> kept_;  ///< of the last answer that was kept
+  mutable std::optional<model::ImageStamp> kept_;  ///< of the last answer that was kept
   std::optional<Catalogue> catalogue_;  ///< of the structure that `levels_` were found in
   std::vector<StoredLevel> levels_;
   std::map<unsigned, Pending> pending_;
   std::map<unsigned, std::vector<unsigned>> maskedChannels_;  ///< whose passes a mask has joined
-  unsigned lastRead_ = 0;  ///< level whose pixels were read since the last Create; 0 none
-  std::optional<datasources::ImageRecord> source_;  ///< of that level; blank where it is unknown
+  LevelSource source_;                                        ///< of the level created last
 };
 
 }  // namespace orin::drivers

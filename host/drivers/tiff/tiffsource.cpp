@@ -16,6 +16,7 @@
 #include "host/drivers/common/auxiliaryfile.h"
 #include "host/drivers/tiff/declarednodata.h"
 #include "host/drivers/tiff/file/catalogue.h"
+#include "host/drivers/tiff/imagecoding.h"
 #include "host/drivers/tiff/pixelreader.h"
 #include "host/drivers/tiff/tifffingerprint.h"
 #include "host/drivers/tiff/tifflevelstore.h"
@@ -129,7 +130,8 @@ TiffSource::TiffSource(std::string file, datasources::AccessMode access) : file_
       file_, [path = file_](const std::stop_token& stop) { return FingerprintOfTiff(path, stop); });
   FindMasks();
   const ImageValidity validity = ValidityOf(*this);
-  levels_ = OpenInternalLevels(file_, format_, access == datasources::kUpdate, watch_, validity);
+  levels_ = OpenInternalLevels(file_, format_, access == datasources::kUpdate, watch_, Inputs(),
+                               validity);
 }
 
 void TiffSource::FindMasks() {
@@ -138,6 +140,8 @@ void TiffSource::FindMasks() {
   if (const auto mask = Catalogue(file, structure, true).MaskOf(0))
     maskOffset_ = structure.directories[*mask].offset;
   isCloudOptimized_ = IsCloudOptimizedTiff(file, structure);
+  coding_ = CodingDigestOf(file, structure, structure.directories[0]);
+  palette_ = PaletteDigestOf(file, structure, structure.directories[0]);
   hasMaskBeside_ = OpenMaskBeside(file_, format_.width, format_.height) != nullptr;
 }
 
@@ -149,6 +153,15 @@ std::unique_ptr<datasources::IValidityReader> TiffSource::OpenMask() {
 }
 
 TiffSource::~TiffSource() = default;
+
+model::LevelInputs TiffSource::Inputs() const {
+  model::LevelInputs inputs = datasources::InputsOf(*this);
+  inputs.mask = maskOffset_ ? "inside" : "";
+  if (hasMaskBeside_) inputs.mask += maskOffset_ ? ",beside" : "beside";
+  inputs.coding = coding_;
+  inputs.palette = palette_;
+  return inputs;
+}
 
 AuxiliaryData TiffSource::MetadataOf(const std::vector<unsigned>& channels) const {
   std::map<std::optional<unsigned>, AuxiliaryData::Items> bySample;  // none: of the file

@@ -45,6 +45,8 @@ class TiffSource final : public datasources::IRasterSource {
   std::unique_ptr<datasources::IValidityReader> OpenMask() override;
   bool DeliversValidity() const override { return true; }
   datasources::ILevelStore* Levels() override { return levels_.get(); }
+  /// With the tags that decide what stored bytes mean, and the palette.
+  model::LevelInputs Inputs() const override;
   std::shared_ptr<datasources::ImageWatch> Watch() override { return watch_; }
 
  private:
@@ -57,6 +59,8 @@ class TiffSource final : public datasources::IRasterSource {
   unsigned alphaChannel_ = 0;
   std::optional<uint64_t> maskOffset_;  ///< of the mask inside the file
   bool hasMaskBeside_ = false;
+  std::string coding_;   ///< digest
+  std::string palette_;  ///< digest; empty without one
   bool namesCategories_ = false;
   model::NoDataOrigin noDataOrigin_ = model::NoDataOrigin::kNowhere;
   bool isCloudOptimized_ = false;

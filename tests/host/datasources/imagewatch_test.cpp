@@ -59,7 +59,7 @@ TEST(ImageRecord, IsReadBackFromATextOfOneLength) {
            {"0123456789abcdef0123456789abcdef", {UINT64_MAX, INT64_MIN, UINT64_MAX}},
            {kSome, {314585770, 1795290000123456789, 1}},
            {kSome, {0, INT64_MAX, 0}}}) {
-    const std::string text = TextOf(record);
+    const std::string text = datasources::TextOf(record);
     EXPECT_EQ(kImageRecordLength, text.size()) << text;
     EXPECT_EQ(record, ParseImageRecord(text)) << text;
     if (!record.IsBlank()) {
@@ -69,7 +69,7 @@ TEST(ImageRecord, IsReadBackFromATextOfOneLength) {
 }
 
 TEST(ImageRecord, OfADamagedTextIsBlank) {
-  const std::string text = TextOf(ImageRecord{kSome, {12, 34, 56}});
+  const std::string text = datasources::TextOf(ImageRecord{kSome, {12, 34, 56}});
   for (size_t i = 0; i < text.size(); ++i) {
     if (i == kFingerprintLength || text[i] == ' ') continue;
     std::string damaged = text;

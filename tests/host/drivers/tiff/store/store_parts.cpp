@@ -68,9 +68,13 @@ TEST(Factor, OfAnySizeLeadsBackToThatSize) {
 }
 
 TEST(Metadata, OfALevelIsReadBackAndItsValidityIsFound) {
-  const LevelMetadata written{
-      .method = "A<&>B", .level = 8, .sourceLevel = 4, .program = "Orin \"x\"", .validity = "10-1"};
-  const std::string text = ComposeLevelMetadata(written);
+  model::LevelRecord written;
+  written.method = "A<&>B";
+  written.level = 8;
+  written.sourceLevel = 4;
+  written.program = "Orin \"x\"";
+  written.validity = "10-1";
+  const std::string text = drivers::ComposeLevelMetadata(written);
   const LevelMetadata read = drivers::ParseLevelMetadata(text);
   EXPECT_EQ(written.method, read.method);
   EXPECT_EQ(8u, read.level);
@@ -78,6 +82,8 @@ TEST(Metadata, OfALevelIsReadBackAndItsValidityIsFound) {
   EXPECT_EQ(written.program, read.program);
   EXPECT_EQ("10-1", read.validity);
   EXPECT_EQ("10-1", text.substr(read.validityAt, 4));
+  EXPECT_EQ(model::TextOf(written.image), text.substr(read.imageAt, model::kImageTextLength));
+  EXPECT_EQ(model::TextOf(written.content), text.substr(read.contentAt, model::kContentTextLength));
 }
 
 TEST(Metadata, HasItsValidityWhereTheItemStandsThatCounts) {

@@ -71,11 +71,15 @@ TEST_F(Space, OfAReplacedLevelStaysAsItIsWhileAnotherProgramHasTheFileOpen) {
   const auto valid = PlacesOf("ORIN_VALID\">111<");
   ASSERT_EQ(3u, valid.size());
   mayChange.Add({valid[0], valid[0] + 3});
-  const auto stamps = PlacesOf("ORIN_IMAGE\">");
-  ASSERT_EQ(3u, stamps.size());
+  const auto images = PlacesOf("ORIN_IMAGE\">");
+  const auto contents = PlacesOf("ORIN_CONTENT\">");
+  ASSERT_EQ(3u, images.size());
+  ASSERT_EQ(3u, contents.size());
   for (const size_t level : {1u, 2u}) {
-    const uint64_t end = stamps[level] + datasources::kImageRecordLength;
-    mayChange.Add({end - datasources::kImageStampLength, end});
+    const uint64_t imageEnd = images[level] + model::kImageTextLength;
+    mayChange.Add({imageEnd - model::kImageStampTextLength, imageEnd});
+    const uint64_t contentEnd = contents[level] + model::kContentTextLength;
+    mayChange.Add({contentEnd - model::kFileStampLength, contentEnd});
   }
   std::ifstream reader(file_);
   Build(file_, kImage, {.level = 2});

@@ -215,14 +215,15 @@ inline std::vector<char> BytesOf(const std::string& file) {
   return {std::istreambuf_iterator<char>(stream), {}};
 }
 
-/// The same without what levels remember of their image, which changes with the file's time.
+/// The same without what levels record of image and file, which changes with the file's time.
 inline std::string BytesWithoutRecords(const std::string& file) {
   const std::vector<char> bytes = BytesOf(file);
   std::string text(bytes.begin(), bytes.end());
-  const std::string item = "ORIN_IMAGE\">";
-  for (size_t at = text.find(item); at != text.npos; at = text.find(item, at + 1))
-    text.replace(at + item.size(), datasources::kImageRecordLength,
-                 std::string(datasources::kImageRecordLength, '-'));
+  const std::pair<std::string, size_t> items[] = {{"ORIN_IMAGE\">", model::kImageTextLength},
+                                                  {"ORIN_CONTENT\">", model::kContentTextLength}};
+  for (const auto& [item, length] : items)
+    for (size_t at = text.find(item); at != text.npos; at = text.find(item, at + 1))
+      text.replace(at + item.size(), length, std::string(length, '-'));
   return text;
 }
 
