@@ -10,11 +10,11 @@
 
 #include "fuzz/check.h"
 #include "fuzz/scratchfile.h"
-#include "host/drivers/gdal/hfablocks.h"
-#include "host/drivers/gdal/hfacatalogue.h"
-#include "host/drivers/gdal/hfacompactor.h"
-#include "host/drivers/gdal/hfaspace.h"
-#include "host/drivers/gdal/hfatreecopy.h"
+#include "host/drivers/hfa/hfablocks.h"
+#include "host/drivers/hfa/hfacatalogue.h"
+#include "host/drivers/hfa/hfacompactor.h"
+#include "host/drivers/hfa/hfaspace.h"
+#include "host/drivers/hfa/hfatreecopy.h"
 #include "host/services/exception.h"
 
 namespace {

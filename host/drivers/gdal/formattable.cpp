@@ -7,7 +7,11 @@ namespace {
 // No name may hold "TIFF", nor "ZMB"
 // but for the one format that keeps levels inside.
 constexpr GdalFormat kFormats[] = {
+#ifdef ORIN_HAS_HFA_LEVELS
     {"HFA", "GDALRegister_HFA", kFormatErdas, "ZMBERDAS", "ERDAS Imagine", 1, Decoding::kBlocks},
+#else  // deliberate: another code and name, which say that levels go beside the file
+    {"HFA", "GDALRegister_HFA", 318, "ERDAS", "ERDAS Imagine", 0, Decoding::kBlocks},
+#endif
     {"VRT", "GDALRegister_VRT", 300, "VRT", "virtual raster (VRT)", 0,
      Decoding::kRowsOfAllChannels},
     {"GTiff", "GDALRegister_GTiff", kFormatArchivedTiff, "GTIF-REMOTE",

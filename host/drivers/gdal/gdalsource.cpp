@@ -14,7 +14,6 @@
 #include "host/drivers/gdal/gdalmask.h"
 #include "host/drivers/gdal/gdalreader.h"
 #include "host/drivers/gdal/gdalwatch.h"
-#include "host/drivers/gdal/hfalevelstore.h"
 #include "host/drivers/gdal/rasternames.h"
 #include "host/drivers/gdal/subdatasets.h"
 #include "host/services/exception.h"
@@ -41,7 +40,8 @@ void RequireWritable(const std::string& name) {
 
 }  // namespace
 
-GdalSource::GdalSource(std::string name, const GdalFormat& format, SourceUse use)
+GdalSource::GdalSource(std::string name, const GdalFormat& format, SourceUse use,
+                       OpenInternalLevels erdasLevels)
     : name_(std::move(name)), format_(format) {
   if (use != SourceUse::kRead) RequireWritable(name_);
   const GdalHandle handle(name_, format_);
@@ -55,9 +55,9 @@ GdalSource::GdalSource(std::string name, const GdalFormat& format, SourceUse use
   watch_ = WatchOf(handle, format_);
   if (format_.code == kFormatArchivedTiff || format_.code == kFormatTiffPage)
     levels_ = ArchivedLevels(name_, format_);
-  if (format_.code != kFormatErdas) return;
+  if (format_.code != kFormatErdas || !erdasLevels) return;
   if (use == SourceUse::kUpdate) RequireAllValid();
-  levels_ = OpenHfaLevels(name_, format_, *this, use);
+  levels_ = erdasLevels(name_, format_, *this, use);
 }
 
 GdalSource::~GdalSource() = default;

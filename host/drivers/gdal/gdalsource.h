@@ -10,6 +10,7 @@
 #include "host/datasources/levelstore.h"
 #include "host/drivers/gdal/decodedrows.h"
 #include "host/drivers/gdal/gdalhandle.h"
+#include "host/drivers/gdal/internallevels.h"
 #include "host/drivers/gdal/sourceuse.h"
 
 namespace orin::drivers {
@@ -18,7 +19,9 @@ class GdalSource final : public datasources::IRasterSource {
  public:
   /// \throws orin::Exception  it cannot be opened, it holds no raster, or unless for kRead: it
   ///                          cannot be written, or cannot hold levels that its format could
-  GdalSource(std::string name, const GdalFormat& format, SourceUse use);
+  /// \param erdasLevels  of ERDAS Imagine files; may be null
+  GdalSource(std::string name, const GdalFormat& format, SourceUse use,
+             OpenInternalLevels erdasLevels);
   ~GdalSource() override;
 
   unsigned Width() const override { return width_; }

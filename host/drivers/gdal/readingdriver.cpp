@@ -61,6 +61,8 @@ std::string WhyNotOpened(const std::string& name) {
 
 class ReadingDriver final : public datasources::IFormatDriver {
  public:
+  explicit ReadingDriver(OpenInternalLevels erdasLevels) : erdasLevels_(erdasLevels) {}
+
   std::vector<ZMBInfo_s> Formats() const override { return GdalFormatRecords(); }
 
   ZMBFormatType Identify(const std::string& file) const override {
@@ -86,8 +88,8 @@ class ReadingDriver final : public datasources::IFormatDriver {
   bool IsPath(const std::string& file) const override { return IsRegularFile(file); }
 
  private:
-  static std::unique_ptr<datasources::IRasterSource> OpenFor(const std::string& file,
-                                                             SourceUse use) {
+  std::unique_ptr<datasources::IRasterSource> OpenFor(const std::string& file,
+                                                      SourceUse use) const {
     const GdalFormat* format = IdentifyGdalFormat(file);
     if (!format)
       throw Exception(FormatString(_("%s: is not a raster file of a known format."), file.c_str()),
@@ -95,8 +97,10 @@ class ReadingDriver final : public datasources::IFormatDriver {
     if (const std::string special = SpecialFileOf(file); !special.empty())
       throw Exception(SpecialFileText(file, special), "host/drivers/gdal/readingdriver",
                       "ReadingDriver::Open", 0);
-    return std::make_unique<GdalSource>(file, *format, use);
+    return std::make_unique<GdalSource>(file, *format, use, erdasLevels_);
   }
+
+  OpenInternalLevels erdasLevels_;
 };
 
 void SetUpLibrary() {
@@ -112,9 +116,9 @@ void SetUpLibrary() {
 
 }  // namespace
 
-std::unique_ptr<datasources::IFormatDriver> MakeReadingDriver() {
+std::unique_ptr<datasources::IFormatDriver> MakeReadingDriver(OpenInternalLevels erdasLevels) {
   SetUpLibrary();
-  return std::make_unique<ReadingDriver>();
+  return std::make_unique<ReadingDriver>(erdasLevels);
 }
 
 }  // namespace orin::drivers

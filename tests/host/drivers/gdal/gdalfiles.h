@@ -18,10 +18,17 @@
 #include "host/datasources/formats.h"
 #include "host/drivers/gdal/gdalerrors.h"
 #include "host/drivers/gdal/readingdriver.h"
+#include "host/drivers/hfa/hfalevelstore.h"
 #include "host/drivers/tiff/tiffdriver.h"
 #include "host/services/exception.h"
 
 namespace orin::tests {
+
+#ifdef ORIN_HAS_HFA_LEVELS
+inline constexpr drivers::OpenInternalLevels kErdasLevels = &drivers::OpenHfaLevels;
+#else
+inline constexpr drivers::OpenInternalLevels kErdasLevels = nullptr;
+#endif
 
 /// A folder of the test's own; the TIFF driver and the GDAL driver in the registry.
 class GdalFiles : public ::testing::Test {
@@ -32,7 +39,7 @@ class GdalFiles : public ::testing::Test {
     folder_ = name;
     datasources::FormatRegistry::Instance().Clear();
     drivers::RegisterTiffDriver();
-    datasources::FormatRegistry::Instance().Register(drivers::MakeReadingDriver());
+    datasources::FormatRegistry::Instance().Register(drivers::MakeReadingDriver(kErdasLevels));
   }
   ~GdalFiles() override {
     datasources::FormatRegistry::Instance().Clear();
