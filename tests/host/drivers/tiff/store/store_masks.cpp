@@ -189,9 +189,11 @@ TEST_P(StoredMasks, OfFinishedChannelsStandBesideTheImageWhenTheRunEnds) {
   WriteLevel(*OpenGeneric(file_), Checks, 100, {2});
   EXPECT_EQ("-1-", ValidityOf(LevelsOf(*OpenGeneric(file_)).at(0)));
   EXPECT_EQ("", WrongMask(file_ + ".ovr", 1, Checks));
-  const auto dataset = OpenGeneric(file_);  // in the file they are joined as well
-  WriteLevel(*dataset, Columns, 100, {1});
-  WriteLevel(*dataset, Corner, 100, {3});
+  {
+    const auto dataset = OpenGeneric(file_);  // in the file they are joined as well
+    WriteLevel(*dataset, Columns, 100, {1});
+    WriteLevel(*dataset, Corner, 100, {3});
+  }
   EXPECT_EQ("", WrongMask(file_ + ".ovr", 1,
                           [](uint32_t x, uint32_t y) { return Corner(x, y) || Columns(x, y); }));
 }
