@@ -193,7 +193,8 @@ class Rebuilt(Case):
         write_tiff(file, smooth_pixels((2, 210, 260)), "Byte", ["COMPRESS=DEFLATE"])
         self.assertRan(run("build", file, *self.LEVELS))
         for number, levels in enumerate(("4", "2", "8,16", "2,16", "4", "2")):
-            others = [level for level in (2, 4, 8, 16) if str(level) not in levels.split(",")]
+            # Those above a rebuilt level are computed from it, and are built again with it.
+            others = [level for level in (2, 4, 8, 16) if level < int(levels.split(",")[0])]
             before = content_of(file)
             self.assertRan(run("build", file, "--levels", levels, "--force", "--method",
                                ("mode", "bicubic", "nearest")[number % 3]))
