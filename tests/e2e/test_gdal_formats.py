@@ -131,7 +131,7 @@ class SideCars(Formats):
         write("rgb.png", "PNG", random_pixels((3, ROWS, COLUMNS), numpy.uint8, 1), "Byte")
         answer = run("build", "rgb.png", "--internal")
         self.assertNotEqual(0, answer.returncode)
-        self.assertIn("not supported for PNG files", answer.stderr)
+        self.assertIn("PNG files hold no levels inside", answer.stderr)
         self.assertEqual(["rgb.png"], os.listdir("."))
 
     def test_of_an_image_made_on_one_bit_are_not_needed(self):

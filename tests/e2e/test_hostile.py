@@ -218,7 +218,7 @@ class Hostile(Case):
         path = file.write(self.path("texts.tif"))
         ended = limits.run("info", path, seconds=limits.INFO_SECONDS)
         self.check(ended, path, WORKS, limits.CANNOT_OPEN)
-        self.assertIn("?[31mRED?", ended.out)
+        self.assertIn(r"\x1b[31mRED\x07", ended.out)
         self.assertTrue(all(len(line) < 200 for line in ended.out.splitlines()), ended.out)
         self.assertTrue(ended.out.replace("\n", "").isprintable())
 

@@ -73,7 +73,8 @@ class Examples(unittest.TestCase):
         (self.folder / "notes.txt").write_text("no raster\n")
         for name, code, text in [
                 ("missing.tif", 2, "missing.tif: cannot be opened: No such file or directory.\n"),
-                ("notes.txt", 2, "notes.txt: is not a raster file of a known format.\n"),
+                ("notes.txt", 2, "notes.txt: is not a raster file of a known format. If another "
+                 "program reads it, make a TIFF of it: gdal_translate notes.txt OUT.tif\n"),
                 (self.image(20, 10, "small.tif").name, 3,
                  "small.tif: an image of 20 x 10 pixels needs no levels.\n")]:
             answer = self.run_example("progress", name)
