@@ -177,8 +177,9 @@ ExitCode TryFile(const BuildOptions& options, const std::string& file,
     const auto access =
         options.placement == Placement::kExternal ? datasources::kReadOnly : datasources::kUpdate;
     const auto site = datasources::DatasetManager::GetInstance()->OpenSite(file, access);
-    code = kCannotBuild;
-    return FileBuild(*site, options, interruption, console).Run();
+    FileBuild build(*site, options, interruption, console);
+    code = kCannotBuild;  // the file and its side-car could be read
+    return build.Run();
   } catch (const datasources::OptionException& error) {
     console.Error(AfterFileName(file, error.GetMessage()));
     code = kWrongUsage;

@@ -50,6 +50,9 @@ class IFormatDriver {
   virtual std::string WhyUnrecognised(const std::string& /*file*/) const { return {}; }
   /// \throws orin::Exception  the file cannot be opened in that mode; the text says why
   virtual std::unique_ptr<IRasterSource> Open(const std::string& file, AccessMode access) = 0;
+  /// True when nothing but damage or a failure can keep `file`, one of this driver's, from being
+  /// opened for update.
+  virtual bool MayUpdate(const std::string& /*file*/) const { return false; }
   /// The same as `Open` for kUpdate, but for files too that can lose levels and take none.
   virtual std::unique_ptr<IRasterSource> OpenToRemoveLevels(const std::string& file) {
     return Open(file, kUpdate);

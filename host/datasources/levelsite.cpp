@@ -22,6 +22,7 @@ LevelSite::LevelSite(IFormatDriver& driver, int formatCode, std::string file, Ac
       image_ = driver.Open(file_, kUpdate);
       access_ = kUpdate;
     } catch (const Exception& refusal) {
+      if (driver.MayUpdate(file_)) throw;  // levels beside it would hide the failure
       updateRefusal_ = refusal.GetMessage();
     }
   }

@@ -22,7 +22,8 @@ struct LeftOver {
 class LevelSite {
  public:
   /// \param access  kUpdate: for update where that is possible, else for reading
-  /// \throws orin::Exception  the image cannot be opened; the text names the file and the reason
+  /// \throws orin::Exception  the image cannot be opened, or not for update although it may be
+  ///                          written; the text names the file and the reason
   LevelSite(IFormatDriver& driver, int formatCode, std::string file, AccessMode access);
 
   const std::string& File() const { return file_; }

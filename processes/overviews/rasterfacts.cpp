@@ -39,8 +39,8 @@ RasterFacts FactsOf(datasources::LevelSite& site, const datasources::LevelOption
   facts.isCategorical = image.HoldsClasses();
   facts.isWritable = dataset->GetAccessMode() == datasources::kUpdate;
   // A file that is refused for update may show no levels inside; its refusal says why.
-  facts.holdsLevels = SupportsInternalOverviews(dataset.get()) &&
-                      (image.Levels() || !facts.isWritable);
+  facts.holdsLevels =
+      SupportsInternalOverviews(dataset.get()) && (image.Levels() || !facts.isWritable);
   facts.inside = FactsIn(site, LevelPlace::kInternal, storing);
   facts.beside = FactsIn(site, LevelPlace::kSideCar, storing);
   facts.leftOver = site.FindLeftOver();

@@ -14,7 +14,7 @@ using datasources::LevelPlace;
 /// Two channels; level 2 inside, level 4 in the side-car with its second channel out of date.
 RasterInfo Scene() {
   RasterInfo info{"scene.tif", "TIFF", "TIFF / GeoTIFF", 1001, 777, {gobs::eDT_8U, gobs::eDT_8U},
-                  {}};
+                  {},          {}};
   info.levels.push_back({2,
                          500,
                          388,

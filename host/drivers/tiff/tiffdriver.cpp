@@ -5,7 +5,9 @@
 #include <memory>
 #include <string>
 
+#include <fcntl.h>
 #include <sys/stat.h>
+#include <unistd.h>
 
 #include "host/datasources/formats.h"
 #include "host/drivers/tiff/sidecar.h"
@@ -28,6 +30,10 @@ class TiffDriver final : public datasources::IFormatDriver {
     if (!std::ifstream(file, std::ios::binary).read(magic.data(), magic.size()))
       return kFormatUnknown;
     return IsTiff(magic) ? kFormatTiff : kFormatUnknown;
+  }
+
+  bool MayUpdate(const std::string& file) const override {
+    return faccessat(AT_FDCWD, file.c_str(), W_OK, AT_EACCESS) == 0;
   }
 
   std::unique_ptr<datasources::IRasterSource> Open(const std::string& file,
