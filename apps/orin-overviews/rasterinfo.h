@@ -23,7 +23,7 @@ struct RasterInfo {
   bool hasMask = false;       ///< of the image, inside its file or beside it
   unsigned alphaChannel = 0;  ///< 1-based, 0: none
   bool isCloudOptimized = false;
-  std::optional<datasources::LeftOver> leftOver;  ///< beside it, of an image of another size
+  std::optional<datasources::LeftOver> leftOver = {};  ///< beside it, of an image of another size
 };
 
 /// \param keepsAnswers  keep with the levels what had to be read, if their file may be written
