@@ -82,8 +82,7 @@ std::string RebuildText(Reason reason, const std::string& levels) {
   const char* text = levels.c_str();
   switch (reason) {
     case Reason::kStale:
-      return FormatString(_("Rebuilding levels %s: the image was changed after they were built."),
-                          text);
+      return FormatString(_("Rebuilding levels %s: they no longer match the image."), text);
     case Reason::kChanged:
       return FormatString(
           _("Rebuilding levels %s: another program wrote into them after they were built."), text);

@@ -155,7 +155,9 @@ void Planner::CollectWanted() {
 std::optional<Reason> Planner::ReasonToBuild(unsigned level) const {
   const LevelDescription* stored = Find(level);
   if (!stored) return Reason::kMissing;
-  if (stored->status == LevelStatus::kStale) return Reason::kStale;
+  if (stored->status == LevelStatus::kStale)
+    return stored->reason == datasources::StaleReason::kSourceRebuilt ? Reason::kSourceRebuilt
+                                                                      : Reason::kStale;
   if (IsOutOfDate(*stored) && stored->status != LevelStatus::kUnfinished) return Reason::kChanged;
   if (!datasources::HoldsForAll(stored->validChannels, plan_.channels)) return Reason::kUnfinished;
   if (request_.force) return Reason::kForced;

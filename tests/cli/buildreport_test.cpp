@@ -144,7 +144,7 @@ TEST(BuildNotices, EachReasonNamesItsLevels) {
                    {8, ResampleMode, Reason::kOtherMethod, ""}};
   request.method = ResampleMode;
   const std::vector<std::string> expected = {
-      "Rebuilding levels 4: the image was changed after they were built.",
+      "Rebuilding levels 4: they no longer match the image.",
       "Rebuilding levels 8 by MODE: another program made them, by a method that they do not "
       "record.",
       "Rebuilding levels 2 by MODE: they were made by NEAREST."};

@@ -120,7 +120,7 @@ class OutOfDate(RequestCase):
         self.build("--levels", "2,3,4,8")
         edit(self.file)
         answer = self.build()
-        self.assertIn("Rebuilding levels 2, 3, 4, 8: the image was changed", answer.stderr)
+        self.assertIn("Rebuilding levels 2, 3, 4, 8: they no longer match the image", answer.stderr)
         self.assertEqual({"current"}, {told[2] for told in levels(self.file).values()})
 
     def test_levels_above_a_rebuilt_one_follow(self):

@@ -91,6 +91,15 @@ TEST(PlanBuild, AStaleLevelIsBuiltByTheMethodItRecordsWhateverTheUsualListSays) 
   EXPECT_EQ(Reason::kUnfinished, plan.building[1].reason);
 }
 
+TEST(PlanBuild, ALevelWhoseSourceWasChangedIsNotSaidToDifferFromTheImage) {
+  LevelDescription above = Level(4, "MODE", 2, LevelStatus::kStale);
+  above.reason = datasources::StaleReason::kSourceRebuilt;
+  const BuildPlan plan =
+      PlanBuild(ImageWith({Level(2, "MODE", 1, LevelStatus::kChanged), above}), {});
+  EXPECT_THAT(plan.Levels(Reason::kChanged), ElementsAre(2));
+  EXPECT_THAT(plan.Levels(Reason::kSourceRebuilt), ElementsAre(4));
+}
+
 TEST(PlanBuild, AMissingLevelTakesTheMethodOfTheOthersElseTheUsualOne) {
   BuildRequest request;
   request.usualMethod = ResampleMode;
