@@ -84,7 +84,7 @@ class Edited(FreshCase):
                 self.assertStates("stale", "stale")
                 answer = run("build", self.file, "--levels", "2,4", place)
                 self.assertIn("levels built: 2, 4", answer.stdout)
-                self.assertIn("Rebuilding levels 2, 4: the image was changed",
+                self.assertIn("Rebuilding levels 2, 4: they no longer match the image.",
                               answer.stderr)
                 self.assertStates("current", "current")
                 now = read_pixels(self.file)

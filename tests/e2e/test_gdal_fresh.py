@@ -144,7 +144,7 @@ class Inside(Freshness):
             self.assertStates("stale", self.file)
             answer = self.build()
             self.assertIn("levels built: 2, 4", answer.stdout)
-            self.assertIn("Rebuilding levels 2, 4: the image was changed",
+            self.assertIn("Rebuilding levels 2, 4: they no longer match the image.",
                           answer.stderr)
             self.assertStates("current", self.file)
             self.check_right()

@@ -123,7 +123,7 @@ class Honesty(Case):
                 self.assertEqual({"stale"}, {e["state"] for e in info(self.file)["levels"]})
                 answer = run("build", self.file, place, "--levels", "2,4,8", "--method", "nearest")
                 self.assertRan(answer)
-                self.assertIn("Rebuilding levels 2, 4, 8: the image was changed",
+                self.assertIn("Rebuilding levels 2, 4, 8: they no longer match the image.",
                               answer.stderr)
                 self.assertEqual([2, 4, 8], self.assertHonest())
                 self.assertRan(run("info", self.file))
